@@ -1,0 +1,5 @@
+function(add_if_there folder)
+  if(EXISTS ${CMAKE_CURRENT_SOURCE_DIR}/${folder}/CMakeLists.txt)
+    add_subdirectory(${folder})
+  endif()
+endfunction()

@@ -1,0 +1,36 @@
+# One library a room, one test program a room, one fuzz target a parser.
+include(GoogleTest)
+
+# zeb_room(NAME SOURCES … USES …): a static library that other rooms may link, and nothing more
+# than what its USES name (headers are found from the top folder).
+function(zeb_room name)
+  cmake_parse_arguments(ROOM "" "" "SOURCES;USES" ${ARGN})
+  add_library(${name} STATIC ${ROOM_SOURCES})
+  target_include_directories(${name} PUBLIC ${PROJECT_SOURCE_DIR})
+  target_link_libraries(${name} PUBLIC ${ROOM_USES})
+endfunction()
+
+# zeb_test(NAME SOURCES … USES …): a test program; each of its tests is a test of ctest.
+function(zeb_test name)
+  cmake_parse_arguments(TEST "" "" "SOURCES;USES;DEFINITIONS" ${ARGN})
+  add_executable(${name} ${TEST_SOURCES})
+  target_link_libraries(${name} PRIVATE ${TEST_USES} GTest::gmock GTest::gtest_main)
+  target_compile_definitions(${name} PRIVATE ${TEST_DEFINITIONS}
+                             ZEB_SOURCE_DIR="${PROJECT_SOURCE_DIR}")
+  gtest_discover_tests(${name} DISCOVERY_MODE PRE_TEST DISCOVERY_TIMEOUT 60
+                       PROPERTIES TIMEOUT 300)
+endfunction()
+
+# zeb_fuzz(NAME SOURCE … USES …): a program around LLVMFuzzerTestOneInput. In the fuzz preset it is
+# a libFuzzer binary; in every other it replays the files of fuzz/corpus/NAME, as a test.
+function(zeb_fuzz name)
+  cmake_parse_arguments(FUZZ "" "SOURCE" "USES" ${ARGN})
+  if(ZEB_FUZZ)
+    add_executable(fuzz_${name} ${FUZZ_SOURCE})
+    target_link_options(fuzz_${name} PRIVATE -fsanitize=fuzzer)
+  else()
+    add_executable(fuzz_${name} ${FUZZ_SOURCE} ${PROJECT_SOURCE_DIR}/fuzz/replay.cpp)
+    add_test(NAME fuzz.${name} COMMAND fuzz_${name} ${PROJECT_SOURCE_DIR}/fuzz/corpus/${name})
+  endif()
+  target_link_libraries(fuzz_${name} PRIVATE ${FUZZ_USES})
+endfunction()

@@ -1,0 +1,35 @@
+# Language, warnings, sanitizers and caches: everything that is the same for every target.
+set(CMAKE_CXX_STANDARD 20)
+set(CMAKE_CXX_STANDARD_REQUIRED ON)
+set(CMAKE_CXX_EXTENSIONS OFF)
+set(CMAKE_POSITION_INDEPENDENT_CODE ON)
+
+set(CMAKE_CXX_FLAGS_DEV "-O1 -g1" CACHE STRING "Flags of the Dev build type")
+set(CMAKE_CXX_FLAGS_RELEASE "-O2 -DNDEBUG" CACHE STRING "Flags of the Release build type" FORCE)
+
+set(ZEB_SANITIZE "" CACHE STRING "Value for -fsanitize, empty for none")
+option(ZEB_THREAD_SAFETY "Turn on clang's thread-safety analysis" OFF)
+option(ZEB_FUZZ "Link fuzz targets with libFuzzer instead of the corpus replayer" OFF)
+
+find_program(ZEB_CCACHE ccache)
+if(ZEB_CCACHE)
+  set(CMAKE_CXX_COMPILER_LAUNCHER ${ZEB_CCACHE})
+endif()
+
+add_compile_options(-Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wnon-virtual-dtor
+                    -Woverloaded-virtual -Wimplicit-fallthrough -Werror)
+if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU")
+  # g++ 12 reports these inside the standard library for correct code.
+  add_compile_options(-Wno-error=stringop-overflow -Wno-error=array-bounds -Wno-error=restrict
+                      -Wno-error=maybe-uninitialized -Wno-error=dangling-pointer)
+endif()
+if(ZEB_THREAD_SAFETY)
+  add_compile_options(-Wthread-safety -Wthread-safety-beta)
+endif()
+if(ZEB_SANITIZE)
+  add_compile_options(-fsanitize=${ZEB_SANITIZE} -fno-omit-frame-pointer)
+  add_link_options(-fsanitize=${ZEB_SANITIZE})
+  if(ZEB_SANITIZE MATCHES "undefined")
+    add_compile_options(-fno-sanitize-recover=undefined)
+  endif()
+endif()

@@ -1,0 +1,77 @@
+#include "platform/Clock.h"
+
+#include <thread>
+
+namespace platform {
+
+namespace {
+
+class SystemClock final : public Clock {
+ public:
+  std::chrono::system_clock::time_point now() const override {
+    return std::chrono::system_clock::now();
+  }
+
+  Instant elapsed() const override { return std::chrono::steady_clock::now().time_since_epoch(); }
+
+  void sleep(Seconds duration) override {
+    if (duration > Seconds::zero()) {
+      std::this_thread::sleep_for(duration);
+    }
+  }
+};
+
+}  // namespace
+
+std::shared_ptr<Clock> systemClock() {
+  static const auto clock = std::make_shared<SystemClock>();
+  return clock;
+}
+
+SimulatedClock::SimulatedClock(std::chrono::system_clock::time_point start) : _now(start) {}
+
+std::chrono::system_clock::time_point SimulatedClock::now() const {
+  const std::lock_guard lock(_mutex);
+  return _now;
+}
+
+Clock::Instant SimulatedClock::elapsed() const {
+  const std::lock_guard lock(_mutex);
+  return _elapsed;
+}
+
+void SimulatedClock::sleep(Seconds duration) {
+  if (duration <= Seconds::zero()) {
+    return;
+  }
+  std::unique_lock lock(_mutex);
+  const Instant deadline = _elapsed + duration;
+  ++_sleepers;
+  _sleepersChanged.notify_all();
+  _moved.wait(lock, [&] { return _elapsed >= deadline; });
+  --_sleepers;
+}
+
+void SimulatedClock::advance(Seconds duration) {
+  const std::lock_guard lock(_mutex);
+  _elapsed += duration;
+  _now += std::chrono::duration_cast<std::chrono::system_clock::duration>(duration);
+  _moved.notify_all();
+}
+
+void SimulatedClock::setNow(std::chrono::system_clock::time_point now) {
+  const std::lock_guard lock(_mutex);
+  _now = now;
+}
+
+size_t SimulatedClock::sleeperCount() const {
+  const std::lock_guard lock(_mutex);
+  return _sleepers;
+}
+
+void SimulatedClock::waitForSleepers(size_t count) {
+  std::unique_lock lock(_mutex);
+  _sleepersChanged.wait(lock, [&] { return _sleepers >= count; });
+}
+
+}  // namespace platform

@@ -1,0 +1,120 @@
+#include "platform/Environment.h"
+
+#include <pwd.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <mutex>
+#include <string_view>
+
+namespace platform {
+
+namespace {
+
+std::string variable(const char* name) {
+  // Read once, before threads start; nothing in the system changes its own environment.
+  const char* value = std::getenv(name);  // NOLINT(concurrency-mt-unsafe)
+  return value == nullptr ? std::string() : std::string(value);
+}
+
+/// "pt_BR.UTF-8@euro" as the language tag "pt-BR"; empty for "C" and "POSIX".
+std::string languageTag(std::string_view locale) {
+  std::string tag(locale.substr(0, locale.find_first_of(".@")));
+  if (tag == "C" || tag == "POSIX") {
+    return {};
+  }
+  std::replace(tag.begin(), tag.end(), '_', '-');
+  return tag;
+}
+
+void append(std::vector<std::string>& languages, const std::string& tag) {
+  if (!tag.empty() && std::find(languages.begin(), languages.end(), tag) == languages.end()) {
+    languages.push_back(tag);
+  }
+}
+
+std::vector<std::string> languagesOfTheUser() {
+  std::vector<std::string> languages;
+  const std::string list = variable("LANGUAGE");
+  for (size_t start = 0; start < list.size();) {
+    const size_t end = std::min(list.find(':', start), list.size());
+    append(languages, languageTag(std::string_view(list).substr(start, end - start)));
+    start = end + 1;
+  }
+  for (const char* name : {"LC_ALL", "LC_MESSAGES", "LANG"}) {
+    if (const std::string value = variable(name); !value.empty()) {
+      append(languages, languageTag(value));
+      break;
+    }
+  }
+  if (languages.empty()) {
+    languages.emplace_back("en");
+  }
+  return languages;
+}
+
+std::optional<std::string> cachesFolderOfTheUser() {
+  // A relative path is to be ignored, says the base-directory convention.
+  if (const std::string caches = variable("XDG_CACHE_HOME"); caches.starts_with('/')) {
+    return caches;
+  }
+  if (const std::string home = variable("HOME"); home.starts_with('/')) {
+    return stringByAppendingPathComponent(home, ".cache");
+  }
+  passwd record{};
+  passwd* found = nullptr;
+  char buffer[4096];
+  if (getpwuid_r(getuid(), &record, buffer, sizeof buffer, &found) == 0 && found != nullptr &&
+      found->pw_dir != nullptr && found->pw_dir[0] == '/') {
+    return stringByAppendingPathComponent(found->pw_dir, ".cache");
+  }
+  return std::nullopt;
+}
+
+struct Current {
+  std::mutex mutex;
+  std::shared_ptr<const Environment> environment;
+};
+
+Current& currentHolder() {
+  static Current current;
+  return current;
+}
+
+}  // namespace
+
+Environment Environment::system() {
+  Environment environment;
+  environment.clock = systemClock();
+  environment.files = systemFileManager();
+  environment.log = standardErrorLogSink(2);
+  environment.preferredLanguages = languagesOfTheUser();
+  environment.cachesDirectory = cachesFolderOfTheUser();
+  return environment;
+}
+
+std::shared_ptr<const Environment> Environment::current() {
+  Current& holder = currentHolder();
+  const std::lock_guard lock(holder.mutex);
+  if (holder.environment == nullptr) {
+    holder.environment = std::make_shared<const Environment>(system());
+  }
+  return holder.environment;
+}
+
+EnvironmentOverride::EnvironmentOverride(Environment environment)
+    : _former(Environment::current()) {
+  auto replacement = std::make_shared<const Environment>(std::move(environment));
+  Current& holder = currentHolder();
+  const std::lock_guard lock(holder.mutex);
+  holder.environment = std::move(replacement);
+}
+
+EnvironmentOverride::~EnvironmentOverride() {
+  Current& holder = currentHolder();
+  const std::lock_guard lock(holder.mutex);
+  holder.environment = std::move(_former);
+}
+
+}  // namespace platform

@@ -1,0 +1,69 @@
+#include "platform/Clock.h"
+
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <thread>
+
+namespace platform {
+namespace {
+
+using namespace std::chrono_literals;
+
+TEST(SystemClock, elapsedTimeGrows) {
+  const auto clock = systemClock();
+  const auto before = clock->elapsed();
+  clock->sleep(Seconds(0.001));
+  EXPECT_GE(clock->elapsed() - before, Seconds(0.001));
+}
+
+TEST(SystemClock, nowIsTheTimeOfDay) {
+  const auto difference = systemClock()->now() - std::chrono::system_clock::now();
+  EXPECT_LT(std::chrono::abs(difference), 5s);
+}
+
+TEST(SystemClock, negativeSleepReturnsAtOnce) { systemClock()->sleep(Seconds(-1)); }
+
+TEST(SimulatedClock, standsStillUntilItIsAdvanced) {
+  SimulatedClock clock(std::chrono::system_clock::time_point(100s));
+  EXPECT_EQ(clock.now(), std::chrono::system_clock::time_point(100s));
+  EXPECT_EQ(clock.elapsed(), Seconds(0));
+  clock.advance(Seconds(2.5));
+  EXPECT_EQ(clock.elapsed(), Seconds(2.5));
+  EXPECT_EQ(clock.now(), std::chrono::system_clock::time_point(102500ms));
+}
+
+TEST(SimulatedClock, setNowLeavesElapsedTimeAlone) {
+  SimulatedClock clock;
+  clock.advance(Seconds(1));
+  clock.setNow(std::chrono::system_clock::time_point(7s));
+  EXPECT_EQ(clock.now(), std::chrono::system_clock::time_point(7s));
+  EXPECT_EQ(clock.elapsed(), Seconds(1));
+}
+
+TEST(SimulatedClock, sleeperWakesWhenItsTimeHasCome) {
+  SimulatedClock clock;
+  std::atomic<bool> awake = false;
+  std::thread sleeper([&] {
+    clock.sleep(Seconds(2));
+    awake = true;
+  });
+  clock.waitForSleepers(1);
+  clock.advance(Seconds(1.5));
+  EXPECT_FALSE(awake);
+  EXPECT_EQ(clock.sleeperCount(), 1U);
+  clock.advance(Seconds(0.5));
+  sleeper.join();
+  EXPECT_TRUE(awake);
+  EXPECT_EQ(clock.sleeperCount(), 0U);
+}
+
+TEST(SimulatedClock, zeroSleepReturnsAtOnce) {
+  SimulatedClock clock;
+  clock.sleep(Seconds(0));
+  clock.sleep(Seconds(-3));
+  EXPECT_EQ(clock.elapsed(), Seconds(0));
+}
+
+}  // namespace
+}  // namespace platform
