@@ -46,10 +46,10 @@ class ZEBHelpBook {
   static std::string unversionedbookIDFromBookID(std::string_view bookID);
 
   /// Where the server has a page of a type-4 book: the book's remoteURL (without query and
-  /// fragment), one slash, and the document's path within the book, percent-escaped. Absent when no
-  /// living type-4 book of that identifier has a remoteURL, and for a path that is empty, holds a
-  /// NUL, or would climb out of the book with "..".
-  /// Of several living books of one identifier the one made last answers.
+  /// fragment), one slash, and the document's path within the book, percent-escaped. Of several
+  /// living books of one identifier the one made last that has a remoteURL answers. Absent when
+  /// there is none, and for a path that is empty, holds a NUL or has ".." for a component, escaped
+  /// or not: such a page would not be the book's.
   static std::optional<platform::URL> _urlForType4HelpBookResult(std::string_view path,
                                                                  std::string_view bookID);
 
@@ -130,6 +130,9 @@ class ZEBHelpBook {
  private:
   struct Properties;
   ZEBHelpBook(std::string bookID, int32_t type, std::string path);
+  // The process-wide registry of living type-4 books: weak, internally synchronised.
+  static void _rememberType4Book(const std::shared_ptr<ZEBHelpBook>& book);
+  static void _forgetDeadType4Books(const std::string& bookID);
   template <typename Member>
   Member _get(Member Properties::*member) const;
   template <typename Member>

@@ -1,6 +1,7 @@
 // Log messages with placeholders.
 #pragma once
 
+#include <algorithm>
 #include <concepts>
 #include <cstddef>
 #include <cstdint>
@@ -17,7 +18,10 @@
 #include <variant>
 #include <vector>
 
+#include "host/Zebrine/ZEBDescription.h"
 #include "platform/Value.h"
+
+class ZEBDescriptionWriter;
 
 namespace platform {
 struct Error;
@@ -45,8 +49,10 @@ class ZEBLogArgument {
   ZEBLogArgument(const std::string& text) noexcept : _content(std::string_view(text)) {}
   /// See ZEBDescription().
   ZEBLogArgument(const platform::Value& value);
+  ZEBLogArgument(const platform::Value::Array& array);
+  ZEBLogArgument(const platform::Value::Dictionary& dictionary);
   /// The absolute string.
-  ZEBLogArgument(const platform::URL& url) noexcept;
+  ZEBLogArgument(const platform::URL& url);
   /// Description, domain and code.
   ZEBLogArgument(const platform::Error& error);
   /// What it says of itself: for a platform::Exception its reason.
@@ -68,13 +74,19 @@ class ZEBLogArgument {
   /// Lists and dictionaries, shown as ZEBDescription() shows them.
   template <typename T>
   ZEBLogArgument(const std::vector<T>& list) {
-    const std::vector<ZEBLogArgument> elements(list.begin(), list.end());
+    // No more elements than could be shown, however short they are.
+    const size_t count = std::min(list.size(), ZEBDescriptionMaximumLength);
+    const std::vector<ZEBLogArgument> elements(list.begin(),
+                                               list.begin() + static_cast<std::ptrdiff_t>(count));
     _content = _listDescription(elements);
   }
   template <typename T, typename Order>
   ZEBLogArgument(const std::map<std::string, T, Order>& dictionary) {
     std::vector<std::pair<std::string_view, ZEBLogArgument>> entries;
     for (const auto& [key, value] : dictionary) {
+      if (entries.size() == ZEBDescriptionMaximumLength) {
+        break;
+      }
       entries.emplace_back(key, value);
     }
     _content = _dictionaryDescription(entries);
@@ -87,7 +99,7 @@ class ZEBLogArgument {
   static std::string _listDescription(std::span<const ZEBLogArgument> elements);
   static std::string _dictionaryDescription(
       std::span<const std::pair<std::string_view, ZEBLogArgument>> entries);
-  void _appendAsElementTo(std::string& message) const;
+  bool _writeAsElementTo(ZEBDescriptionWriter& writer) const;
 
   // A string_view is text as someone wrote it, which lists show in quotes; a string is the picture
   // of something, made here, and goes into lists as it is.

@@ -6,6 +6,7 @@
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBDescription.h"
 #include "host/Zebrine/ZEBHelpBook.h"
+#include "host/Zebrine/ZEBLocalization.h"
 #include "host/Zebrine/ZEBLog.h"
 #include "host/Zebrine/ZEBPlugin.h"
 #include "host/Zebrine/ZEBPluginOwner.h"
