@@ -158,7 +158,7 @@ void ZEBDescriptionWriter::data(const platform::Data& data) {
 void ZEBDescriptionWriter::date(const platform::Date& date) {
   constexpr double referenceInUnixTime = 978307200;
   // Years 1 to 9999, which four digits can show.
-  constexpr double earliest = -63114076800.0;
+  constexpr double earliest = -63113904000.0;
   constexpr double latest = 252423993600.0;
   const double seconds = std::floor(date.secondsSinceReference);
   if (!(seconds >= earliest && seconds < latest)) {

@@ -43,7 +43,7 @@ std::shared_ptr<ZEBResult> ZEBResult::resultWithTitle(std::optional<std::string>
 }
 
 const platform::Value& ZEBResult::payloadValueForKey(std::string_view key) const noexcept {
-  static const platform::Value absent;
+  static const platform::Value absent{};
   const auto entry = _payload.find(key);
   return entry == _payload.end() ? absent : entry->second;
 }
