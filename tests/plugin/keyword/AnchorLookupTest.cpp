@@ -283,26 +283,34 @@ TEST(AnchorLookup, SpellsTheURLOfAPageAsSearchDoes) {
                                utf8(u8"\u65E5\u672C"),
                                "quote\"d",
                                "<angle>"};
+  std::vector<Document> pages;
+  Value::Dictionary anchorData;
+  for (const std::string& name : names) {
+    // Each page has an anchor and a word of its own, called alike.
+    std::string word = "word";
+    word += static_cast<char>('a' + pages.size());
+    std::string path = "/sub ";
+    path.append(name).append("/").append(name).append(".html");
+    pages.push_back(page(path, "Title", word));
+    anchorData[word] = Value::Array{path};
+  }
   std::vector<std::string> folders(std::begin(names), std::end(names));
   folders.emplace_back("50%25 escaped");
   for (const std::string& folder : folders) {
-    for (const std::string& name : names) {
-      std::string path = "/sub ";
-      path.append(folder).append("/").append(name).append(".html");
-      for (const bool generated : {false, true}) {
-        world.owner->addBook("book", ZEBHelpBookType1)
-            ->setAccessPagePath("/books/" + folder + "/index.html");
-        const auto index = indexWithAnchors(world, {page(path, "A", "applet")},
-                                            anchors({{"top", {path}}}), folder + "/a.helpindex");
-        ASSERT_NE(index, nullptr);
-        index->setLoadedFromGeneratedCache(generated);
-        const auto found = world.controller->doSearchForString("applet", {index}, {});
-        const auto lookedUp = world.controller->doLookupOfAnchor("top", {index});
-        ASSERT_THAT(found, SizeIs(1)) << path;
-        ASSERT_THAT(lookedUp, SizeIs(1)) << path;
+    const auto index = indexWithAnchors(world, pages, anchorData, folder + "/a.helpindex");
+    ASSERT_NE(index, nullptr);
+    world.owner->addBook("book", ZEBHelpBookType1)
+        ->setAccessPagePath("/books/" + folder + "/index.html");
+    for (const bool generated : {false, true}) {
+      index->setLoadedFromGeneratedCache(generated);
+      for (const auto& [word, paths] : anchorData) {
+        const auto found = world.controller->doSearchForString(word, {index}, {});
+        const auto lookedUp = world.controller->doLookupOfAnchor(word, {index});
+        ASSERT_THAT(found, SizeIs(1)) << folder << " " << word;
+        ASSERT_THAT(lookedUp, SizeIs(1)) << folder << " " << word;
         EXPECT_EQ(urlOf(found[0]), urlOf(lookedUp[0]));
         // What a look-up found, a search can be told to leave out.
-        EXPECT_THAT(world.controller->doSearchForString("applet", {index}, {urlOf(lookedUp[0])}),
+        EXPECT_THAT(world.controller->doSearchForString(word, {index}, {urlOf(lookedUp[0])}),
                     IsEmpty());
         const auto url = platform::URL::URLWithString(urlOf(found[0]));
         ASSERT_TRUE(url) << urlOf(found[0]);
