@@ -1,0 +1,47 @@
+// What the elements of HTML mean to an indexer.
+#pragma once
+
+#include <cstdint>
+#include <string_view>
+
+namespace bvmake {
+
+/// Properties of an element, or-ed together; 0 is an inline element such as `b`.
+using ElementTraits = uint32_t;
+
+namespace elementtraits {
+/// Begins and ends a block of text.
+inline constexpr ElementTraits block = 1U << 0;
+/// Its text is not the page's text.
+inline constexpr ElementTraits skipped = 1U << 1;
+inline constexpr ElementTraits heading = 1U << 2;
+/// Belongs to the page around the content, unless inside the content.
+inline constexpr ElementTraits chrome = 1U << 3;
+inline constexpr ElementTraits mainContent = 1U << 4;
+/// A unit of content whose headers and footers are its own.
+inline constexpr ElementTraits contentUnit = 1U << 5;
+/// Text directly in it is not made of sentences.
+inline constexpr ElementTraits notProse = 1U << 6;
+/// As notProse, and so is all that is inside.
+inline constexpr ElementTraits neverProse = 1U << 7;
+/// Text directly in it is prose again.
+inline constexpr ElementTraits prose = 1U << 8;
+inline constexpr ElementTraits title = 1U << 9;
+inline constexpr ElementTraits meta = 1U << 10;
+inline constexpr ElementTraits link = 1U << 11;
+/// Hidden unless it has the attribute `open`.
+inline constexpr ElementTraits hiddenUnlessOpen = 1U << 12;
+/// The element that holds everything; hiding it is a trick of scripts.
+inline constexpr ElementTraits root = 1U << 13;
+}  // namespace elementtraits
+
+/// The traits of an element by its lower-case name.
+ElementTraits traitsOfElement(std::string_view name);
+
+/// The traits that the attribute `role` adds; `role` as written.
+ElementTraits traitsOfRole(std::string_view role);
+
+/// Whether an inline style sheet makes the element invisible.
+bool styleHides(std::string_view style);
+
+}  // namespace bvmake

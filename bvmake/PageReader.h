@@ -1,0 +1,34 @@
+// Which files are help pages, and from their bytes to a Page.
+#pragma once
+
+#include <optional>
+#include <string_view>
+
+#include "bvmake/Page.h"
+#include "platform/Error.h"
+
+namespace bvmake {
+
+enum class PageKind : uint8_t {
+  /// HTML and XHTML, as found in the wild.
+  html,
+  /// Mallard, the XML vocabulary of help pages.
+  mallard,
+};
+
+/// Pages of more bytes than this are refused, so that a file that is no page at all (a disk image
+/// under the wrong name) cannot take all memory.
+inline constexpr size_t maximumPageSize = size_t{256} << 20;
+
+/// The kind that the file name's extension stands for, whatever its case (.html, .htm, .xhtml,
+/// .xht; .page); absent for files that are no help pages.
+std::optional<PageKind> pageKindOfFileName(std::string_view name);
+
+/// Reads one page. Absent, with `error` (format domain) set when given, for bytes that are no page
+/// of this kind; the description says what is wrong and does not name the file.
+/// Any bytes whatever are taken in time about linear in their length, without network, other files
+/// or entity expansion. Thread-safety: pages may be read side by side.
+std::optional<Page> readPage(PageKind kind, std::string_view bytes,
+                             platform::Error* error = nullptr);
+
+}  // namespace bvmake

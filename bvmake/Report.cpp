@@ -1,0 +1,31 @@
+#include "bvmake/Report.h"
+
+#include <utility>
+
+namespace bvmake {
+
+StreamReport::StreamReport(std::FILE* stream, std::string program, int verbosity)
+    : _stream(stream), _program(std::move(program)), _verbosity(verbosity) {}
+
+void StreamReport::error(std::string_view text) { _writeLine("error: ", text); }
+
+void StreamReport::warning(std::string_view text) { _writeLine("warning: ", text); }
+
+void StreamReport::progress(int verbosity, std::string_view text) {
+  if (wants(verbosity)) {
+    _writeLine("", text);
+  }
+}
+
+void StreamReport::_writeLine(std::string_view kind, std::string_view text) {
+  std::string line = _program;
+  line.append(": ").append(kind);
+  for (const char character : text) {
+    const auto byte = static_cast<unsigned char>(character);
+    line += byte < 0x20 || byte == 0x7F ? '?' : character;
+  }
+  line += '\n';
+  std::fwrite(line.data(), 1, line.size(), _stream);
+}
+
+}  // namespace bvmake

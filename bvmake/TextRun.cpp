@@ -1,0 +1,89 @@
+#include "bvmake/TextRun.h"
+
+#include <unicode/uchar.h>
+
+#include <utility>
+
+#include "bvmake/UTF8.h"
+#include "platform/Strings.h"
+
+namespace bvmake {
+
+namespace {
+
+constexpr UChar32 softHyphen = 0xAD;
+constexpr UChar32 byteOrderMark = 0xFEFF;
+
+bool isASCIIBlank(unsigned char byte) { return byte == ' ' || (byte >= 0x09 && byte <= 0x0D); }
+
+}  // namespace
+
+void TextRun::append(std::string_view text) {
+  size_t at = 0;
+  while (at < text.size()) {
+    const auto byte = static_cast<unsigned char>(text[at]);
+    if (isASCIIBlank(byte)) {
+      appendBlank();
+      ++at;
+      continue;
+    }
+    size_t end = at;
+    if (byte >= 0x80) {
+      const UChar32 character = nextCharacter(text, end);
+      if (character == softHyphen || character == byteOrderMark) {
+        at = end;
+        continue;
+      }
+      if (character >= 0 && platform::isWhitespaceOrNewline(static_cast<char32_t>(character))) {
+        appendBlank();
+        at = end;
+        continue;
+      }
+    } else {
+      while (end < text.size() && static_cast<unsigned char>(text[end]) < 0x80 &&
+             !isASCIIBlank(static_cast<unsigned char>(text[end]))) {
+        ++end;
+      }
+    }
+    if (_blankPending) {
+      _text += ' ';
+      _blankPending = false;
+    }
+    _text.append(text, at, end - at);
+    at = end;
+  }
+}
+
+void TextRun::truncate(size_t length) {
+  if (length < _text.size()) {
+    _text.resize(length);
+    while (!_text.empty() && _text.back() == ' ') {
+      _text.pop_back();
+    }
+    _blankPending = !_text.empty();
+  }
+}
+
+std::string TextRun::take() {
+  _blankPending = false;
+  return std::exchange(_text, {});
+}
+
+std::string collapsedText(std::string_view text) {
+  TextRun run;
+  run.append(text);
+  return run.take();
+}
+
+bool hasLetterOrDigit(std::string_view text) noexcept {
+  size_t at = 0;
+  while (at < text.size()) {
+    const UChar32 character = nextCharacter(text, at);
+    if (character >= 0 && u_isalnum(character) != 0) {
+      return true;
+    }
+  }
+  return false;
+}
+
+}  // namespace bvmake
