@@ -132,7 +132,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     return 0;
   }
   const std::string_view rest = input.substr(1);
-  const size_t first = data[0] % 2 == 0 ? rest.size() : std::min<size_t>(data[0] * 16, rest.size());
+  const size_t first = data[0] % 2 == 0 ? rest.size() : std::min(size_t{data[0]} * 16, rest.size());
   readBook(rest.substr(0, first), rest.substr(first));
   readLists(rest);
   requireStableURL(rest);

@@ -48,8 +48,7 @@ std::shared_ptr<ZEBHelpBook> ZEBHelpBook::bookWithID(std::string bookID, int32_t
   if (!isValidBookID(bookID) || type < ZEBHelpBookType1 || type > ZEBHelpBookType4) {
     return nullptr;
   }
-  const std::shared_ptr<ZEBHelpBook> book(
-      new ZEBHelpBook(std::move(bookID), type, std::move(path)));
+  std::shared_ptr<ZEBHelpBook> book(new ZEBHelpBook(std::move(bookID), type, std::move(path)));
   if (type == ZEBHelpBookType4) {
     _rememberType4Book(book);
   }

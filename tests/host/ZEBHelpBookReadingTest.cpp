@@ -184,8 +184,8 @@ TEST_F(ZEBHelpBookReading, aListThatIsNoDictionaryIsNoBook) {
 }
 
 TEST_F(ZEBHelpBookReading, aHugeListIsNoBook) {
-  EXPECT_NE(readWith({{"Padding", std::string(1000 * 1000, 'a')}}), nullptr);
-  EXPECT_EQ(readWith({{"Padding", std::string(1100 * 1000, 'a')}}), nullptr);
+  EXPECT_NE(readWith({{"Padding", std::string(1000000, 'a')}}), nullptr);
+  EXPECT_EQ(readWith({{"Padding", std::string(1100000, 'a')}}), nullptr);
 }
 
 TEST_F(ZEBHelpBookReading, aDeepListIsNoBook) {

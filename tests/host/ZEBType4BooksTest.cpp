@@ -84,6 +84,7 @@ TEST(ZEBType4Books, theBookMadeLastAnswersAndTheEarlierOneWhenThatIsGone) {
 TEST(ZEBType4Books, lookUpsRunBesideBooksThatComeAndGo) {
   std::atomic<bool> done{false};
   std::vector<std::thread> readers;
+  readers.reserve(3);
   std::atomic<int> wrong{0};
   for (int i = 0; i < 3; ++i) {
     readers.emplace_back([&] {
