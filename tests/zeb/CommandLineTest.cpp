@@ -1,0 +1,175 @@
+#include "zeb/CommandLine.h"
+
+#include <gmock/gmock.h>
+
+#include <sstream>
+
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+using zeb::CommandLine;
+using zeb::ExitCode;
+
+class CommandLineTest : public testing::Test {
+ protected:
+  std::optional<CommandLine> parse(const std::vector<std::string>& arguments) {
+    out.str("");
+    err.str("");
+    code = ExitCode::failure;
+    return zeb::parseCommandLine(arguments, console, code);
+  }
+
+  template <typename Command>
+  Command parsed(const std::vector<std::string>& arguments) {
+    const std::optional<CommandLine> line = parse(arguments);
+    EXPECT_TRUE(line.has_value()) << err.str();
+    if (!line || !std::holds_alternative<Command>(line->command)) {
+      ADD_FAILURE() << "another command";
+      return {};
+    }
+    return std::get<Command>(line->command);
+  }
+
+  void expectUsageError(const std::vector<std::string>& arguments, const std::string& text) {
+    EXPECT_FALSE(parse(arguments).has_value());
+    EXPECT_EQ(code, ExitCode::usage);
+    EXPECT_THAT(err.str(), HasSubstr("zeb: error: "));
+    EXPECT_THAT(err.str(), HasSubstr(text));
+    EXPECT_EQ(out.str(), "");
+  }
+
+  std::ostringstream out;
+  std::ostringstream err;
+  zeb::Console console{out, err};
+  ExitCode code = ExitCode::failure;
+};
+
+TEST_F(CommandLineTest, SearchTakesWordsBooksLimitAndJSONInAnyOrder) {
+  const auto command = parsed<zeb::SearchCommand>(
+      {"search", "--book", "a", "print", "--limit", "3", "queue", "--book=b", "--json", "now"});
+  EXPECT_THAT(command.words, ElementsAre("print", "queue", "now"));
+  EXPECT_THAT(command.books, ElementsAre("a", "b"));
+  EXPECT_EQ(command.limit, 3U);
+  EXPECT_TRUE(command.json);
+}
+
+TEST_F(CommandLineTest, SearchShowsTenPagesOfAllBooksByItself) {
+  const auto command = parsed<zeb::SearchCommand>({"search", "print"});
+  EXPECT_EQ(command.limit, 10U);
+  EXPECT_THAT(command.books, IsEmpty());
+  EXPECT_FALSE(command.json);
+}
+
+TEST_F(CommandLineTest, OneHyphenMakesAWordOfTheQueryLanguage) {
+  const auto command =
+      parsed<zeb::SearchCommand>({"search", "print", "-queue", "-o", "-h", "-", "+x", "!y"});
+  EXPECT_THAT(command.words, ElementsAre("print", "-queue", "-o", "-h", "-", "+x", "!y"));
+}
+
+TEST_F(CommandLineTest, BehindTwoHyphensEverythingIsAWord) {
+  const auto command = parsed<zeb::SearchCommand>({"search", "--json", "--", "--limit", "-x", "["});
+  EXPECT_THAT(command.words, ElementsAre("--limit", "-x", "["));
+  EXPECT_TRUE(command.json);
+}
+
+TEST_F(CommandLineTest, WordsInBracketsAreNoLists) {
+  const auto command = parsed<zeb::SearchCommand>({"search", "[a,b]", "{}", "a,b", "%%"});
+  EXPECT_THAT(command.words, ElementsAre("[a,b]", "{}", "a,b", "%%"));
+}
+
+TEST_F(CommandLineTest, BytesThatAreNoTextArriveAsTheyAre) {
+  const auto command = parsed<zeb::SearchCommand>({"search", "caf\xE9", "\xFF-x", "\xFF"});
+  EXPECT_THAT(command.words, ElementsAre("caf\xE9", "\xFF-x", "\xFF"));
+}
+
+TEST_F(CommandLineTest, WordsMayBeNamedLikeCommands) {
+  const auto command = parsed<zeb::SearchCommand>({"search", "books", "index", "-o", "x"});
+  EXPECT_THAT(command.words, ElementsAre("books", "index", "-o", "x"));
+}
+
+TEST_F(CommandLineTest, EmptyWordIsAWord) {
+  EXPECT_THAT(parsed<zeb::SearchCommand>({"search", ""}).words, ElementsAre(""));
+}
+
+TEST_F(CommandLineTest, AnchorTakesOneName) {
+  const auto command = parsed<zeb::AnchorCommand>({"anchor", "-odd [name]", "--book", "a"});
+  EXPECT_EQ(command.name, "-odd [name]");
+  EXPECT_THAT(command.books, ElementsAre("a"));
+  expectUsageError({"anchor"}, "name");
+  expectUsageError({"anchor", "a", "b"}, "b");
+}
+
+TEST_F(CommandLineTest, BooksTakesNothingButJSON) {
+  EXPECT_TRUE(parsed<zeb::BooksCommand>({"books", "--json"}).json);
+  expectUsageError({"books", "a"}, "a");
+}
+
+TEST_F(CommandLineTest, IndexTakesFoldersIdentifiersAndOutput) {
+  const auto command = parsed<zeb::IndexCommand>(
+      {"index", "one", "-o", "out", "two", "--book-id", "a", "--book-id", "b"});
+  EXPECT_THAT(command.folders, ElementsAre("one", "two"));
+  EXPECT_THAT(command.bookIDs, ElementsAre("a", "b"));
+  EXPECT_EQ(command.output, "out");
+  EXPECT_EQ(parsed<zeb::IndexCommand>({"index", "one"}).output, std::nullopt);
+  expectUsageError({"index", "-o", "out"}, "folders");
+}
+
+TEST_F(CommandLineTest, ScanTakesFoldersRootLanguagesAndForce) {
+  const auto command =
+      parsed<zeb::ScanCommand>({"scan", "one", "--root", "/mnt", "--language", "de", "--language",
+                                "fr", "--force", "--no-system"});
+  EXPECT_THAT(command.folders, ElementsAre("one"));
+  EXPECT_EQ(command.root, "/mnt");
+  EXPECT_THAT(command.languages, ElementsAre("de", "fr"));
+  EXPECT_TRUE(command.evenIfUnchanged);
+  EXPECT_FALSE(command.installedBooks);
+  EXPECT_TRUE(parsed<zeb::ScanCommand>({"scan"}).installedBooks);
+}
+
+TEST_F(CommandLineTest, CommonOptionsStandAnywhere) {
+  const auto before = parse({"--color", "never", "--cache-dir", "/c", "--verbose", "books"});
+  const auto after = parse({"books", "--color=never", "--cache-dir=/c", "--verbose"});
+  for (const auto& line : {before, after}) {
+    ASSERT_TRUE(line.has_value()) << err.str();
+    EXPECT_EQ(line->color, zeb::ColorMode::never);
+    EXPECT_EQ(line->cacheFolder, "/c");
+    EXPECT_EQ(line->verbosity, 1);
+  }
+}
+
+TEST_F(CommandLineTest, ColorKnowsThreeWords) {
+  EXPECT_EQ(parse({"books", "--color=auto"})->color, zeb::ColorMode::automatic);
+  EXPECT_EQ(parse({"books", "--color=always"})->color, zeb::ColorMode::always);
+  expectUsageError({"books", "--color=blue"}, "--color");
+}
+
+TEST_F(CommandLineTest, WrongLinesAreUsageErrors) {
+  expectUsageError({}, "subcommand");
+  expectUsageError({"sing"}, "sing");
+  expectUsageError({"search"}, "words");
+  expectUsageError({"search", "a", "--limt", "3"}, "--limt");
+  expectUsageError({"search", "a", "--limit", "0"}, "--limit");
+  expectUsageError({"search", "a", "--limit", "-3"}, "--limit");
+  expectUsageError({"search", "a", "--limit", "many"}, "--limit");
+  expectUsageError({"search", "a", "--limit"}, "--limit");
+  expectUsageError({"search", "a", "--book"}, "--book");
+  expectUsageError({"--color", "books"}, "--color");
+}
+
+TEST_F(CommandLineTest, HelpAndVersionGoToTheOutputAndSucceed) {
+  EXPECT_FALSE(parse({"--help"}).has_value());
+  EXPECT_EQ(code, ExitCode::success);
+  for (const char* command : {"search", "anchor", "books", "index", "scan"}) {
+    EXPECT_THAT(out.str(), HasSubstr(command));
+  }
+  EXPECT_FALSE(parse({"search", "--help"}).has_value());
+  EXPECT_THAT(out.str(), HasSubstr("--limit"));
+  EXPECT_EQ(code, ExitCode::success);
+  EXPECT_FALSE(parse({"--version"}).has_value());
+  EXPECT_THAT(out.str(), testing::MatchesRegex("zeb [0-9.]+\n"));
+  EXPECT_EQ(err.str(), "");
+}
+
+}  // namespace

@@ -1,0 +1,217 @@
+// The real programs, as the shell starts them.
+#include <gmock/gmock.h>
+#include <pty.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <array>
+#include <cstdio>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <nlohmann/json.hpp>
+#include <string>
+#include <vector>
+
+#include "tests/zeb/World.h"
+
+namespace {
+
+using testing::HasSubstr;
+using testing::Not;
+
+struct ProgramRun {
+  int status = -1;
+  std::string out;
+  std::string err;
+};
+
+std::string quoted(const std::string& word) {
+  std::string result = "'";
+  for (const char c : word) {
+    result += c == '\'' ? std::string("'\\''") : std::string(1, c);
+  }
+  return result + "'";
+}
+
+class ProgramTest : public testing::Test {
+ protected:
+  /// Runs a line of shell with the caches folder and no NO_COLOR set.
+  ProgramRun shell(const std::string& line) const {
+    const std::string errors = files.path("stderr");
+    const std::string command = "unset NO_COLOR; ZEB_CACHE_DIR=" + quoted(files.path("cache")) +
+                                " " + line + " 2>" + quoted(errors);
+    ProgramRun run;
+    std::FILE* pipe = popen(command.c_str(), "r");
+    if (pipe == nullptr) {
+      return run;
+    }
+    std::array<char, 4096> buffer{};
+    for (size_t count = 0; (count = std::fread(buffer.data(), 1, buffer.size(), pipe)) > 0;) {
+      run.out.append(buffer.data(), count);
+    }
+    const int status = pclose(pipe);
+    run.status = WIFEXITED(status) ? WEXITSTATUS(status) : 1000 + status;
+    std::ifstream file(errors, std::ios::binary);
+    run.err.assign(std::istreambuf_iterator<char>(file), {});
+    return run;
+  }
+
+  ProgramRun zeb(const std::vector<std::string>& arguments) const {
+    std::string line = quoted(ZEB_PROGRAM);
+    for (const std::string& argument : arguments) {
+      line += " " + quoted(argument);
+    }
+    return shell(line);
+  }
+
+  void scanManual() const {
+    ASSERT_EQ(zeb({"scan", "--no-system", tests::shippedBook("manual")}).status, 0);
+  }
+
+  /// What the program writes, all in one, when it has a terminal.
+  std::string onTerminal(std::vector<std::string> arguments) const {
+    arguments.insert(arguments.begin(), ZEB_PROGRAM);
+    arguments.insert(arguments.end(), {"--cache-dir", files.path("cache")});
+    std::vector<char*> pointers;
+    for (std::string& argument : arguments) {
+      pointers.push_back(argument.data());
+    }
+    pointers.push_back(nullptr);
+    int terminal = -1;
+    const pid_t child = forkpty(&terminal, nullptr, nullptr, nullptr);
+    if (child == 0) {
+      ::unsetenv("NO_COLOR");  // NOLINT(concurrency-mt-unsafe)
+      execv(pointers[0], pointers.data());
+      _exit(127);
+    }
+    std::string output;
+    std::array<char, 4096> buffer{};
+    // At the end of the child the terminal reports an error instead of an end.
+    for (ssize_t count = 0; (count = read(terminal, buffer.data(), buffer.size())) > 0;) {
+      output.append(buffer.data(), static_cast<size_t>(count));
+    }
+    close(terminal);
+    int status = 0;
+    waitpid(child, &status, 0);
+    EXPECT_EQ(status, 0) << output;
+    return output;
+  }
+
+  tests::TemporaryFolder files;
+};
+
+TEST_F(ProgramTest, ExitStatusTellsFoundNothingUsageAndFailureApart) {
+  EXPECT_EQ(zeb({"search", "half"}).status, 3);
+  scanManual();
+  EXPECT_EQ(zeb({"search", "half"}).status, 0);
+  EXPECT_EQ(zeb({"search", "zebra"}).status, 1);
+  EXPECT_EQ(zeb({"search"}).status, 2);
+  EXPECT_EQ(zeb({}).status, 2);
+  EXPECT_EQ(zeb({"--help"}).status, 0);
+  EXPECT_EQ(zeb({"--version"}).status, 0);
+}
+
+TEST_F(ProgramTest, ErrorsGoToStandardErrorOnly) {
+  const ProgramRun run = zeb({"search", "half"});
+  EXPECT_EQ(run.out, "");
+  EXPECT_EQ(run.err, "zeb: error: no book has been indexed yet; 'zeb scan' looks for some\n");
+}
+
+TEST_F(ProgramTest, PipeIsPlainAndTerminalIsColoured) {
+  scanManual();
+  const ProgramRun piped = zeb({"search", "half"});
+  EXPECT_THAT(piped.out, Not(HasSubstr("\033")));
+  EXPECT_THAT(piped.out, HasSubstr("Search with words and half words"));
+  EXPECT_THAT(onTerminal({"search", "half"}),
+              HasSubstr("\033[1mSearch with words and half words\033[0m"));
+  EXPECT_THAT(onTerminal({"search", "half", "--color=never"}), Not(HasSubstr("\033")));
+}
+
+TEST_F(ProgramTest, NoColorVariableCountsUnlessItIsEmpty) {
+  scanManual();
+  const std::string program = quoted(ZEB_PROGRAM);
+  EXPECT_THAT(shell("NO_COLOR=1 " + program + " search half --color=always").out,
+              HasSubstr("\033[1m"));
+  // On a terminal of its own, which script gives it.
+  const std::string onItsTerminal =
+      " script -qec \"" + std::string(ZEB_PROGRAM) + " search half\" /dev/null";
+  if (shell("command -v script").status != 0) {
+    GTEST_SKIP() << "there is no script(1) to give the program a terminal";
+  }
+  EXPECT_THAT(shell("NO_COLOR=1" + onItsTerminal).out, Not(HasSubstr("\033")));
+  EXPECT_THAT(shell("NO_COLOR=" + onItsTerminal).out, HasSubstr("\033[1m"));
+}
+
+TEST_F(ProgramTest, ArgumentsThatAreNoTextAreRepaired) {
+  scanManual();
+  const ProgramRun run = zeb({"search", "--json", "caf\xE9\xFF half"});
+  EXPECT_EQ(run.status, 0);
+  EXPECT_EQ(nlohmann::json::parse(run.out)["query"], "caf\xEF\xBF\xBD\xEF\xBF\xBD half");
+}
+
+TEST_F(ProgramTest, FullDiskBehindTheOutputIsAFailure) {
+  scanManual();
+  const ProgramRun run = shell(quoted(ZEB_PROGRAM) + " search half >/dev/full");
+  EXPECT_EQ(run.status, 3);
+  EXPECT_THAT(run.err, HasSubstr("cannot write"));
+}
+
+TEST_F(ProgramTest, CachesFolderThatCannotBeMadeIsNamed) {
+  files.write("cache", "a file");
+  const ProgramRun run = zeb({"scan", "--no-system", tests::shippedBook("manual")});
+  EXPECT_EQ(run.status, 3);
+  EXPECT_THAT(run.err, HasSubstr("org.zeb.manual: cannot write"));
+}
+
+TEST_F(ProgramTest, IndexOfTheToolAndOfTheCommandAreTheSameBytes) {
+  const std::string ofTool = files.path("tool.helpindex");
+  const std::string ofCommand = files.path("command.helpindex");
+  const std::string manual = tests::shippedBook("manual");
+  ASSERT_EQ(shell(quoted(ZEB_TOOL) + " --create --anchors --generate-summaries --file " +
+                  quoted(ofTool) + " --min-term-length 3 " + quoted(manual))
+                .status,
+            0);
+  ASSERT_EQ(zeb({"index", manual, "-o", ofCommand}).status, 0);
+  std::ifstream a(ofTool, std::ios::binary);
+  std::ifstream b(ofCommand, std::ios::binary);
+  const std::string bytes((std::istreambuf_iterator<char>(a)), {});
+  EXPECT_FALSE(bytes.empty());
+  EXPECT_EQ(bytes, std::string((std::istreambuf_iterator<char>(b)), {}));
+}
+
+TEST_F(ProgramTest, TwoScansAtOnceBothSucceedAndLeaveAWholeCatalogue) {
+  const std::string scan = quoted(ZEB_PROGRAM) + " scan --force --no-system " +
+                           quoted(tests::shippedBook("manual")) + " " +
+                           quoted(tests::shippedBook("offline"));
+  const std::string cache = "export ZEB_CACHE_DIR=" + quoted(files.path("cache")) + "; ";
+  EXPECT_EQ(shell("true; " + cache + scan + " & " + scan +
+                  "; a=$?; wait $!; b=$?; "
+                  "test $a$b = 00")
+                .status,
+            0);
+  EXPECT_EQ(zeb({"search", "half"}).status, 0);
+  size_t count = 0;
+  for (const auto& file : std::filesystem::directory_iterator(files.path("cache/books"))) {
+    EXPECT_THAT(file.path().string(),
+                testing::AnyOf(testing::EndsWith(".plist"), testing::EndsWith(".helpindex")));
+    ++count;
+  }
+  EXPECT_EQ(count, 4U);
+}
+
+TEST_F(ProgramTest, DemonstrationSearchesWithoutAnyHelpOnTheComputer) {
+  const std::string demo = "ZEB_DEMO_ROOT=" + quoted(files.path("nothing")) + " " +
+                           quoted(std::string(ZEB_SOURCE_DIR) + "/scripts/demo") + " " +
+                           quoted(ZEB_BUILD_DIR);
+  const ProgramRun shown = shell(demo);
+  EXPECT_EQ(shown.status, 0) << shown.err;
+  EXPECT_THAT(shown.out, HasSubstr("Search with words and half words"));
+  EXPECT_THAT(shown.out, HasSubstr("not-connected.html"));
+  const ProgramRun searched = shell(demo + " 'hal wor'");
+  EXPECT_EQ(searched.status, 0) << searched.err;
+  EXPECT_THAT(searched.out, HasSubstr(" 1. Search with words and half words"));
+  EXPECT_EQ(shell(demo + " zebra").status, 1);
+}
+
+}  // namespace

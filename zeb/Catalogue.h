@@ -1,0 +1,73 @@
+// The list of books that can be searched, kept on the disk between runs.
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "platform/Error.h"
+
+namespace zeb {
+
+/// What is remembered of one book.
+struct CatalogueEntry {
+  /// A valid identifier (ZEBHelpBook::isValidBookID).
+  std::string bookID;
+  std::string title;
+  /// One of ZEBHelpBookType….
+  int32_t type = 1;
+  /// The folder that was given or found: what to look at when the book is scanned again.
+  std::string folder;
+  /// The page that opens the book. The pages in the index are relative to its folder
+  /// unless the index is a shipped one.
+  std::string accessPagePath;
+  /// The help-index file, in the catalogue's folder or elsewhere.
+  std::string indexPath;
+  /// As the folder of that language is named; empty where there is only one.
+  std::string language;
+  uint64_t pageCount = 0;
+  /// What the folder looked like when it was indexed; see folderFingerprint().
+  std::string fingerprint;
+  /// The index came with the book; its pages are relative to the folder that the index is in.
+  bool indexIsShipped = false;
+
+  friend bool operator==(const CatalogueEntry&, const CatalogueEntry&) = default;
+};
+
+/// The catalogue: one small property list a book in one folder, so that a damaged or half-removed
+/// file costs one book, and programs that add different books at once do not undo each other.
+///
+/// Nothing is cached: each call reads the disk. A file that is no property list, or not one that
+/// describes a book, is passed over as if it were not there.
+/// Thread-safety: immutable; what is on the disk is replaced file by file in one step.
+class Catalogue {
+ public:
+  /// The catalogue in `folder`, which is created when something is first stored.
+  explicit Catalogue(std::string folder) : _folder(std::move(folder)) {}
+
+  const std::string& folder() const noexcept { return _folder; }
+
+  /// All books, by identifier.
+  std::vector<CatalogueEntry> entries() const;
+
+  /// The book; absent when there is no usable file for it.
+  std::optional<CatalogueEntry> entry(const std::string& bookID) const;
+
+  /// Adds or replaces a book. On failure the earlier entry is untouched.
+  std::optional<platform::Error> store(const CatalogueEntry& entry) const;
+
+  /// Forgets a book, and deletes its index where that is in the catalogue's folder.
+  void remove(const CatalogueEntry& entry) const;
+
+  /// Where a book's index goes that is to be kept in the catalogue's folder.
+  std::string indexPathForBookID(std::string_view bookID) const;
+
+ private:
+  std::string _entryPath(std::string_view bookID) const;
+
+  std::string _folder;
+};
+
+}  // namespace zeb

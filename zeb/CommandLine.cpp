@@ -1,0 +1,212 @@
+#include "zeb/CommandLine.h"
+
+#include <CLI/CLI.hpp>
+#include <algorithm>
+#include <map>
+#include <ostream>
+#include <string_view>
+
+#ifndef ZEB_VERSION
+#define ZEB_VERSION "0"
+#endif
+
+namespace zeb {
+
+namespace {
+
+/// Put in front of arguments that the parser would take for something else than words: those with
+/// one hyphen and those in brackets, which it takes for lists. It is a byte that UTF-8 never has;
+/// what begins with it all the same gets another one, so that taking one away is always right.
+constexpr char wordMark = '\xFF';
+
+bool isCommand(std::string_view argument) {
+  static constexpr std::string_view commands[] = {"search", "anchor", "books", "index", "scan"};
+  return std::find(std::begin(commands), std::end(commands), argument) != std::end(commands);
+}
+
+bool isOption(std::string_view argument) { return argument.starts_with('-'); }
+
+/// The arguments in the order in which the parser wants them, which is from the last to the first,
+/// with marks where they are needed.
+std::vector<std::string> argumentsForParser(const std::vector<std::string>& arguments) {
+  std::vector<std::string> prepared;
+  std::string_view command;
+  bool onlyWords = false;
+  for (const std::string& argument : arguments) {
+    if (command.empty() && isCommand(argument)) {
+      command = argument;
+    }
+    const bool isForParser = !onlyWords && (argument.starts_with("--") ||
+                                            (command == "index" && argument.starts_with("-o")));
+    const bool isMistakable =
+        !argument.empty() && (argument[0] == '-' || argument[0] == '[' || argument[0] == wordMark);
+    prepared.push_back(isMistakable && !isForParser ? wordMark + argument : argument);
+    onlyWords = onlyWords || argument == "--";
+  }
+  std::reverse(prepared.begin(), prepared.end());
+  return prepared;
+}
+
+std::string unmarked(std::string argument) {
+  if (argument.starts_with(wordMark)) {
+    argument.erase(0, 1);
+  }
+  return argument;
+}
+
+/// The parser's description of this program's command line, and where it leaves what it finds.
+struct Parser {
+  Parser();
+
+  CLI::App app{"Finds pages in the help books on this computer.", "zeb"};
+  CLI::App* search = nullptr;
+  CLI::App* anchor = nullptr;
+  CLI::App* books = nullptr;
+  CLI::App* index = nullptr;
+  CLI::App* scan = nullptr;
+
+  CommandLine common;
+  std::string cacheFolder;
+  SearchCommand searchCommand;
+  AnchorCommand anchorCommand;
+  BooksCommand booksCommand;
+  IndexCommand indexCommand;
+  std::string output;
+  ScanCommand scanCommand;
+  bool noInstalledBooks = false;
+
+ private:
+  CLI::App* _addCommand(const std::string& name, const std::string& description);
+};
+
+CLI::App* Parser::_addCommand(const std::string& name, const std::string& description) {
+  CLI::App* command = app.add_subcommand(name, description);
+  command->fallthrough();
+  command->set_help_flag("--help", "Print this and exit");
+  return command;
+}
+
+Parser::Parser() {
+  const std::map<std::string, ColorMode> colors = {
+      {"auto", ColorMode::automatic}, {"always", ColorMode::always}, {"never", ColorMode::never}};
+  app.require_subcommand(1);
+  app.set_help_flag("--help", "Print this and exit");
+  app.set_version_flag("--version", "zeb " ZEB_VERSION);
+  app.add_option("--color", common.color, "Colours: auto, always or never")
+      ->transform(CLI::CheckedTransformer(colors).description(""))
+      ->option_text("WHEN");
+  app.add_option("--cache-dir", cacheFolder, "The folder for indexes and the list of books")
+      ->envname("ZEB_CACHE_DIR")
+      ->option_text("DIR");
+  app.add_flag("--verbose", common.verbosity, "Say more; may be repeated");
+  app.footer(
+      "Exit status: 0 something was found, 1 nothing was found, 2 the command line is wrong,\n"
+      "3 failure.");
+
+  search = _addCommand("search", "Find pages by words or the beginnings of words");
+  search->add_option("words", searchCommand.words, "What to look for")
+      ->required()
+      ->option_text("WORDS...");
+  search->add_option("--book", searchCommand.books, "Only in this book; may be repeated")
+      ->allow_extra_args(false)
+      ->option_text("ID");
+  search->add_option("--limit", searchCommand.limit, "Show at most this many pages (10)")
+      ->check(CLI::Range(size_t{1}, size_t{1'000'000}).description(""))
+      ->option_text("N");
+  search->add_flag("--json", searchCommand.json, "Write one JSON object");
+
+  anchor = _addCommand("anchor", "Find the pages that carry an anchor");
+  anchor->add_option("name", anchorCommand.name, "The anchor, exactly as written")
+      ->required()
+      ->option_text("NAME");
+  anchor->add_option("--book", anchorCommand.books, "Only in this book; may be repeated")
+      ->allow_extra_args(false)
+      ->option_text("ID");
+  anchor->add_flag("--json", anchorCommand.json, "Write one JSON object");
+
+  books = _addCommand("books", "List the books that can be searched");
+  books->add_flag("--json", booksCommand.json, "Write one JSON object");
+
+  index = _addCommand("index", "Index folders and make them books");
+  index->add_option("folders", indexCommand.folders, "Folders of help pages")
+      ->required()
+      ->option_text("FOLDER...");
+  index->add_option("--book-id", indexCommand.bookIDs, "Identifier of the book; one a folder")
+      ->allow_extra_args(false)
+      ->option_text("ID");
+  index->add_option("-o,--output", output, "The index file; for several folders, a folder")
+      ->option_text("FILE");
+
+  scan = _addCommand("scan", "Index the books that are installed, and the given folders");
+  scan->add_option("folders", scanCommand.folders, "Further folders of help pages")
+      ->option_text("FOLDER...");
+  scan->add_option("--root", scanCommand.root, "Look for installed books below this folder")
+      ->option_text("DIR");
+  scan->add_flag("--no-system", noInstalledBooks, "Do not look for installed books");
+  scan->add_option("--language", scanCommand.languages, "Preferred language; may be repeated")
+      ->allow_extra_args(false)
+      ->option_text("TAG");
+  scan->add_flag("--force", scanCommand.evenIfUnchanged, "Index unchanged books, too");
+}
+
+void unmark(std::vector<std::string>& arguments) {
+  for (std::string& argument : arguments) {
+    argument = unmarked(std::move(argument));
+  }
+}
+
+}  // namespace
+
+std::optional<CommandLine> parseCommandLine(const std::vector<std::string>& arguments,
+                                            Console& console, ExitCode& exitCode) {
+  Parser parser;
+  try {
+    parser.app.parse(argumentsForParser(arguments));
+  } catch (const CLI::Success& success) {
+    parser.app.exit(success, console.out(), console.err());
+    exitCode = ExitCode::success;
+    return std::nullopt;
+  } catch (const CLI::ParseError& error) {
+    const auto word = std::find_if_not(arguments.begin(), arguments.end(), isOption);
+    if (word != arguments.end() && std::none_of(arguments.begin(), arguments.end(), isCommand)) {
+      console.error("there is no command \"" + *word + "\"");
+    } else {
+      console.error(error.what());
+    }
+    console.note("'zeb --help' and 'zeb COMMAND --help' say more");
+    exitCode = ExitCode::usage;
+    return std::nullopt;
+  }
+
+  CommandLine line = parser.common;
+  if (!parser.cacheFolder.empty()) {
+    line.cacheFolder = unmarked(parser.cacheFolder);
+  }
+  if (parser.search->parsed()) {
+    unmark(parser.searchCommand.words);
+    unmark(parser.searchCommand.books);
+    line.command = parser.searchCommand;
+  } else if (parser.anchor->parsed()) {
+    parser.anchorCommand.name = unmarked(parser.anchorCommand.name);
+    unmark(parser.anchorCommand.books);
+    line.command = parser.anchorCommand;
+  } else if (parser.books->parsed()) {
+    line.command = parser.booksCommand;
+  } else if (parser.index->parsed()) {
+    unmark(parser.indexCommand.folders);
+    unmark(parser.indexCommand.bookIDs);
+    if (!parser.output.empty()) {
+      parser.indexCommand.output = unmarked(parser.output);
+    }
+    line.command = parser.indexCommand;
+  } else {
+    unmark(parser.scanCommand.folders);
+    unmark(parser.scanCommand.languages);
+    parser.scanCommand.root = unmarked(parser.scanCommand.root);
+    parser.scanCommand.installedBooks = !parser.noInstalledBooks;
+    line.command = parser.scanCommand;
+  }
+  return line;
+}
+
+}  // namespace zeb

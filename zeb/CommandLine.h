@@ -1,0 +1,77 @@
+// What the user typed, understood.
+#pragma once
+
+#include <cstddef>
+#include <optional>
+#include <string>
+#include <variant>
+#include <vector>
+
+#include "zeb/Console.h"
+
+namespace zeb {
+
+/// What the program's exit status says.
+enum class ExitCode : int {
+  /// Something was found, or the work is done.
+  success = 0,
+  nothingFound = 1,
+  /// The command line is wrong; nothing was done.
+  usage = 2,
+  failure = 3,
+};
+
+struct SearchCommand {
+  std::vector<std::string> words;
+  /// Only these books; all where there is none.
+  std::vector<std::string> books;
+  size_t limit = 10;
+  bool json = false;
+};
+
+struct AnchorCommand {
+  std::string name;
+  std::vector<std::string> books;
+  bool json = false;
+};
+
+struct BooksCommand {
+  bool json = false;
+};
+
+struct IndexCommand {
+  std::vector<std::string> folders;
+  /// None, or one a folder.
+  std::vector<std::string> bookIDs;
+  /// A file for one folder, a folder for several.
+  std::optional<std::string> output;
+};
+
+struct ScanCommand {
+  std::vector<std::string> folders;
+  /// Where the computer's installed books are looked for.
+  std::string root = "/";
+  bool installedBooks = true;
+  /// In place of the user's; best first.
+  std::vector<std::string> languages;
+  bool evenIfUnchanged = false;
+};
+
+struct CommandLine {
+  std::variant<SearchCommand, AnchorCommand, BooksCommand, IndexCommand, ScanCommand> command;
+  ColorMode color = ColorMode::automatic;
+  /// The folder for indexes and the catalogue, when the user names one.
+  std::optional<std::string> cacheFolder;
+  int verbosity = 0;
+};
+
+/// The command line behind `arguments` (the program's name not among them). Absent when there is
+/// nothing left to do: help or version were asked for and have been printed, or the line is wrong
+/// and that has been said; `exitCode` is then set.
+///
+/// Words of a search may begin with one hyphen, as the query language has it; arguments that begin
+/// with two are options, and behind "--" everything is a word.
+std::optional<CommandLine> parseCommandLine(const std::vector<std::string>& arguments,
+                                            Console& console, ExitCode& exitCode);
+
+}  // namespace zeb

@@ -1,0 +1,115 @@
+#include "zeb/Output.h"
+
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <nlohmann/json.hpp>
+#include <ostream>
+#include <string>
+
+#include "platform/Strings.h"
+
+namespace zeb {
+
+namespace {
+
+using JSON = nlohmann::ordered_json;
+
+void printJSON(const JSON& object, Console& console) {
+  console.out() << object.dump(2, ' ', false, JSON::error_handler_t::replace) << '\n';
+}
+
+JSON text(std::string_view bytes) { return platform::stringByRepairingUTF8(bytes); }
+
+}  // namespace
+
+void printAnswer(const Answer& answer, Console& console) {
+  const size_t numberWidth = std::to_string(answer.pages.size()).size();
+  const std::string indent(numberWidth + 2, ' ');
+  size_t number = 0;
+  for (const FoundPage& page : answer.pages) {
+    ++number;
+    if (number > 1) {
+      console.out() << '\n';
+    }
+    console.out() << fmt::format("{:>{}}. ", number, numberWidth)
+                  << console.styled(Style::title, singleLine(page.title)) << "  "
+                  << console.styled(Style::book, singleLine(page.bookTitle)) << '\n';
+    if (page.abstract && !page.abstract->empty()) {
+      console.out() << indent << singleLine(*page.abstract) << '\n';
+    }
+    console.out() << indent << console.styled(Style::url, singleLine(page.url)) << '\n';
+  }
+  if (answer.count > answer.pages.size()) {
+    const size_t more = answer.count - answer.pages.size();
+    console.out() << '\n'
+                  << console.styled(Style::label,
+                                    fmt::format("{} more {}", more, more == 1 ? "page" : "pages"))
+                  << '\n';
+  }
+}
+
+void printAnswerAsJSON(std::string_view query, const Answer& answer, Console& console) {
+  JSON results = JSON::array();
+  for (const FoundPage& page : answer.pages) {
+    JSON result;
+    result["title"] = text(page.title);
+    result["book"] = text(page.bookID);
+    result["bookTitle"] = text(page.bookTitle);
+    if (page.abstract) {
+      result["abstract"] = text(*page.abstract);
+    }
+    result["url"] = text(page.url);
+    result["relevance"] = page.relevance;
+    results.push_back(std::move(result));
+  }
+  JSON object;
+  object["query"] = text(query);
+  object["count"] = answer.count;
+  object["results"] = std::move(results);
+  printJSON(object, console);
+}
+
+void printBooks(const std::vector<ListedBook>& books, Console& console) {
+  const auto pages = [](const ListedBook& book) {
+    return book.hasIndex ? fmt::format("{} pages", book.entry.pageCount) : std::string("no index");
+  };
+  size_t idWidth = 0;
+  size_t languageWidth = 0;
+  size_t pagesWidth = 0;
+  for (const ListedBook& book : books) {
+    idWidth = std::max(idWidth, singleLine(book.entry.bookID).size());
+    languageWidth = std::max(languageWidth, singleLine(book.entry.language).size());
+    pagesWidth = std::max(pagesWidth, pages(book).size());
+  }
+  for (const ListedBook& book : books) {
+    console.out() << console.styled(Style::book,
+                                    fmt::format("{:<{}}", singleLine(book.entry.bookID), idWidth))
+                  << fmt::format("  {:<{}}  ", singleLine(book.entry.language), languageWidth)
+                  << console.styled(book.hasIndex ? Style::label : Style::error,
+                                    fmt::format("{:>{}}", pages(book), pagesWidth))
+                  << "  " << console.styled(Style::title, singleLine(book.entry.title)) << '\n';
+  }
+}
+
+void printBooksAsJSON(const std::vector<ListedBook>& books, Console& console) {
+  JSON list = JSON::array();
+  for (const ListedBook& book : books) {
+    JSON entry;
+    entry["id"] = text(book.entry.bookID);
+    entry["title"] = text(book.entry.title);
+    entry["type"] = book.entry.type;
+    entry["language"] = text(book.entry.language);
+    entry["folder"] = text(book.entry.folder);
+    entry["index"] = text(book.entry.indexPath);
+    entry["pages"] = book.entry.pageCount;
+    entry["indexed"] = book.hasIndex;
+    list.push_back(std::move(entry));
+  }
+  JSON object;
+  object["count"] = books.size();
+  object["books"] = std::move(list);
+  printJSON(object, console);
+}
+
+}  // namespace zeb

@@ -1,0 +1,35 @@
+// What answers and books look like, for people and for programs.
+#pragma once
+
+#include <cstddef>
+#include <string_view>
+#include <vector>
+
+#include "zeb/Catalogue.h"
+#include "zeb/Console.h"
+#include "zeb/HelpSearch.h"
+
+namespace zeb {
+
+/// Numbered pages with title, book, abstract and URL, and a last line that says how many more there
+/// are. Nothing at all for an answer without pages. What comes from books is made single lines.
+void printAnswer(const Answer& answer, Console& console);
+
+/// One JSON object: "query", "count", "results" (each with "title", "book", "bookTitle",
+/// "abstract" where there is one, "url", "relevance").
+void printAnswerAsJSON(std::string_view query, const Answer& answer, Console& console);
+
+/// A book as it is listed.
+struct ListedBook {
+  CatalogueEntry entry;
+  bool hasIndex = false;
+};
+
+/// One line a book: identifier, language, number of pages, title.
+void printBooks(const std::vector<ListedBook>& books, Console& console);
+
+/// One JSON object: "count", "books" (each with "id", "title", "type", "language", "folder",
+/// "index", "pages", "indexed").
+void printBooksAsJSON(const std::vector<ListedBook>& books, Console& console);
+
+}  // namespace zeb
