@@ -1,11 +1,17 @@
 # One library a room, one test program a room, one fuzz target a parser.
 include(GoogleTest)
 
-# zeb_room(NAME SOURCES … USES …): a static library that other rooms may link, and nothing more
-# than what its USES name (headers are found from the top folder).
+# zeb_room(NAME [SHARED] SOURCES … USES …): a library that other rooms may link, and nothing more
+# than what its USES name (headers are found from the top folder). Static, but SHARED for the rooms
+# whose state a program and the bundles that it loads must have in common.
 function(zeb_room name)
-  cmake_parse_arguments(ROOM "" "" "SOURCES;USES" ${ARGN})
-  add_library(${name} STATIC ${ROOM_SOURCES})
+  cmake_parse_arguments(ROOM "SHARED" "" "SOURCES;USES" ${ARGN})
+  if(ROOM_SHARED)
+    add_library(${name} SHARED ${ROOM_SOURCES})
+    set_target_properties(${name} PROPERTIES OUTPUT_NAME zeb-${name})
+  else()
+    add_library(${name} STATIC ${ROOM_SOURCES})
+  endif()
   target_include_directories(${name} PUBLIC ${PROJECT_SOURCE_DIR})
   target_link_libraries(${name} PUBLIC ${ROOM_USES})
 endfunction()

@@ -4,7 +4,7 @@ set(CMAKE_CXX_STANDARD_REQUIRED ON)
 set(CMAKE_CXX_EXTENSIONS OFF)
 set(CMAKE_POSITION_INDEPENDENT_CODE ON)
 
-set(CMAKE_CXX_FLAGS_DEV "-O1 -g1" CACHE STRING "Flags of the Dev build type")
+set(CMAKE_CXX_FLAGS_DEV "-O1 -g1" CACHE STRING "Flags of the Dev build type" FORCE)
 set(CMAKE_CXX_FLAGS_RELEASE "-O2 -DNDEBUG" CACHE STRING "Flags of the Release build type" FORCE)
 
 set(ZEB_SANITIZE "" CACHE STRING "Value for -fsanitize, empty for none")

@@ -1,6 +1,8 @@
 #include "platform/Clock.h"
 
+#include <algorithm>
 #include <thread>
+#include <utility>
 
 namespace platform {
 
@@ -19,6 +21,12 @@ class SystemClock final : public Clock {
       std::this_thread::sleep_for(duration);
     }
   }
+
+  std::optional<Seconds> realTimeUntil(Instant deadline) const override {
+    return std::max(Seconds::zero(), deadline - elapsed());
+  }
+
+  void addListener(std::weak_ptr<ClockListener> /*listener*/) override {}
 };
 
 }  // namespace
@@ -52,11 +60,44 @@ void SimulatedClock::sleep(Seconds duration) {
   --_sleepers;
 }
 
-void SimulatedClock::advance(Seconds duration) {
+std::optional<Seconds> SimulatedClock::realTimeUntil(Instant deadline) const {
+  return elapsed() >= deadline ? std::optional<Seconds>(Seconds::zero()) : std::nullopt;
+}
+
+void SimulatedClock::addListener(std::weak_ptr<ClockListener> listener) {
   const std::lock_guard lock(_mutex);
-  _elapsed += duration;
-  _now += std::chrono::duration_cast<std::chrono::system_clock::duration>(duration);
-  _moved.notify_all();
+  std::erase_if(_listeners, [&](const auto& known) {
+    const bool same = !known.owner_before(listener) && !listener.owner_before(known);
+    return same || known.expired();
+  });
+  _listeners.push_back(std::move(listener));
+}
+
+void SimulatedClock::timedWaitBegins() {
+  const std::lock_guard lock(_mutex);
+  ++_sleepers;
+  _sleepersChanged.notify_all();
+}
+
+void SimulatedClock::timedWaitEnds() {
+  const std::lock_guard lock(_mutex);
+  --_sleepers;
+}
+
+void SimulatedClock::advance(Seconds duration) {
+  std::vector<std::weak_ptr<ClockListener>> listeners;
+  {
+    const std::lock_guard lock(_mutex);
+    _elapsed += duration;
+    _now += std::chrono::duration_cast<std::chrono::system_clock::duration>(duration);
+    _moved.notify_all();
+    listeners = _listeners;
+  }
+  for (const auto& weak : listeners) {
+    if (const auto listener = weak.lock()) {
+      listener->clockMoved();
+    }
+  }
 }
 
 void SimulatedClock::setNow(std::chrono::system_clock::time_point now) {

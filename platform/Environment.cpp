@@ -4,9 +4,15 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cstdio>
 #include <cstdlib>
 #include <mutex>
 #include <string_view>
+#include <thread>
+
+#include "platform/DistributedNotificationCenter.h"
+#include "platform/Processes.h"
+#include "platform/UserDefaults.h"
 
 namespace platform {
 
@@ -54,20 +60,21 @@ std::vector<std::string> languagesOfTheUser() {
   return languages;
 }
 
-std::optional<std::string> cachesFolderOfTheUser() {
+/// The folder that the variable `name` gives, else `standard` in the user's home folder.
+std::optional<std::string> folderOfTheUser(const char* name, const char* standard) {
   // A relative path is to be ignored, says the base-directory convention.
-  if (const std::string caches = variable("XDG_CACHE_HOME"); caches.starts_with('/')) {
-    return caches;
+  if (const std::string folder = variable(name); folder.starts_with('/')) {
+    return folder;
   }
   if (const std::string home = variable("HOME"); home.starts_with('/')) {
-    return stringByAppendingPathComponent(home, ".cache");
+    return stringByAppendingPathComponent(home, standard);
   }
   passwd record{};
   passwd* found = nullptr;
   char buffer[4096];
   if (getpwuid_r(getuid(), &record, buffer, sizeof buffer, &found) == 0 && found != nullptr &&
       found->pw_dir != nullptr && found->pw_dir[0] == '/') {
-    return stringByAppendingPathComponent(found->pw_dir, ".cache");
+    return stringByAppendingPathComponent(found->pw_dir, standard);
   }
   return std::nullopt;
 }
@@ -90,7 +97,19 @@ Environment Environment::system() {
   environment.files = systemFileManager();
   environment.log = standardErrorLogSink(2);
   environment.preferredLanguages = languagesOfTheUser();
-  environment.cachesDirectory = cachesFolderOfTheUser();
+  environment.cachesDirectory = folderOfTheUser("XDG_CACHE_HOME", ".cache");
+  environment.processLauncher = systemProcessLauncher();
+  environment.processTable = systemProcessTable();
+  const auto settings = folderOfTheUser("XDG_CONFIG_HOME", ".config");
+  environment.userDefaults = settings ? userDefaultsFromFile(*settings + "/zeb/settings.plist")
+                                      : userDefaultsFromDictionary({});
+  environment.notificationCenter = localNotificationCenter();
+  environment.standardOutput = [](const std::string& text) {
+    std::fwrite(text.data(), 1, text.size(), stdout);
+  };
+  environment.processorCount = [] {
+    return std::max(1, static_cast<int>(std::thread::hardware_concurrency()));
+  };
   return environment;
 }
 

@@ -1,6 +1,7 @@
 // The outside world, gathered in one place so that tests can replace any part of it.
 #pragma once
 
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
@@ -12,6 +13,11 @@
 
 namespace platform {
 
+class DistributedNotificationCenter;
+class ProcessLauncher;
+class ProcessTable;
+class UserDefaults;
+
 /// What the process runs in. Code asks Environment::current() and never the operating system
 /// beside it. Thread-safety: an Environment in use is immutable; current() may be called from any
 /// thread, and replacing it (EnvironmentOverride) is for the start of a program and for tests.
@@ -19,6 +25,15 @@ struct Environment {
   std::shared_ptr<Clock> clock;
   std::shared_ptr<FileManager> files;
   std::shared_ptr<LogSink> log;
+  std::shared_ptr<ProcessLauncher> processLauncher;
+  std::shared_ptr<ProcessTable> processTable;
+  std::shared_ptr<UserDefaults> userDefaults;
+  std::shared_ptr<DistributedNotificationCenter> notificationCenter;
+
+  /// Takes what code prints for people. A host that prints results of its own sends this elsewhere.
+  std::function<void(const std::string& text)> standardOutput;
+  /// Number of processors; 1 where that cannot be told.
+  std::function<int()> processorCount;
 
   /// Language tags, the user's favourite first; never empty.
   std::vector<std::string> preferredLanguages;
@@ -26,8 +41,10 @@ struct Environment {
   /// The user's caches folder; absent when there is none (no home folder).
   std::optional<std::string> cachesDirectory;
 
-  /// The real world: system clock and files, log on standard error up to level 2, languages from
-  /// LANGUAGE, LC_ALL, LC_MESSAGES and LANG, caches folder from XDG_CACHE_HOME or HOME.
+  /// The real world: system clock, files and processes, log on standard error up to level 2,
+  /// languages from LANGUAGE, LC_ALL, LC_MESSAGES and LANG, caches folder from XDG_CACHE_HOME or
+  /// HOME, settings from zeb/settings.plist under XDG_CONFIG_HOME or HOME, and notifications within
+  /// this process only (busNotificationCenter() reaches further).
   static Environment system();
 
   /// The environment in force; the real one until it is replaced.

@@ -28,6 +28,7 @@ class Exception : public std::exception {
 
 inline constexpr const char* rangeException = "RangeException";
 inline constexpr const char* invalidArgumentException = "InvalidArgumentException";
+inline constexpr const char* internalInconsistencyException = "InternalInconsistencyException";
 inline constexpr const char* inconsistentArchiveException = "InconsistentArchiveException";
 
 /// Bytes that are not what they claim to be, and the place at which that showed. The reason

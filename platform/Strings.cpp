@@ -131,6 +131,39 @@ int localizedCaseInsensitiveCompare(std::string_view a, std::string_view b,
   return U_FAILURE(status) ? caseInsensitiveCompare(a, b) : static_cast<int>(result);
 }
 
+int numericCompare(std::string_view a, std::string_view b) {
+  const auto isDigit = [](std::string_view s) {
+    return !s.empty() && s.front() >= '0' && s.front() <= '9';
+  };
+  // A number is compared as its digits without leading zeros: first their count, then themselves.
+  const auto takeNumber = [&](std::string_view& s) {
+    while (s.starts_with('0')) {
+      s.remove_prefix(1);
+    }
+    const size_t length = std::min(s.find_first_not_of("0123456789"), s.size());
+    const std::string_view digits = s.substr(0, length);
+    s.remove_prefix(length);
+    return digits;
+  };
+  while (!a.empty() && !b.empty()) {
+    int order = 0;
+    if (isDigit(a) && isDigit(b)) {
+      const std::string_view left = takeNumber(a);
+      const std::string_view right = takeNumber(b);
+      order =
+          left.size() != right.size() ? (left.size() < right.size() ? -1 : 1) : left.compare(right);
+    } else {
+      order = static_cast<unsigned char>(a.front()) - static_cast<unsigned char>(b.front());
+      a.remove_prefix(1);
+      b.remove_prefix(1);
+    }
+    if (order != 0) {
+      return order;
+    }
+  }
+  return static_cast<int>(!a.empty()) - static_cast<int>(!b.empty());
+}
+
 bool isValidUTF8(std::string_view bytes) noexcept {
   bool valid = true;
   forEachCharacter(bytes, [&](const Character& character) {

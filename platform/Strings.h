@@ -28,6 +28,10 @@ int caseInsensitiveCompare(std::string_view a, std::string_view b);
 int localizedCaseInsensitiveCompare(std::string_view a, std::string_view b,
                                     std::string_view language = {});
 
+/// Below, equal to or above zero; runs of ASCII digits compare by their value ("1.10" is above
+/// "1.2"), all else by bytes.
+int numericCompare(std::string_view a, std::string_view b);
+
 /// Whether the bytes are well-formed UTF-8.
 bool isValidUTF8(std::string_view bytes) noexcept;
 

@@ -62,7 +62,7 @@ class Value {
   /// Ordered by key, so that everything that walks one does so the same way each time.
   using Dictionary = std::map<std::string, Value, std::less<>>;
 
-  Value() noexcept = default;
+  Value() noexcept : _bits(0) {}
   Value(bool boolean) noexcept;
   template <typename Integer>
   requires(std::is_integral_v<Integer> && !std::is_same_v<Integer, bool>) Value(Integer integer)
@@ -142,7 +142,7 @@ class Value {
   bool _negative = false;
   union {
     bool _boolean;
-    uint64_t _bits = 0;
+    uint64_t _bits;
     double _real;
     Date _date;
     UID _uid;

@@ -4,6 +4,8 @@
 #include <chrono>
 #include <cmath>
 #include <limits>
+#include <thread>
+#include <vector>
 
 #include "platform/PropertyList.h"
 
@@ -287,6 +289,21 @@ TEST(PropertyListXML, readsTextOfMoreThanTenMegabytes) {
   ASSERT_TRUE(data && data->dataIf());
   EXPECT_EQ(data->dataIf()->length(), text.size() / 4 * 3);
   EXPECT_EQ(readContent("<string>" + text + "</string>"), Value(text));
+}
+
+TEST(PropertyListXML, isReadByManyThreadsAtOnce) {
+  std::vector<std::thread> threads;
+  for (int i = 0; i < 4; ++i) {
+    threads.emplace_back([] {
+      for (int j = 0; j < 200; ++j) {
+        EXPECT_EQ(readContent("<array><integer>1</integer></array>"), Value(Value::Array{1}));
+        EXPECT_FALSE(readContent("<array><integer>x</integer></array>"));
+      }
+    });
+  }
+  for (std::thread& thread : threads) {
+    thread.join();
+  }
 }
 
 TEST(PropertyListXML, refusesTagsOfManyAttributesAtOnce) {
