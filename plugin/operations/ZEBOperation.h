@@ -8,11 +8,11 @@
 #include "platform/Operation.h"
 #include "platform/ThreadSafety.h"
 
-/// An operation that ends when somebody calls finishWithError() or cancel(), on whatever thread that
-/// is. A subclass supplies main(), begins its asynchronous work there, and sees to it that exactly one
-/// of the two is called when the work is over. It keeps its own flags behind one lock and announces
-/// every change of them under the key names that an operation queue observes; the lock is held around
-/// the assignments alone, never while an observer runs.
+/// An operation that ends when somebody calls finishWithError() or cancel(), on whatever thread
+/// that is. A subclass supplies main(), begins its asynchronous work there, and sees to it that
+/// exactly one of the two is called when the work is over. It keeps its own flags behind one lock
+/// and announces every change of them under the key names that an operation queue observes; the
+/// lock is held around the assignments alone, never while an observer runs.
 ///
 /// There is no guard against ending twice: the second call stores its error and repeats the
 /// announcements.
@@ -26,12 +26,12 @@ class ZEBOperation : public platform::Operation {
   /// Ends the operation with an outcome; absent is success.
   void finishWithError(std::optional<platform::Error> error);
 
-  /// Marks the operation as cancelled and over, at once and in whatever state it is. It does not stop
-  /// the work of a subclass; one that owns such work overrides this.
+  /// Marks the operation as cancelled and over, at once and in whatever state it is. It does not
+  /// stop the work of a subclass; one that owns such work overrides this.
   void cancel() override;
 
-  /// Finishes an operation that was cancelled before; otherwise marks it as executing and calls main()
-  /// on this thread. The operation goes on after the return.
+  /// Finishes an operation that was cancelled before; otherwise marks it as executing and calls
+  /// main() on this thread. The operation goes on after the return.
   void start() override;
 
   bool isAsynchronous() const override { return true; }

@@ -47,9 +47,10 @@ void ZEBOperationQueueCountObserver::setOperationQueue(
   _operationQueue = queue;
 }
 
-void ZEBOperationQueueCountObserver::observeValueForKeyPath(
-    std::string_view keyPath, platform::KeyValueObservable& object,
-    const platform::KeyValueChange& change, void* context) {
+void ZEBOperationQueueCountObserver::observeValueForKeyPath(std::string_view keyPath,
+                                                            platform::KeyValueObservable& object,
+                                                            const platform::KeyValueChange& change,
+                                                            void* context) {
   if (keyPath != operationCountKey) {
     KeyValueObserver::observeValueForKeyPath(keyPath, object, change, context);
     return;

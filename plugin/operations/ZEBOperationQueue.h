@@ -9,8 +9,8 @@
 
 class ZEBOperationQueue;
 
-/// Watches a queue's operation count and calls a block on the main queue whenever the count falls from
-/// another value to zero. It observes only while the queue has it do so, see
+/// Watches a queue's operation count and calls a block on the main queue whenever the count falls
+/// from another value to zero. It observes only while the queue has it do so, see
 /// ZEBOperationQueue::setCompletionBlock().
 /// Thread-safety: internally synchronised; lastOperationCount() belongs to the main queue.
 class ZEBOperationQueueCountObserver
@@ -48,9 +48,9 @@ class ZEBOperationQueueCountObserver
   uint64_t _lastOperationCount = 0;
 };
 
-/// An operation queue with a block that runs on the main queue each time the number of operations falls
-/// to zero. The main thread must be running its loop for that.
-/// Thread-safety: internally synchronised.
+/// An operation queue with a block that runs on the main queue each time the number of operations
+/// falls to zero. The main thread must be running its loop for that. Thread-safety: internally
+/// synchronised.
 class ZEBOperationQueue : public platform::OperationQueue {
  public:
   using Block = ZEBOperationQueueCountObserver::Block;

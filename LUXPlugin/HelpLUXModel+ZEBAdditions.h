@@ -1,0 +1,21 @@
+// The model operations that the plug-in uses for books with versioned identifiers.
+#pragma once
+
+#include <string>
+#include <string_view>
+
+#include "host/Luxwell/HelpLUXModel.h"
+#include "host/Zebrine/ZEBHelpBook.h"
+
+// Each reduces the identifier to its unversioned form first, so that versions never reach the
+// semantic framework.
+
+inline std::string zeb_modelGroupNameForHelpbookID(std::string_view helpbookID) {
+  return HelpLUXModel::modelGroupNameForHelpbookID(
+      ZEBHelpBook::unversionedbookIDFromBookID(helpbookID));
+}
+
+inline float zeb_combiningWeightForHelpbookID(std::string_view helpbookID) {
+  return HelpLUXModel::combiningWeightForHelpbookID(
+      ZEBHelpBook::unversionedbookIDFromBookID(helpbookID));
+}
