@@ -173,12 +173,10 @@ TEST_P(ShippedBooksTest, ExactMatchListLeadsToAnchorsAndHasOnlyKeysThatCanBeFoun
 
 TEST_P(ShippedBooksTest, SuggestionsLeadToAnchors) {
   const auto path = ZEBHelpBook::initWithPath(folder)->suggestionsPath();
-  if (!path) {
-    GTEST_SKIP() << "the book has no suggestions";
-  }
+  ASSERT_TRUE(path.has_value());
   const Value list = platform::dictionaryWithContentsOfFile(*path).value();
   const std::set<std::string> known = anchors();
-  EXPECT_GE(list.dictionaryIf()->size(), 10U);
+  EXPECT_GE(list.dictionaryIf()->size(), 3U);
   for (const auto& [key, texts] : *list.dictionaryIf()) {
     EXPECT_EQ(platform::lowercaseString(key), key);
     ASSERT_NE(texts.dictionaryIf(), nullptr) << key;
