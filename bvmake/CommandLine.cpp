@@ -52,7 +52,7 @@ ParsedCommandLine parseCommandLine(const std::vector<std::string>& arguments) {
   app.add_option("--min-term-length", create.minimumTermLength,
                  "Leave terms of fewer than N characters out")
       ->type_name("N")
-      ->check(CLI::Range(size_t{0}, longestMinimumTermLength));
+      ->check(CLI::Range(size_t{0}, longestMinimumTermLength).description(""));
   app.add_flag("--append-LUX-only", create.appendLUXOnly,
                "Add only semantic data to the file there (refused by this version)");
   app.add_flag("--lowered-priority", create.loweredPriority,

@@ -53,7 +53,9 @@ class Walk {
         continue;
       }
       for (const std::string& name : *names) {
-        _visit(path + "/" + name, name, waiting);
+        std::string child = path;
+        child.append("/").append(name);
+        _visit(std::move(child), name, waiting);
       }
     }
     _followLinks();

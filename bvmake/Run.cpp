@@ -2,6 +2,7 @@
 
 #include <fmt/format.h>
 
+#include <filesystem>
 #include <optional>
 #include <string_view>
 #include <utility>
@@ -86,9 +87,12 @@ class Run {
   }
 
   bool _prepareOutput() {
-    bool isFolder = false;
-    if (_files->fileExistsAtPath(_options.outputPath, &isFolder) && isFolder) {
-      _fail(fmt::format("cannot write {}: it is a folder", _options.outputPath));
+    // Renaming over it would do away with a device or a pipe.
+    std::error_code ignored;
+    const std::filesystem::file_status former =
+        std::filesystem::status(_options.outputPath, ignored);
+    if (std::filesystem::exists(former) && !std::filesystem::is_regular_file(former)) {
+      _fail(fmt::format("cannot write {}: what is there is no regular file", _options.outputPath));
       return false;
     }
     const std::string folder = platform::stringByDeletingLastPathComponent(_options.outputPath);
@@ -156,7 +160,7 @@ class Run {
 
   Outcome _write() {
     if (_outcome.pageCount == 0) {
-      _report.warning(fmt::format("no help pages in {}; the index is empty", _options.folder));
+      _report.warning(fmt::format("nothing to index in {}; the index is empty", _options.folder));
     }
     _outcome.anchorCount = _anchors.count();
     const platform::Data file =

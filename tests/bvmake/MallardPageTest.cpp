@@ -1,5 +1,6 @@
 #include "bvmake/MallardPage.h"
 
+#include <fmt/format.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -144,8 +145,7 @@ TEST(MallardPage, entitiesThatHoldMarkupOrEntitiesVanish) {
 TEST(MallardPage, entityBombsDoNotGoOff) {
   std::string bomb = "<!DOCTYPE page [<!ENTITY a0 'lol'>";
   for (int i = 1; i < 30; ++i) {
-    const std::string former = "&a" + std::to_string(i - 1) + ";";
-    bomb += "<!ENTITY a" + std::to_string(i) + " '" + former + former + former + former + "'>";
+    bomb += fmt::format("<!ENTITY a{0} '&a{1};&a{1};&a{1};&a{1};'>", i, i - 1);
   }
   const Page result = read(bomb + "]>" + page("<title>t</title><p>&a29;</p>"));
   EXPECT_THAT(result.body, IsEmpty());

@@ -37,7 +37,7 @@ TEST(MarkupGuard, countsAttributesWithoutBlanksBetweenThem) {
 }
 
 TEST(MarkupGuard, countsPiecesOfNamesThatTheParserCuts) {
-  EXPECT_TRUE(isRefused("<p " + std::string(100 * 257, 'a') + ">", Markup::html));
+  EXPECT_TRUE(isRefused("<p " + std::string(size_t{100} * 257, 'a') + ">", Markup::html));
 }
 
 TEST(MarkupGuard, longValuesAreOneAttribute) {

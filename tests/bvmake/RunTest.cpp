@@ -1,7 +1,9 @@
 #include "bvmake/Run.h"
 
+#include <fmt/format.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 
 #include <cerrno>
 #include <filesystem>
@@ -238,7 +240,7 @@ TEST_F(Run, emptyFolderGivesAnEmptyIndexAndAWarning) {
   options().anchors = true;
   const Outcome outcome = create();
   EXPECT_EQ(outcome.exitCode, ExitCode::success);
-  EXPECT_THAT(_report.warnings, ElementsAre(HasSubstr("no help pages")));
+  EXPECT_THAT(_report.warnings, ElementsAre(HasSubstr("nothing to index")));
   ASSERT_NE(index(), nullptr);
   EXPECT_EQ(SKIndexGetMaximumTermID(index()), 0);
 }
@@ -248,9 +250,9 @@ TEST_F(Run, sameFolderGivesTheSameBytes) {
   options().generateSummaries = true;
   const auto fill = [this](const std::string& book, bool backwards) {
     for (int i = 0; i < 60; ++i) {
-      const std::string number = std::to_string(backwards ? 59 - i : i);
-      _folder.write(book + "/" + number + ".html", "<title>Page " + number + "</title><p id=a" +
-                                                       number + ">word" + number + " common.");
+      const int number = backwards ? 59 - i : i;
+      _folder.write(fmt::format("{}/{}.html", book, number),
+                    fmt::format("<title>Page {0}</title><p id=a{0}>word{0} common.", number));
     }
   };
   fill("book", false);
@@ -301,7 +303,16 @@ TEST_F(Run, outputThatIsAFolderFails) {
   page("a.html", "<p>word");
   _folder.makeFolder("out/deeper/book.helpindex");
   EXPECT_EQ(create().exitCode, ExitCode::failure);
-  EXPECT_THAT(_report.errors, ElementsAre(HasSubstr("it is a folder")));
+  EXPECT_THAT(_report.errors, ElementsAre(HasSubstr("no regular file")));
+}
+
+TEST_F(Run, outputThatIsAPipeIsNotReplaced) {
+  page("a.html", "<p>word");
+  _folder.makeFolder("out/deeper");
+  ASSERT_EQ(mkfifo(outputPath().c_str(), 0600), 0);
+  EXPECT_EQ(create().exitCode, ExitCode::failure);
+  EXPECT_THAT(_report.errors, ElementsAre(HasSubstr("no regular file")));
+  EXPECT_TRUE(std::filesystem::is_fifo(outputPath()));
 }
 
 TEST_F(Run, appendingSemanticDataIsRefusedAndTouchesNothing) {

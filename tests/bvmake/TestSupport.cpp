@@ -29,7 +29,7 @@ TemporaryFolder::~TemporaryFolder() {
 }
 
 std::string TemporaryFolder::write(std::string_view relative, std::string_view contents) const {
-  const std::string path = *this / relative;
+  std::string path = *this / relative;
   fs::create_directories(fs::path(path).parent_path());
   std::ofstream file(path, std::ios::binary);
   file << contents;
