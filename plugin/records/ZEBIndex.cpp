@@ -14,8 +14,8 @@ std::atomic<int32_t> lastIndexID{0};
 
 }  // namespace
 
-std::shared_ptr<ZEBIndex> ZEBIndex::indexWithPath(const std::string& path) {
-  if (platform::pathExtension(path) == ZEBHelpindexExtension) {
+std::shared_ptr<ZEBIndex> ZEBIndex::indexWithPath(const std::optional<std::string>& path) {
+  if (path && platform::pathExtension(*path) == ZEBHelpindexExtension) {
     return ZEBHelpindexIndex::initWithPath(path);
   }
   return nullptr;

@@ -22,8 +22,9 @@
 class ZEBIndex {
  public:
   /// The record for an index file, of the class that reads files with that extension. Null for
-  /// every other extension, and when the file cannot be read as what its extension says.
-  static std::shared_ptr<ZEBIndex> indexWithPath(const std::string& path);
+  /// every other extension, without a path, and when the file cannot be read as what its extension
+  /// says.
+  static std::shared_ptr<ZEBIndex> indexWithPath(const std::optional<std::string>& path);
 
   /// A record with this path, whether or not a file is there. Never null.
   static std::shared_ptr<ZEBIndex> initWithPath(const std::optional<std::string>& path);

@@ -72,6 +72,7 @@ TEST(ZEBIndex, PathWithAnotherOrNoExtensionYieldsNothing) {
   EXPECT_EQ(ZEBIndex::indexWithPath(world.write("manual.HELPINDEX", {})), nullptr);
   EXPECT_EQ(ZEBIndex::indexWithPath(world.write(".helpindex", {})), nullptr);
   EXPECT_EQ(ZEBIndex::indexWithPath(""), nullptr);
+  EXPECT_EQ(ZEBIndex::indexWithPath(std::nullopt), nullptr);
 }
 
 TEST(ZEBIndex, HelpIndexPathThatCannotBeReadOrDecodedYieldsNothing) {
