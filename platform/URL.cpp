@@ -78,6 +78,10 @@ std::string part(const Handle& handle, CURLUPart which) {
   return result;
 }
 
+/// A path of the file system means each '%' as it stands; other strings may be escaped already.
+enum class PercentSign { isItself, mayBeginEscape };
+std::string escapedPath(std::string_view path, PercentSign percentSign);
+
 constexpr std::string_view fileRoot = "file:///";
 
 /// The path of a file URL as spelled: most URLs here are of this form, and need no parser.
@@ -114,7 +118,7 @@ URL URL::fileURLWithPath(std::string_view path) {
   if (!path.starts_with('/')) {
     string += '/';
   }
-  string += stringByEscapingPath(path);
+  string += escapedPath(path, PercentSign::isItself);
   return URL(string, string);
 }
 
@@ -157,17 +161,24 @@ bool URL::isFileURL() const { return scheme() == "file"; }
 URL URL::URLByAppendingPathComponent(std::string_view component) const {
   std::string string = stringByAppendingPathComponent(
       std::string_view(_absolute).substr(0, _absolute.find_first_of("?#")),
-      stringByEscapingPath(component));
+      escapedPath(component, PercentSign::isItself));
   return URL(string, string);
 }
 
 std::string stringByEscapingPath(std::string_view path) {
+  return escapedPath(path, PercentSign::mayBeginEscape);
+}
+
+namespace {
+
+std::string escapedPath(std::string_view path, PercentSign percentSign) {
   constexpr std::string_view digits = "0123456789ABCDEF";
   std::string escaped;
   escaped.reserve(path.size());
   for (size_t i = 0; i < path.size(); ++i) {
     const auto c = static_cast<unsigned char>(path[i]);
-    if ((characterTable[c] & inPath) != 0 || startsEscape(path, i)) {
+    const bool isEscape = percentSign == PercentSign::mayBeginEscape && startsEscape(path, i);
+    if ((characterTable[c] & inPath) != 0 || isEscape) {
       escaped += path[i];
       continue;
     }
@@ -177,6 +188,8 @@ std::string stringByEscapingPath(std::string_view path) {
   }
   return escaped;
 }
+
+}  // namespace
 
 std::string stringByRemovingPercentEncoding(std::string_view string) {
   std::string decoded;

@@ -19,8 +19,8 @@ class URL {
   /// `string` relative to `base`: its last segment is replaced unless it ends in a slash.
   static std::optional<URL> URLWithStringRelativeToURL(std::string_view string, const URL& base);
 
-  /// A file URL for a path; every character that a path may not have in a URL is escaped, and a
-  /// relative path is taken from the root.
+  /// A file URL for a path, which path() gives back: every character that a path may not have in a
+  /// URL is escaped, every '%' too. A relative path is taken from the root.
   static URL fileURLWithPath(std::string_view path);
 
   /// The spelling given, without the base.

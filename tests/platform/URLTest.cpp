@@ -81,6 +81,13 @@ TEST(URL, escapingTwiceChangesNothing) {
   EXPECT_EQ(stringByEscapingPath(std::string_view("\0\x7F\xFF", 3)), "%00%7F%FF");
 }
 
+TEST(URL, aPathWithPercentSignsComesBackAsItWas) {
+  const URL url = URL::fileURLWithPath("/50%25 off/%41.html");
+  EXPECT_EQ(url.absoluteString(), "file:///50%2525%20off/%2541.html");
+  EXPECT_EQ(url.path(), "/50%25 off/%41.html");
+  EXPECT_EQ(url.URLByAppendingPathComponent("%42").lastPathComponent(), "%42");
+}
+
 TEST(URL, removingEscapesLeavesMalformedOnes) {
   EXPECT_EQ(stringByRemovingPercentEncoding("%41%c3%BC%4%%zz"), "Aü%4%%zz");
 }
