@@ -19,6 +19,15 @@ namespace {
   throw Exception(invalidArgumentException, reason);
 }
 
+// Whether the text begins with a character that XML has no way to write. `text` is UTF-8.
+bool isRefusedCharacter(std::string_view text) {
+  const char first = text.front();
+  if (static_cast<unsigned char>(first) < 0x20) {
+    return first != '\t' && first != '\n' && first != '\r';
+  }
+  return first == '\xEF' && (text == "\xEF\xBF\xBE" || text == "\xEF\xBF\xBF");
+}
+
 class XMLWriter {
  public:
   Data write(const Value& root);
@@ -53,6 +62,12 @@ Data XMLWriter::write(const Value& root) {
 // find.
 size_t XMLWriter::_leastLength(const Value& value, size_t depth) {
   constexpr size_t shortestElement = 8;
+  if (const std::string* text = value.stringIf()) {
+    return shortestElement + text->size();
+  }
+  if (const Data* bytes = value.dataIf()) {
+    return shortestElement + bytes->length();
+  }
   const bool isContainer = value.arrayIf() || value.dictionaryIf();
   if (!isContainer || depth == propertyListMaximumDepth) {
     return shortestElement;
@@ -62,14 +77,18 @@ size_t XMLWriter::_leastLength(const Value& value, size_t depth) {
     return known->second;
   }
   size_t length = shortestElement;
-  const auto add = [&](const Value& element) {
-    length = std::min(length + _leastLength(element, depth + 1), propertyListMaximumXMLLength + 1);
+  // Beyond the limit it makes no difference by how much.
+  const auto add = [&](size_t further) {
+    length = std::min(length + further, propertyListMaximumXMLLength + 1);
   };
   if (const Value::Array* elements = value.arrayIf()) {
-    std::for_each(elements->begin(), elements->end(), add);
+    for (const Value& element : *elements) {
+      add(_leastLength(element, depth + 1));
+    }
   } else {
-    for (const auto& entry : *value.dictionaryIf()) {
-      add(entry.second);
+    for (const auto& [key, element] : *value.dictionaryIf()) {
+      add(key.size());
+      add(_leastLength(element, depth + 1));
     }
   }
   _leastLengths.emplace(value.identity(), length);
@@ -111,10 +130,7 @@ void XMLWriter::_putText(std::string_view name, std::string_view text) {
   escaped.reserve(text.size());
   for (size_t i = 0; i < text.size(); ++i) {
     const char character = text[i];
-    const std::string_view three = text.substr(i, 3);
-    if ((static_cast<unsigned char>(character) < 0x20 && character != '\t' && character != '\n' &&
-         character != '\r') ||
-        three == "\xEF\xBF\xBE" || three == "\xEF\xBF\xBF") {
+    if (isRefusedCharacter(text.substr(i, 3))) {
       refuse(fmt::format("string {} has a character that XML cannot hold", quoted(text)));
     }
     switch (character) {
@@ -168,7 +184,6 @@ void XMLWriter::_putValue(const Value& value, size_t depth) {
       _putText("string", *value.stringIf());
       break;
     case Value::Kind::data:
-      _checkLength(value.dataIf()->length());
       _putElement("data", base64FromBytes(value.dataIf()->view()));
       break;
     case Value::Kind::array:

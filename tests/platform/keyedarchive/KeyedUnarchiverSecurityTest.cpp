@@ -84,6 +84,30 @@ TEST_F(KeyedUnarchiverSecurity, makesNothingWhenALaterElementIsNotAllowed) {
   EXPECT_EQ(made, 2);
 }
 
+TEST_F(KeyedUnarchiverSecurity, makesNothingWhenAContainerFurtherOnContainsItself) {
+  const Array objects = {
+      "$null", Dictionary{{"$class", UID{2}}, {"NS.objects", Array{UID{3}, UID{1}}}},
+      classRecord("NSArray"), Dictionary{{"$class", UID{4}}}, classRecord("Counted")};
+  EXPECT_THAT(reasonOf(objects, {KeyedUnarchiver::arrayClass, "Counted"}),
+              HasSubstr("object 1 contains itself"));
+  EXPECT_EQ(made, 0);
+}
+
+TEST_F(KeyedUnarchiverSecurity, makesNothingWhenAPathFurtherOnIsTooLong) {
+  // The root names an object, the end of a chain of arrays, and then its beginning.
+  Array objects = {"$null",
+                   Dictionary{{"$class", UID{2}}, {"NS.objects", Array{UID{3}, UID{300}, UID{5}}}},
+                   classRecord("NSArray"), Dictionary{{"$class", UID{4}}}, classRecord("Counted")};
+  for (size_t i = 1; i < propertyListMaximumDepth; ++i) {
+    objects.emplace_back(
+        Dictionary{{"$class", UID{2}}, {"NS.objects", Array{UID{objects.size() + 1}}}});
+  }
+  objects.emplace_back(Dictionary{{"$class", UID{2}}, {"NS.objects", Array{}}});
+  EXPECT_THAT(reasonOf(objects, {KeyedUnarchiver::arrayClass, "Counted"}),
+              HasSubstr("nest deeper"));
+  EXPECT_EQ(made, 0);
+}
+
 TEST_F(KeyedUnarchiverSecurity, checksAnObjectAgainForOtherCallers) {
   KeyedUnarchiver unarchiver(archiveOf(arrayOf("x"), {{"root", UID{1}}}));
   EXPECT_TRUE(unarchiver

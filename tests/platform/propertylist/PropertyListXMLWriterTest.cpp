@@ -153,9 +153,17 @@ TEST(PropertyListXMLWriter, refusesAGraphWhoseTextWouldBeEndless) {
 }
 
 TEST(PropertyListXMLWriter, refusesTextBeyondTheLimit) {
-  const Value text(std::string(1000000, 'x'));
+  const std::string text(1000000, 'x');
   EXPECT_THAT(reasonOf(Value::Array(200, text)), HasSubstr("the XML text is longer"));
+  EXPECT_THAT(reasonOf(Value::Array(200, Data::copy(text))), HasSubstr("the XML text is longer"));
+  EXPECT_THAT(reasonOf(Value::Array(200, Value::Dictionary{{text, 1}})),
+              HasSubstr("the XML text is longer"));
   EXPECT_TRUE(readBack(Value::Array(2, text)));
+}
+
+TEST(PropertyListXMLWriter, refusesTextThatEscapesLengthenBeyondTheLimit) {
+  const Value text(std::string(1000000, '&'));
+  EXPECT_THAT(reasonOf(Value::Array(100, text)), HasSubstr("the XML text is longer"));
 }
 
 }  // namespace
