@@ -1,14 +1,15 @@
 #include "host/Zebrine/ZEBQuery.h"
 
+#include <cstdint>
 #include <utility>
 
 #include "host/Zebrine/ZEBLog.h"
 
 namespace {
 
-int64_t nextQueryID() {
-  static std::atomic<int64_t> lastQueryID{0};
-  return lastQueryID.fetch_add(1, std::memory_order_relaxed) + 1;
+std::string nextQueryID() {
+  static std::atomic<uint64_t> lastQueryID{0};
+  return std::to_string(lastQueryID.fetch_add(1, std::memory_order_relaxed) + 1);
 }
 
 }  // namespace
@@ -35,6 +36,6 @@ std::shared_ptr<ZEBQuery> ZEBQuery::copy() const {
 }
 
 std::string ZEBQuery::description() const {
-  return ZEBStringWithFormat("query %d: \"%@\" in %@ for %@", _queryID, _queryString, _scope,
+  return ZEBStringWithFormat("query %@: \"%@\" in %@ for %@", _queryID, _queryString, _scope,
                              _resultTypes);
 }

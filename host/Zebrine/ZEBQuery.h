@@ -3,7 +3,6 @@
 
 #include <atomic>
 #include <cstddef>
-#include <cstdint>
 #include <memory>
 #include <string>
 #include <vector>
@@ -53,8 +52,9 @@ class ZEBQuery {
   size_t limit() const noexcept { return _limit; }
   void setLimit(size_t limit) { _limit = limit; }
 
-  /// Serial number within the process, from 1; the same for a query and its copies.
-  int64_t queryID() const noexcept { return _queryID; }
+  /// Tells this query from every other of the process; the same for a query and its copies. Never
+  /// empty, and nothing to be read into.
+  const std::string& queryID() const noexcept { return _queryID; }
 
   /// Whether the answer is no longer wanted. May be asked and set from any thread at any time.
   bool cancelled() const noexcept { return _cancelled.load(std::memory_order_acquire); }
@@ -77,6 +77,6 @@ class ZEBQuery {
   std::vector<std::string> _scope;
   std::vector<std::string> _preferredLanguages;
   size_t _limit = 0;
-  int64_t _queryID;
+  const std::string _queryID;
   std::atomic<bool> _cancelled{false};
 };

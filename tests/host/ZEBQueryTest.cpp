@@ -2,7 +2,10 @@
 
 #include <gtest/gtest.h>
 
+#include <set>
+#include <string>
 #include <thread>
+#include <vector>
 
 #include "host/Zebrine/ZEBConstants.h"
 
@@ -32,8 +35,29 @@ TEST(ZEBQuery, missingOptionsAreFalse) {
 TEST(ZEBQuery, everyQueryHasAnIdentifierOfItsOwn) {
   const auto first = ZEBQuery::initWithQueryString("a");
   const auto second = ZEBQuery::initWithQueryString("a");
-  EXPECT_GE(first->queryID(), 1);
-  EXPECT_GT(second->queryID(), first->queryID());
+  EXPECT_FALSE(first->queryID().empty());
+  EXPECT_NE(second->queryID(), first->queryID());
+}
+
+TEST(ZEBQuery, queriesMadeOnManyThreadsHaveDifferentIdentifiers) {
+  constexpr size_t threadCount = 4;
+  constexpr size_t queriesPerThread = 500;
+  std::vector<Strings> made(threadCount);
+  std::vector<std::thread> threads;
+  threads.reserve(threadCount);
+  for (Strings& list : made) {
+    threads.emplace_back([&list] {
+      for (size_t i = 0; i < queriesPerThread; ++i) {
+        list.push_back(ZEBQuery::initWithQueryString("a")->queryID());
+      }
+    });
+  }
+  std::set<std::string> different;
+  for (size_t i = 0; i < threadCount; ++i) {
+    threads[i].join();
+    different.insert(made[i].begin(), made[i].end());
+  }
+  EXPECT_EQ(different.size(), threadCount * queriesPerThread);
 }
 
 TEST(ZEBQuery, aCopyHasTheSameContentAndIdentifier) {
@@ -52,6 +76,7 @@ TEST(ZEBQuery, aCopyHasTheSameContentAndIdentifier) {
   EXPECT_EQ(copy->preferredLanguages(), (Strings{"de", "en"}));
   EXPECT_EQ(copy->limit(), 12U);
   EXPECT_EQ(copy->queryID(), query->queryID());
+  EXPECT_EQ(copy->copy()->queryID(), query->queryID());
 }
 
 TEST(ZEBQuery, changingACopyLeavesTheOriginal) {
@@ -90,8 +115,8 @@ TEST(ZEBQuery, describesItselfForLogs) {
   const auto query = ZEBQuery::initWithQueryString("print");
   query->setScope({"org.example.book"});
   query->setResultTypes({"kind"});
-  EXPECT_EQ(query->description(), "query " + std::to_string(query->queryID()) +
-                                      R"(: "print" in ["org.example.book"] for ["kind"])");
+  EXPECT_EQ(query->description(),
+            "query " + query->queryID() + R"(: "print" in ["org.example.book"] for ["kind"])");
 }
 
 }  // namespace
