@@ -1,5 +1,6 @@
 #include "host/Luxwell/HelpLUXModel.h"
 
+#include <limits>
 #include <utility>
 
 #include "platform/ThreadSafety.h"
@@ -17,7 +18,8 @@ struct GroupList {
 };
 
 GroupList& groupList() {
-  static GroupList list;
+  // Never destroyed: background work may still ask while the process ends.
+  static GroupList& list = *new GroupList;
   return list;
 }
 
@@ -27,7 +29,9 @@ platform::Value currentList() {
 }
 
 float weightOf(const platform::Value& entry) {
-  return static_cast<float>(entry[weightKey].doubleValue());
+  const double weight = entry[weightKey].doubleValue();
+  // The comparisons leave out what is not a number as well.
+  return weight > 0 && weight <= std::numeric_limits<float>::max() ? static_cast<float>(weight) : 0;
 }
 
 }  // namespace

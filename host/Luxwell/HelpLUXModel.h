@@ -12,8 +12,9 @@
 ///     {"DefaultGroup": "Applications",
 ///      "Groups": {"System": {"Weight": 1.5, "Books": {"org.zeb.manual": {"Weight": 2.0}}}}}
 ///
-/// A book that no group names belongs to the default group. A weight that is not given is 0, which
-/// means: no weight. Identifiers are taken as they are; see the zeb_ functions below.
+/// A book that no group names belongs to the default group; of several groups that name one, the
+/// first by name has it. A weight that is not given, or not above 0, is 0, which means: no weight.
+/// Identifiers are taken as they are, versions included.
 /// Thread-safety: internally synchronised.
 class HelpLUXModel {
  public:

@@ -9,6 +9,7 @@
 #include "platform/Bundle.h"
 #include "platform/RunLoop.h"
 #include "platform/WorkerThreads.h"
+#include "plugin/front/LeakChecker.h"
 #include "plugin/front/SearchRun.h"
 #include "plugin/keyword/ZEBHelpindexSearchController.h"
 #include "plugin/records/ZEBIndex.h"
@@ -39,6 +40,7 @@ void HelpPluginController::_setUp() {
   _indexshelf->setUserLoggedIn(_owner && _owner->userLoggedIn());
   if (_owner && _owner->userLoggedIn()) {
     _indexshelf->addObserver(shared_from_this());
+    tellLeakCheckerToIgnore(this);
   }
   _helpindexSearchController = ZEBHelpindexSearchController::init();
   _helpindexSearchController->setPluginOwner(_owner);

@@ -3,6 +3,7 @@
 
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "host/Zebrine/ZEBPlugin.h"
@@ -16,13 +17,19 @@ class ZEBHelpindexSearchController;
 ///
 /// Whether it observes the shelf, and whether it searches by meaning, is decided when it is made,
 /// by whether a user is logged in then. A controller that observes the shelf and the shelf keep
-/// each other alive for the life of the process: a plug-in is never unloaded. Thread-safety:
-/// internally synchronised; see removeIndexForBookWithID() for the one call that depends on its
-/// thread.
+/// each other alive for the life of the process: a plug-in is never unloaded. That is no leak, and
+/// leak checkers are told so.
+///
+/// The host makes the controller, and asks for removals, on the thread that runs its main loop, and
+/// keeps that loop running while searches and background work go on: parts of the latter wait for
+/// it. Thread-safety: internally synchronised; see removeIndexForBookWithID() for the one call that
+/// depends on its thread.
 class HelpPluginController : public ZEBPlugin,
                              public ZEBIndexshelfObserver,
                              public std::enable_shared_from_this<HelpPluginController> {
  public:
+  /// Never null. The owner is kept for the controller's life; without one the controller knows no
+  /// books and finds nothing.
   static std::shared_ptr<HelpPluginController> initWithOwner(std::shared_ptr<ZEBPluginOwner> owner);
   ~HelpPluginController() override;
   HelpPluginController(const HelpPluginController&) = delete;
@@ -45,6 +52,10 @@ class HelpPluginController : public ZEBPlugin,
 
   // Internal: for tests.
   const std::shared_ptr<ZEBIndexshelf>& _shelf() const { return _indexshelf; }
+  /// Before the controller is used by others.
+  void _setLuxSearchController(std::shared_ptr<LUXSearchController> controller) {
+    _luxSearchController = std::move(controller);
+  }
 
  private:
   explicit HelpPluginController(std::shared_ptr<ZEBPluginOwner> owner);

@@ -17,33 +17,31 @@ double relevanceOf(const std::shared_ptr<ZEBResult>& result) {
   return result->relevance().doubleValue();
 }
 
-/// The weight, absent for the primary book and where none is given.
-std::optional<double> givenWeight(const ZEBResult& result,
-                                  const std::optional<std::string>& primaryBookID) {
-  const std::optional<std::string> bookID = result.bookID();
+bool isOfBook(const ZEBResult& result, const std::optional<std::string>& wantedBookID) {
   // An absent identifier equals nothing, not even another absent one.
-  if (bookID && primaryBookID && *bookID == *primaryBookID) {
-    return std::nullopt;
-  }
-  const std::string identifier = bookID.value_or(std::string());
-  const float groupWeight =
-      HelpLUXModel::combiningWeightForModelGroupName(zeb_modelGroupNameForHelpbookID(identifier));
-  const float bookWeight = zeb_combiningWeightForHelpbookID(identifier);
-  if (bookWeight != 0) {
-    return static_cast<double>(bookWeight);
-  }
-  return groupWeight != 0 ? std::optional(static_cast<double>(groupWeight)) : std::nullopt;
+  const std::optional<std::string> bookID = result.bookID();
+  return bookID && wantedBookID && *bookID == *wantedBookID;
 }
 
 }  // namespace
 
 double weightOfResult(const ZEBResult& result, const std::optional<std::string>& primaryBookID) {
-  return givenWeight(result, primaryBookID).value_or(1.0);
+  if (isOfBook(result, primaryBookID)) {
+    return 1;
+  }
+  const std::string bookID = result.bookID().value_or(std::string());
+  const float groupWeight =
+      HelpLUXModel::combiningWeightForModelGroupName(zeb_modelGroupNameForHelpbookID(bookID));
+  const float bookWeight = zeb_combiningWeightForHelpbookID(bookID);
+  if (bookWeight != 0) {
+    return static_cast<double>(bookWeight);
+  }
+  return groupWeight != 0 ? static_cast<double>(groupWeight) : 1;
 }
 
 void weightResult(ZEBResult& result, const std::optional<std::string>& primaryBookID) {
-  if (const std::optional<double> weight = givenWeight(result, primaryBookID)) {
-    result.setRelevance(result.relevance().doubleValue() * *weight);
+  if (!isOfBook(result, primaryBookID)) {
+    result.setRelevance(result.relevance().doubleValue() * weightOfResult(result, primaryBookID));
   }
 }
 
@@ -60,10 +58,16 @@ double keywordScale(const std::vector<std::shared_ptr<ZEBResult>>& semantic) {
   if (semantic.empty()) {
     return 1.0;
   }
-  const auto place = std::find_if(semantic.begin(), semantic.end(), [](const auto& result) {
-    return relevanceOf(result) < namedByUser;
-  });
-  return relevanceOf(place == semantic.end() ? semantic.back() : *place);
+  double scale = relevanceOf(semantic.front());
+  if (scale >= namedByUser) {
+    for (size_t i = 1; i < semantic.size(); ++i) {
+      scale = relevanceOf(semantic[i]);
+      if (scale < namedByUser) {
+        break;
+      }
+    }
+  }
+  return scale;
 }
 
 std::vector<std::shared_ptr<ZEBResult>> mergedResults(

@@ -12,8 +12,8 @@ class ZEBResult;
 /// model group, else 1; always 1 for the primary book. Weights of 0 count as not given.
 double weightOfResult(const ZEBResult& result, const std::optional<std::string>& primaryBookID);
 
-/// Multiplies the relevance by the weight, as a new real number. A result of the primary book, or
-/// without a weight, keeps its number as it is.
+/// Multiplies the relevance by the weight, as a new real number. A result of the primary book keeps
+/// its number as it is.
 void weightResult(ZEBResult& result, const std::optional<std::string>& primaryBookID);
 
 /// Highest relevance first; equal ones keep their order.

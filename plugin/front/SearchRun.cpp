@@ -48,12 +48,12 @@ void SearchRun::run() {
   try {
     ZEBLog(3, "Starting help articles search for query: \"%@\"",
            _query ? std::optional(_query->queryString()) : std::nullopt);
-    if (_query && !_query->queryString().empty()) {
-      _search();
-    }
-    _owner->pluginFinishedSearchingForQuery(_plugin, _query);
-    if (_query && _query->options()[ZEBQuerySkipShutdownDelayOptionKey].boolValue()) {
-      _owner->setIdleTimeOutDelay(1);
+    // Without an owner there are no books, and nobody to tell.
+    if (_owner) {
+      if (_query && !_query->queryString().empty()) {
+        _search();
+      }
+      _finish();
     }
   } catch (const std::exception& exception) {
     ZEBLog(0, "%@", exception);
@@ -80,6 +80,13 @@ void SearchRun::_search() {
     _deliverSemantic(ZEBHelpSuggestionResult, {});
   } else if (_wantsSimilar) {
     _deliverSemantic(ZEBHelpSimilarSuggestionResult, _titles);
+  }
+}
+
+void SearchRun::_finish() {
+  _owner->pluginFinishedSearchingForQuery(_plugin, _query);
+  if (_query && _query->options()[ZEBQuerySkipShutdownDelayOptionKey].boolValue()) {
+    _owner->setIdleTimeOutDelay(1);
   }
 }
 

@@ -27,7 +27,7 @@ class SearchRun {
   using Indices = std::vector<std::shared_ptr<ZEBIndex>>;
 
   /// `luxSearchController` may be null: every semantic step then yields nothing. A null query finds
-  /// nothing.
+  /// nothing; so does a run without an owner, which tells nobody of it.
   SearchRun(std::shared_ptr<ZEBPlugin> plugin, std::shared_ptr<ZEBPluginOwner> owner,
             ZEBIndexshelf& indexshelf, ZEBHelpindexSearchController& keywordController,
             LUXSearchController* luxSearchController, std::shared_ptr<ZEBQuery> query);
@@ -38,6 +38,7 @@ class SearchRun {
 
  private:
   void _search();
+  void _finish();
   void _readRequest();
   void _collectBookList();
   void _answerOffline();
