@@ -133,7 +133,7 @@ PrefixRange findPrefix(const IndexView& view, std::string_view prefix) noexcept 
   if (prefix.size() > format::maximumTermBytes) {
     return range;
   }
-  std::memcpy(above, prefix.data(), prefix.size());
+  std::copy(prefix.begin(), prefix.end(), above);
   above[prefix.size()] = '\xFF';
   range.postings.end = cursor.seek({above, prefix.size() + 1})
                            ? cursor.postings().begin

@@ -105,7 +105,9 @@ void store(uint8_t* bytes, Integer value) noexcept {
 /// The first eight bytes of a term as one number, so that comparing numbers compares terms.
 inline uint64_t blockKey(std::string_view term) noexcept {
   uint64_t key = 0;
-  std::memcpy(&key, term.data(), term.size() < sizeof key ? term.size() : sizeof key);
+  if (!term.empty()) {
+    std::memcpy(&key, term.data(), term.size() < sizeof key ? term.size() : sizeof key);
+  }
   return __builtin_bswap64(key);
 }
 

@@ -8,7 +8,6 @@
 namespace searchkit {
 
 using format::load;
-using format::Section;
 
 namespace {
 

@@ -209,7 +209,7 @@ class Parser {
         break;
       case Kind::word:
       case Kind::phrase: {
-        QueryNode node = queryTermsFromText(token.text, token.isOpenAtEnd, _tokenizer, _termsLeft);
+        QueryNode node = queryTermsFromText(token.text, token.isOpenAtEnd, _tokenizer, _allowance);
         node.mayBeLeftOut = node.mayBeLeftOut && !isLastTerm;
         group.add(std::move(node));
         break;
@@ -248,7 +248,7 @@ class Parser {
   bool _blankMeansOr;
   Tokenizer _tokenizer;
   size_t _lastTerm = 0;
-  size_t _termsLeft = maximumQueryTerms;
+  QueryAllowance _allowance{maximumQueryTerms, maximumQueryScans};
   // Open parentheses, outermost first; the first stands for the whole query.
   std::vector<Group> _groups;
   size_t _ignoredOpen = 0;

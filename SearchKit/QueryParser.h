@@ -29,7 +29,8 @@
 //  - In scripts without blanks between words a term is also looked for as typed, and may go on.
 //
 // Depth and number of terms are bounded: parentheses deeper than maximumQueryDepth are ignored, and
-// terms after the first maximumQueryTerms.
+// so are terms after the first maximumQueryTerms and, of those that need a walk through the
+// dictionary (stars but for one at the end, and any star in a phrase), after maximumQueryScans.
 #pragma once
 
 #include <cstddef>
@@ -41,6 +42,7 @@ namespace searchkit {
 
 inline constexpr size_t maximumQueryDepth = 64;
 inline constexpr size_t maximumQueryTerms = 16384;
+inline constexpr size_t maximumQueryScans = 64;
 
 /// The terms are split and folded for an index with this minimum length. Takes time linear in the
 /// length of the text. Thread-safety: may be called from any thread.

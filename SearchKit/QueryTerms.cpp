@@ -89,13 +89,12 @@ class PartReader {
 bool isLongPattern(const TermPattern& pattern) { return !pattern.isExact() && !pattern.isPrefix(); }
 
 // The slots of all parts, one word after the other. Words that the index left out leave a gap.
-std::vector<PhraseSlot> slotsOfParts(const std::vector<Part>& parts, const Tokenizer& tokenizer,
-                                     size_t maximumSlots) {
+std::vector<PhraseSlot> slotsOfParts(const std::vector<Part>& parts, const Tokenizer& tokenizer) {
   std::vector<PhraseSlot> slots;
   uint32_t offset = 0;
   const auto add = [&](TermPattern pattern, bool isUnspaced) {
     const bool isMissing = pattern.isExact() && tokenizer.isShort(pattern.pieces[0], isUnspaced);
-    if (!isMissing && slots.size() < maximumSlots) {
+    if (!isMissing) {
       slots.push_back({std::move(pattern), offset});
     }
     ++offset;
@@ -113,10 +112,24 @@ std::vector<PhraseSlot> slotsOfParts(const std::vector<Part>& parts, const Token
   return slots;
 }
 
+// Drops the slots that are too many, and takes the others from the allowance.
+void charge(std::vector<PhraseSlot>& slots, QueryAllowance& allowance) {
+  const bool isPhrase = slots.size() > 1;
+  std::erase_if(slots, [&](const PhraseSlot& slot) {
+    const bool isScan = isLongPattern(slot.pattern) || (isPhrase && !slot.pattern.isExact());
+    if (allowance.terms == 0 || (isScan && allowance.scans == 0)) {
+      return true;
+    }
+    --allowance.terms;
+    allowance.scans -= isScan ? 1 : 0;
+    return false;
+  });
+}
+
 }  // namespace
 
 QueryNode queryTermsFromText(std::string_view text, bool isOpenAtEnd, const Tokenizer& tokenizer,
-                             size_t& maximumSlots) {
+                             QueryAllowance& allowance) {
   QueryNode node;
   std::vector<Part> parts = PartReader().read(text);
   if (parts.empty()) {
@@ -125,17 +138,17 @@ QueryNode queryTermsFromText(std::string_view text, bool isOpenAtEnd, const Toke
   // Where no blanks end words, the user cannot tell where one ends either.
   Part& last = parts.back();
   last.pattern.isOpenAtEnd = last.pattern.isOpenAtEnd || isOpenAtEnd || last.isUnspaced;
-  node.slots = slotsOfParts(parts, tokenizer, maximumSlots);
-  maximumSlots -= node.slots.size();
+  node.slots = slotsOfParts(parts, tokenizer);
+  charge(node.slots, allowance);
   if (parts.size() == 1) {
     const TermPattern& pattern = parts[0].pattern;
     node.mayBeLeftOut =
         !isLongPattern(pattern) && tokenizer.isShort(pattern.pieces[0], parts[0].isUnspaced);
-    if (node.slots.size() > 1 && maximumSlots > 0) {
+    if (node.slots.size() > 1 && allowance.terms > 0) {
       // The same letters may be one word where there are others around them.
       QueryNode whole;
       whole.slots.push_back({pattern, 0});
-      --maximumSlots;
+      charge(whole.slots, allowance);
       QueryNode either;
       either.optional.push_back(std::move(whole));
       either.optional.push_back(std::move(node));

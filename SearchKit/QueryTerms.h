@@ -9,10 +9,18 @@
 
 namespace searchkit {
 
+/// What a query may still cost.
+struct QueryAllowance {
+  /// Terms of all kinds.
+  size_t terms = 0;
+  /// Those among them for which the dictionary is walked: patterns, and prefixes in phrases.
+  size_t scans = 0;
+};
+
 /// The leaf, or the clause of alternative leaves, for `text`: stars stand for any letters, all else
 /// is split and folded as pages are. Several words are a phrase. Empty when nothing is left to look
-/// for. Takes at most `maximumSlots` terms and lowers it by what it took.
+/// for. Terms beyond the allowance are left out; it is lowered by the others.
 QueryNode queryTermsFromText(std::string_view text, bool isOpenAtEnd, const Tokenizer& tokenizer,
-                             size_t& maximumSlots);
+                             QueryAllowance& allowance);
 
 }  // namespace searchkit

@@ -51,20 +51,26 @@ bool SKIndexVerifyChecksums(const SKIndexRef& index);
 SKTermID SKIndexGetMaximumTermID(const SKIndexRef& index);
 
 /// The distinct terms of a text, in order of first appearance, split and folded as this index's
-/// own text was. Terms need not occur in the index.
+/// own text was. Terms need not occur in the index, and those shorter than its minimum are among
+/// them: a user may be half way through a longer word. A term, taken as a query or with a star
+/// after it, finds what it came from. Empty without an index.
 std::vector<std::string> SKIndexCopyUniqueTerms(const SKIndexRef& index, std::string_view text);
 
-/// A search for `query`: words, `word*`, phrases in double quotes, `+required`, `-excluded` and
-/// `!excluded`, `&`, `|`, parentheses. No query is malformed: dangling operators and unbalanced
-/// quotes or parentheses are read as what was most likely meant. Null only without an index.
+/// A search for `query`: words, `word*`, `*word*`, `w*d`, phrases in double quotes, `+required`,
+/// `-excluded` and `!excluded`, `&`, `|`, parentheses. No query is malformed: dangling operators
+/// and unbalanced quotes or parentheses are read as what was most likely meant (QueryParser.h says
+/// how). The search keeps the index alive. Null only without an index.
 SKSearchRef SKSearchCreate(const SKIndexRef& index, std::string_view query,
                            SKSearchOptions options);
 
 /// Delivers up to `maximumCount` further hits, in no defined order, each document once a search.
 /// `ids` has room for `maximumCount` entries, as has `scores` unless it is null. Stops after
-/// `maximumTime` seconds. Sets `foundCount` to the number of hits delivered by this call (it may be
-/// 0 although more follow) and returns whether more may follow.
-/// Scores are above 0, finite, higher for better hits, and comparable within one index and query.
+/// `maximumTime` seconds of the environment's clock, and goes on from there in the next call; each
+/// call gets on by some tens of microseconds of work, however little time it is given. Sets
+/// `foundCount`, unless it is null, to the number of hits delivered by this call (it may be 0
+/// although more follow) and returns whether more may follow.
+/// Scores are above 0, finite, higher for better hits (Scoring.h says how they come about), and
+/// comparable within one index and query.
 bool SKSearchFindMatches(SKSearch& search, size_t maximumCount, SKDocumentID* ids, float* scores,
                          double maximumTime, size_t* foundCount);
 

@@ -158,6 +158,18 @@ TEST(QueryParser, boundsTerms) {
   EXPECT_EQ(leafCount(parseQuery(phrase, false, 1)), maximumQueryTerms);
 }
 
+TEST(QueryParser, boundsWalksThroughTheDictionary) {
+  std::string patterns;
+  std::string phrase = "\"";
+  for (int i = 0; i < 1000; ++i) {
+    patterns += "*w" + std::to_string(i) + "* ";
+    phrase += "w" + std::to_string(i) + "* ";
+  }
+  EXPECT_EQ(leafCount(parseQuery(patterns, false, 1)), maximumQueryScans);
+  EXPECT_EQ(leafCount(parseQuery(phrase, false, 1)), maximumQueryScans);
+  EXPECT_EQ(leafCount(parseQuery(patterns + "a* b", false, 1)), maximumQueryScans + 2);
+}
+
 TEST(TermPattern, matchesWhatItSays) {
   const auto matches = [](std::string_view pattern, std::string_view term) {
     return parseQuery(pattern, false, 1).slots.at(0).pattern.matches(term);

@@ -145,7 +145,9 @@ Sample makeSample(World& world, size_t documentCount) {
   return {NaiveEngine(documents), openIndex(pages)};
 }
 
-void compareSearches(uint32_t seed, size_t documentCount, int queryCount) {
+// Returns how many of the queries found some documents but not all.
+int compareSearches(uint32_t seed, size_t documentCount, int queryCount) {
+  int telling = 0;
   World world(seed);
   const Sample sample = makeSample(world, documentCount);
   for (int i = 0; i < queryCount; ++i) {
@@ -156,24 +158,26 @@ void compareSearches(uint32_t seed, size_t documentCount, int queryCount) {
     for (const auto& [id, score] :
          scores(sample.index, text, blankMeansOr ? kSKSearchOptionSpaceMeansOR : 0)) {
       numbers.insert(id);
-      ASSERT_TRUE(std::isfinite(score) && score > 0) << text;
+      EXPECT_TRUE(std::isfinite(score) && score > 0) << text;
     }
-    ASSERT_EQ(numbers, sample.naive.find(query))
+    EXPECT_EQ(numbers, sample.naive.find(query))
         << "seed " << seed << ", blank means " << (blankMeansOr ? "or" : "and") << ": " << text;
+    telling += !numbers.empty() && numbers.size() < documentCount ? 1 : 0;
   }
+  return telling;
 }
 
 TEST(RandomQueries, findWhatTheNaiveEngineFinds) {
-  for (uint32_t seed = 1; seed <= 60; ++seed) {
-    compareSearches(seed, 1 + seed * seed % 97, 100);
-    if (HasFatalFailure()) {
-      return;
-    }
+  int telling = 0;
+  for (uint32_t seed = 1; seed <= 60 && !HasFailure(); ++seed) {
+    telling += compareSearches(seed, 1 + seed * seed % 97, 100);
   }
+  // Queries that find nothing, or everything, prove little.
+  EXPECT_GT(telling, 3000);
 }
 
 TEST(RandomQueries, findWhatTheNaiveEngineFindsAmongManyDocuments) {
-  compareSearches(1000, 700, 150);
+  EXPECT_GT(compareSearches(1000, 700, 150), 75);
 }
 
 TEST(RandomQueries, scoreSingleTermsByTheFormula) {
