@@ -16,6 +16,7 @@
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "platform/Environment.h"
 #include "platform/Files.h"
+#include "platform/Strings.h"
 
 namespace zeb {
 
@@ -62,8 +63,9 @@ std::optional<std::string> realPath(const std::string& path) {
 }
 
 bool isPageName(std::string_view name) {
-  const std::string extension = platform::pathExtension(name);
-  return extension == "html" || extension == "htm" || extension == "xhtml" || extension == "page";
+  static constexpr std::string_view extensions[] = {"html", "htm", "xhtml", "xht", "page"};
+  const std::string extension = platform::lowercaseString(platform::pathExtension(name));
+  return std::find(std::begin(extensions), std::end(extensions), extension) != std::end(extensions);
 }
 
 /// Whether there is a page in the folder or a few levels below.

@@ -26,7 +26,8 @@ namespace {
 /// More at once than the machine has processors gain nothing, and each holds a book's words in
 /// memory.
 size_t workerCount(size_t bookCount) {
-  const size_t processors = std::max(1U, std::thread::hardware_concurrency());
+  const auto processors =
+      static_cast<size_t>(std::max(1, platform::Environment::current()->processorCount()));
   return std::min({processors, bookCount, size_t{8}});
 }
 

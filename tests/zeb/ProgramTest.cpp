@@ -74,6 +74,7 @@ class ProgramTest : public testing::Test {
     arguments.insert(arguments.begin(), ZEB_PROGRAM);
     arguments.insert(arguments.end(), {"--cache-dir", files.path("cache")});
     std::vector<char*> pointers;
+    pointers.reserve(arguments.size() + 1);
     for (std::string& argument : arguments) {
       pointers.push_back(argument.data());
     }

@@ -6,7 +6,6 @@
 
 namespace {
 
-using zeb::RankedPage;
 using zeb::relevances;
 
 TEST(Ranking, NoPagesNoRelevances) { EXPECT_TRUE(relevances({}, {"word"}).empty()); }

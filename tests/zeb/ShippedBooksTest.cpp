@@ -21,7 +21,6 @@
 namespace {
 
 using platform::Value;
-using testing::IsSupersetOf;
 using testing::Not;
 
 /// A page as a web browser reads it.
