@@ -1,5 +1,6 @@
 #include "plugin/shelf/ZEBIndexGenerationOperation.h"
 
+#include <exception>
 #include <utility>
 
 #include "host/Zebrine/ZEBHelpBook.h"
@@ -41,46 +42,49 @@ void ZEBIndexGenerationOperation::main() {
   } catch (const std::exception& exception) {
     ZEBLog(0, "%@", exception);
   }
-}
-
-void ZEBIndexGenerationOperation::_generate() {
-  if (!_indexshelf || !_book) {
-    return;
-  }
-  const std::optional<std::string> path =
-      _indexshelf->_generatedIndexPathForBookID(_book->bookID(), _book->localization());
-  if (!_prepareFileAtPath(path)) {
-    if (_index) {
-      _index->setIsRebuilding(false);
-    }
-    return;
-  }
-  const std::shared_ptr<ZEBIndex> made =
-      _indexshelf->_generateIndexForBook(_book, path, _onlyGenerateLUXIndex);
-  if (made) {
-    if (_index) {
-      const auto data = platform::Environment::current()->files->contentsMappedAtPath(*path);
-      (void)_index->reinitializeWithData(data.value_or(platform::Data()));
-    } else {
-      _indexshelf->_addIndex(made, _book->bookID());
-    }
-    _indexshelf->populateRemoteURLOfBook(_book);
-    _indexshelf->_notifyObserversOfChange(ZEBIndexChangeUpdated, made);
-  }
+  // However it ended: a record that stays marked would look busy for ever.
   if (_index) {
     _index->setIsRebuilding(false);
   }
 }
 
+void ZEBIndexGenerationOperation::_generate() {
+  if (!_indexshelf) {
+    return;
+  }
+  const std::optional<std::string> path =
+      _book ? _indexshelf->_generatedIndexPathForBookID(_book->bookID(), _book->localization())
+            : std::nullopt;
+  if (!_prepareFileAtPath(path)) {
+    return;
+  }
+  const std::shared_ptr<ZEBIndex> made =
+      _indexshelf->_generateIndexForBook(_book, path, _onlyGenerateLUXIndex);
+  if (!made) {
+    return;
+  }
+  if (_index) {
+    // The record stays the one that searches hold; only its contents are new.
+    const auto data = platform::Environment::current()->files->contentsMappedAtPath(*path);
+    (void)_index->reinitializeWithData(data.value_or(platform::Data()));
+  } else {
+    _indexshelf->_addIndex(made, _book->bookID());
+  }
+  _indexshelf->populateRemoteURLOfBook(_book);
+  _indexshelf->_notifyObserversOfChange(ZEBIndexChangeUpdated, made);
+}
+
 bool ZEBIndexGenerationOperation::_prepareFileAtPath(const std::optional<std::string>& path) {
   const auto files = platform::Environment::current()->files;
-  if (!_onlyGenerateLUXIndex || !_index || !path || files->fileExistsAtPath(*path)) {
+  if (!_onlyGenerateLUXIndex || !_index || (path && files->fileExistsAtPath(*path))) {
     return true;
   }
-  (void)files->createDirectoryWithParents(platform::stringByDeletingLastPathComponent(*path));
   const std::optional<std::string> source = _index->path();
-  if (source && !files->copyItem(*source, *path)) {
-    return true;
+  if (path) {
+    (void)files->createDirectoryWithParents(platform::stringByDeletingLastPathComponent(*path));
+    if (source && !files->copyItem(*source, *path)) {
+      return true;
+    }
   }
   ZEBLog(
       3,

@@ -1,10 +1,10 @@
 #include <chrono>
+#include <exception>
 #include <utility>
 
 #include "host/Zebrine/ZEBCheckClass.h"
 #include "host/Zebrine/ZEBLog.h"
 #include "platform/Environment.h"
-#include "platform/Exception.h"
 #include "platform/Files.h"
 #include "platform/KeyedArchive.h"
 #include "platform/Strings.h"
@@ -22,8 +22,10 @@ constexpr const char* cacheVersionKey = "CacheVersion";
 constexpr const char* cacheVersion = "1.2";
 constexpr std::chrono::seconds maximumAge{28800};
 
-std::string firstPreferredLanguage() {
-  return platform::Environment::current()->preferredLanguages.front();
+std::optional<std::string> firstPreferredLanguage() {
+  const auto environment = platform::Environment::current();
+  const std::vector<std::string>& languages = environment->preferredLanguages;
+  return languages.empty() ? std::nullopt : std::optional(languages.front());
 }
 
 KeyedObject archivedForm(const std::map<std::string, ZEBIndexshelf::Indices>& indices) {
@@ -37,13 +39,13 @@ KeyedObject archivedForm(const std::map<std::string, ZEBIndexshelf::Indices>& in
     }
     books.emplace(entry.first, std::move(records));
   }
-  return KeyedObject(std::move(books));
+  return KeyedObject::mutableDictionary(std::move(books));
 }
 
 std::optional<std::map<std::string, ZEBIndexshelf::Indices>> indicesFromArchivedForm(
     const KeyedObject& object) {
   const KeyedObject::Dictionary* books = object.dictionaryIf();
-  if (books == nullptr) {
+  if (books == nullptr || !object.isMutable()) {
     return std::nullopt;
   }
   std::map<std::string, ZEBIndexshelf::Indices> indices;
@@ -77,7 +79,9 @@ void ZEBIndexshelf::archiveKnownIndices() {
   }
   try {
     platform::KeyedArchiver coder;
-    coder.encodeObject(platform::Value(firstPreferredLanguage()), cacheLanguageKey);
+    const std::optional<std::string> language = firstPreferredLanguage();
+    coder.encodeObject(language ? KeyedObject(platform::Value(*language)) : KeyedObject(),
+                       cacheLanguageKey);
     coder.encodeObject(archivedForm(_indices), knownIndicesKey);
     coder.encodeObject(platform::Value(cacheVersion), cacheVersionKey);
     const platform::Data bytes = coder.finishEncoding();
@@ -89,8 +93,8 @@ void ZEBIndexshelf::archiveKnownIndices() {
     if (const auto error = files->writeAtomically(*_cachePath, bytes)) {
       ZEBLog(1, "Failed to save indexindex to: %@ (error: %@)", *_cachePath, *error);
     }
-  } catch (const platform::Exception& exception) {
-    ZEBLog(3, "Failed to save indexindex to: %@ (exception: %@)", *_cachePath, exception.reason());
+  } catch (const std::exception& exception) {
+    ZEBLog(3, "Failed to save indexindex to: %@ (exception: %@)", *_cachePath, exception.what());
   }
 }
 
@@ -126,9 +130,9 @@ ZEBIndexshelf::unarchiveKnownIndices() {
         knownIndicesKey);
     coder.finishDecoding();
     return indicesFromArchivedForm(known);
-  } catch (const platform::Exception& exception) {
-    // The path has no part in this message: whoever reads logs knows it with the reason in front.
-    ZEBLog(1, "Error loading help index cache from %@ (exception: %@)", exception.reason());
+  } catch (const std::exception& exception) {
+    // The reason alone, in the place of the path: that is how this message has always read.
+    ZEBLog(1, "Error loading help index cache from %@ (exception: %@)", exception.what());
     return std::nullopt;
   }
 }
@@ -138,5 +142,5 @@ bool ZEBIndexshelf::_validateHelpIndexCacheVersion(const std::optional<std::stri
   if (!version || !language || platform::numericCompare(cacheVersion, *version) > 0) {
     return false;
   }
-  return *language == firstPreferredLanguage();
+  return language == firstPreferredLanguage();
 }

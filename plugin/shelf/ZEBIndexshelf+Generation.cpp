@@ -1,10 +1,11 @@
+#include <algorithm>
 #include <cerrno>
+#include <exception>
 
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "host/Zebrine/ZEBLog.h"
 #include "platform/Environment.h"
-#include "platform/Exception.h"
 #include "platform/Files.h"
 #include "platform/Processes.h"
 #include "platform/UserDefaults.h"
@@ -16,6 +17,9 @@ namespace {
 
 constexpr const char* toolPath = "/usr/bin/bvmake";
 constexpr const char* toolName = "bvmake";
+// Far more than the tool tells apart and about what a command line holds: a setting is no way to
+// fill memory.
+constexpr int64_t maximumVerbosity = 100'000;
 
 std::vector<std::string> toolArguments(const ZEBHelpBook& book, const std::string& outputPath,
                                        bool onlyGenerateLUXIndex) {
@@ -27,15 +31,15 @@ std::vector<std::string> toolArguments(const ZEBHelpBook& book, const std::strin
   }
   arguments.emplace_back("--lowered-priority");
   const int64_t level = platform::Environment::current()->userDefaults->integerForKey("LogLevel");
-  // More than a handful means no more to the tool, and a setting is no way to fill memory.
-  for (int64_t i = 0; i < std::min<int64_t>(level, 100); ++i) {
+  for (int64_t i = 0; i < std::min(level, maximumVerbosity); ++i) {
     arguments.emplace_back("--verbose");
   }
   arguments.push_back(localizedDocumentRootPath(book));
   return arguments;
 }
 
-/// Above 0 when somebody else's run of the tool is writing this file, or when that cannot be told.
+/// Above 0 when somebody else's run of the tool is writing this file, or when the processes cannot
+/// be listed; else 0 or -1.
 int statusOfOtherRuns(const std::string& outputPath) {
   const auto table = platform::Environment::current()->processTable;
   std::vector<platform::ProcessEntry> processes;
@@ -82,7 +86,7 @@ std::shared_ptr<ZEBIndex> ZEBIndexshelf::_generateIndexForBook(
       ZEBLog(0, "Task at %@ failed with error %d. Arguments %@", toolPath, status, arguments);
       return nullptr;
     }
-  } catch (const platform::Exception& exception) {
+  } catch (const std::exception& exception) {
     ZEBLog(0, "Task at %@ threw exception: %@. Arguments %@", toolPath, exception, arguments);
     return nullptr;
   }
@@ -102,8 +106,12 @@ std::string localizedDocumentRootPath(const ZEBHelpBook& book) {
   if (!resources) {
     return book.path();
   }
+  const std::string localization = book.localization();
+  if (localization.empty()) {
+    return *resources;
+  }
   const std::string localized = platform::stringByAppendingPathComponent(
-      *resources, platform::stringByAppendingPathExtension(book.localization(), "lproj"));
+      *resources, platform::stringByAppendingPathExtension(localization, "lproj"));
   bool isDirectory = false;
   const auto files = platform::Environment::current()->files;
   const bool exists = files->fileExistsAtPath(localized, &isDirectory) && isDirectory;
@@ -133,8 +141,9 @@ int pidHasArgs(int processID, const std::vector<std::string>& strings, size_t co
     const std::string_view argument = rest.substr(0, end);
     rest.remove_prefix(end + 1);
     environment->standardOutput(std::string(argument) + "\n");
-    matching = matching < strings.size() && argument == strings[matching] ? matching + 1 : 0;
-    if (matching == count) {
+    if (matching >= strings.size() || argument != strings[matching]) {
+      matching = 0;
+    } else if (++matching == count) {
       return matched;
     }
   }

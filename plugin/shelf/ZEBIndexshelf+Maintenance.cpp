@@ -11,17 +11,15 @@ namespace {
 /// outside it, whatever an identifier looks like: paths are compared in their standardised form.
 void deleteGeneratedFolder(const std::optional<std::string>& folder,
                            const std::optional<std::string>& generatedRoot) {
-  const auto files = platform::Environment::current()->files;
-  if (!folder || !generatedRoot || !files->fileExistsAtPath(*folder)) {
+  if (!folder || !generatedRoot) {
     return;
   }
+  const auto files = platform::Environment::current()->files;
   const std::string path = platform::stringByStandardizingPath(*folder);
   const std::string root = platform::stringByStandardizingPath(*generatedRoot);
-  const std::string parent = platform::stringByDeletingLastPathComponent(path);
-  if (!path.starts_with(root) || parent.size() < root.size()) {
-    return;
-  }
-  if (!files->removeItem(path)) {
+  // With the slash, so that the root's own name as the beginning of a neighbour's does not count.
+  const bool isInside = path.starts_with(root + "/");
+  if (isInside && files->fileExistsAtPath(path) && !files->removeItem(path)) {
     ZEBLog(4, "Successfully deleted outdated cached index at %@", *folder);
   }
 }

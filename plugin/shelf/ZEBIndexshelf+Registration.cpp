@@ -1,10 +1,10 @@
+#include <exception>
 #include <utility>
 
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "host/Zebrine/ZEBLog.h"
 #include "host/Zebrine/ZEBStrings.h"
-#include "platform/Exception.h"
 #include "plugin/operations/ZEBOperationQueue.h"
 #include "plugin/records/ZEBIndex.h"
 #include "plugin/remote/ZEBIndexFetchUpdateOperation.h"

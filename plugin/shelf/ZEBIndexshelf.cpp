@@ -33,7 +33,8 @@ void ZEBIndexshelf::_setUp() {
       _cachePath = platform::stringByAppendingPathComponent(*caches, "HelpindexCache.plist");
     }
   }
-  if (std::optional<std::map<std::string, Indices>> known = unarchiveKnownIndices()) {
+  if (std::optional<std::map<std::string, Indices>> known = unarchiveKnownIndices();
+      known && !known->empty()) {
     const platform::MonitorLock lock(_monitor);
     _indices = std::move(*known);
   }
@@ -70,8 +71,10 @@ void ZEBIndexshelf::_setUp() {
 ZEBIndexshelf::~ZEBIndexshelf() = default;
 
 void ZEBIndexshelf::setShouldBeLazy(bool shouldBeLazy) {
+  const long limit = shouldBeLazy ? 1 : processorCoreCount();
+  const platform::MutexLock lock(_lazyMutex);
   _shouldBeLazy = shouldBeLazy;
-  _indexGeneratingQueue->setMaxConcurrentOperationCount(shouldBeLazy ? 1 : processorCoreCount());
+  _indexGeneratingQueue->setMaxConcurrentOperationCount(limit);
 }
 
 void ZEBIndexshelf::addObserver(const std::shared_ptr<ZEBIndexshelfObserver>& observer) {
@@ -122,19 +125,19 @@ std::optional<std::string> ZEBIndexshelf::_generatedRoot() {
 }
 
 std::optional<std::string> ZEBIndexshelf::_generatedIndexPathForBookID(
-    const std::string& bookID, const std::optional<std::string>& withLocalization) {
+    const std::optional<std::string>& bookID, const std::optional<std::string>& withLocalization) {
   return _generatedFilePathForBookID(bookID, withLocalization, ZEBHelpindexExtension);
 }
 
 std::optional<std::string> ZEBIndexshelf::_generatedExactMatchPathForBookID(
-    const std::string& bookID, const std::optional<std::string>& withLocalization) {
+    const std::optional<std::string>& bookID, const std::optional<std::string>& withLocalization) {
   return _generatedFilePathForBookID(bookID, withLocalization, "exactmatch.plist");
 }
 
 std::optional<std::string> ZEBIndexshelf::_generatedFilePathForBookID(
-    const std::string& bookID, const std::optional<std::string>& withLocalization,
+    const std::optional<std::string>& bookID, const std::optional<std::string>& withLocalization,
     std::string_view andExtension) {
-  if (bookID.empty()) {
+  if (!bookID || bookID->empty()) {
     return std::nullopt;
   }
   std::optional<std::string> folder;
@@ -150,7 +153,7 @@ std::optional<std::string> ZEBIndexshelf::_generatedFilePathForBookID(
   }
   const bool localized = withLocalization && !withLocalization->empty();
   const std::string file =
-      ZEBStringWithFormat("%@/%@", bookID, localized ? *withLocalization : bookID);
+      ZEBStringWithFormat("%@/%@", *bookID, localized ? *withLocalization : *bookID);
   return platform::stringByAppendingPathComponent(
       *folder, platform::stringByAppendingPathExtension(file, andExtension));
 }

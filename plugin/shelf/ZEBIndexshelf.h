@@ -50,8 +50,8 @@ struct ZEBIndexFetchParameters {
 /// tool, fetching of updates, downloads. indicesForBook() is the one place that decides where a
 /// book's index comes from.
 ///
-/// Lock order: the shelf's monitor, then a queue's monitor, then the locks of records, books and
-/// properties. The monitors of the observers and of the pending books are never held with another.
+/// Lock order: the shelf's monitor, then the observers' monitor or a queue's, then the locks of
+/// records, books and properties. The monitor of the pending books is never held with another.
 /// Thread-safety: internally synchronised.
 class ZEBIndexshelf : public std::enable_shared_from_this<ZEBIndexshelf> {
  public:
@@ -131,12 +131,13 @@ class ZEBIndexshelf : public std::enable_shared_from_this<ZEBIndexshelf> {
 
   void _notifyObserversOfChange(ZEBIndexChange change, const std::shared_ptr<ZEBIndex>& forIndex);
   void _addIndex(const std::shared_ptr<ZEBIndex>& index, const std::string& forBookID);
+  // Where a book's generated files lie; absent without an identifier or a caches folder.
   std::optional<std::string> _generatedIndexPathForBookID(
-      const std::string& bookID, const std::optional<std::string>& withLocalization);
+      const std::optional<std::string>& bookID, const std::optional<std::string>& withLocalization);
   std::optional<std::string> _generatedExactMatchPathForBookID(
-      const std::string& bookID, const std::optional<std::string>& withLocalization);
+      const std::optional<std::string>& bookID, const std::optional<std::string>& withLocalization);
   std::optional<std::string> _generatedFilePathForBookID(
-      const std::string& bookID, const std::optional<std::string>& withLocalization,
+      const std::optional<std::string>& bookID, const std::optional<std::string>& withLocalization,
       std::string_view andExtension);
 
   void archiveKnownIndices();
@@ -194,6 +195,8 @@ class ZEBIndexshelf : public std::enable_shared_from_this<ZEBIndexshelf> {
   std::map<std::string, std::shared_ptr<platform::DispatchSemaphore>> _indicesToBeDownloaded;
   std::shared_ptr<platform::DispatchQueue> _indicesSyncQueue;
 
+  // Held over the change of flag and limit, so that two changes at once leave them in step.
+  platform::Mutex _lazyMutex;
   std::atomic<bool> _shouldBeLazy{true};
   std::atomic<bool> _userLoggedIn{false};
   platform::DistributedNotificationCenter::Observation _registrationObservation;
