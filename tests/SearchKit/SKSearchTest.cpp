@@ -367,6 +367,7 @@ TEST(SKSearch, phraseOfAHundredThousandWords) {
 
 std::vector<Document> manyPages(int count) {
   std::vector<Document> pages;
+  pages.reserve(static_cast<size_t>(count));
   for (int i = 0; i < count; ++i) {
     pages.push_back(page("/" + std::to_string(i), "common word" + std::to_string(i % 10)));
   }

@@ -19,6 +19,7 @@ using testing::page;
 
 TEST(SKIndex, isSearchedByManyThreadsAtOnce) {
   std::vector<Document> pages;
+  pages.reserve(500);
   for (int i = 0; i < 500; ++i) {
     pages.push_back(page("/" + std::to_string(i), "common word" + std::to_string(i % 37) +
                                                       " 東京都の印刷 ภาษาไทย Größe more words"));
