@@ -1,7 +1,10 @@
 #include "platform/Bundle.h"
 
 #include <dlfcn.h>
+#include <link.h>
 
+#include <filesystem>
+#include <system_error>
 #include <utility>
 
 #include "platform/Files.h"
@@ -20,10 +23,19 @@ std::shared_ptr<const Bundle> Bundle::bundleWithPath(const std::string& path) {
 
 std::shared_ptr<const Bundle> Bundle::bundleWithCode(const void* address) {
   Dl_info information{};
-  if (::dladdr(address, &information) == 0 || information.dli_fname == nullptr) {
+  link_map* object = nullptr;
+  const int found =
+      ::dladdr1(address, &information, reinterpret_cast<void**>(&object), RTLD_DL_LINKMAP);
+  if (found == 0 || object == nullptr) {
     return nullptr;
   }
-  return bundleWithPath(stringByDeletingLastPathComponent(information.dli_fname));
+  // The linker knows the program itself by no name, and dladdr would give the one that the caller
+  // typed, which may be no path at all.
+  std::error_code error;
+  const std::filesystem::path file = *object->l_name == '\0'
+                                         ? std::filesystem::read_symlink("/proc/self/exe", error)
+                                         : std::filesystem::absolute(object->l_name, error);
+  return error ? nullptr : bundleWithPath(stringByDeletingLastPathComponent(file.native()));
 }
 
 std::string Bundle::bundleIdentifier() const {
@@ -32,7 +44,8 @@ std::string Bundle::bundleIdentifier() const {
 
 std::optional<std::string> Bundle::executablePath() const {
   const std::string* name = _information[executableKey].stringIf();
-  if (name == nullptr || name->empty() || name->find('/') != std::string::npos || *name == "..") {
+  if (name == nullptr || name->empty() || *name == "." || *name == ".." ||
+      name->find('/') != std::string::npos || name->find('\0') != std::string::npos) {
     return std::nullopt;
   }
   return stringByAppendingPathComponent(_path, *name);

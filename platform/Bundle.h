@@ -23,8 +23,8 @@ class Bundle {
   /// Null when the folder has no readable information list.
   static std::shared_ptr<const Bundle> bundleWithPath(const std::string& path);
 
-  /// The bundle of the code at `address`: the folder of the shared object that it was loaded from.
-  /// Null where that folder is no bundle.
+  /// The bundle of the code at `address`: the folder of the shared object that it was loaded from,
+  /// or of the program itself. Null where that folder is no bundle, and for an address of no code.
   static std::shared_ptr<const Bundle> bundleWithCode(const void* address);
 
   const std::string& bundlePath() const { return _path; }

@@ -1,11 +1,19 @@
 #include "platform/Condition.h"
 
+#include <algorithm>
 #include <condition_variable>
 #include <mutex>
 
 #include "platform/Environment.h"
 
 namespace platform {
+
+namespace {
+
+// A deadline may lie further away than the machine's clock can count; it is looked at again then.
+constexpr Seconds longestWait{3600};
+
+}  // namespace
 
 // The state has a lock of its own, taken after the caller's: a notification that comes between
 // giving the caller's lock back and falling asleep is seen as a new generation. The clock's leaps
@@ -49,7 +57,7 @@ bool Condition::waitUntil(Mutex& mutex, Clock::Instant deadline) {
   while (!changed() && clock->elapsed() < deadline) {
     const std::optional<Seconds> limit = clock->realTimeUntil(deadline);
     if (limit) {
-      _state->changed.wait_for(lock, *limit, changed);
+      _state->changed.wait_for(lock, std::min(*limit, longestWait), changed);
     } else {
       _state->changed.wait(lock, changed);
     }

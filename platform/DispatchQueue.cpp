@@ -120,13 +120,15 @@ std::shared_ptr<DispatchQueue> DispatchQueue::concurrent(std::string label) {
 }
 
 std::shared_ptr<DispatchQueue> DispatchQueue::main() {
-  static const auto queue = std::make_shared<MainQueue>();
+  // Neither this queue nor the next is ever destroyed: worker threads may outlast every static
+  // object.
+  static const auto& queue = *new auto(std::make_shared<MainQueue>());
   return queue;
 }
 
 std::shared_ptr<DispatchQueue> DispatchQueue::globalBackground() {
-  static const auto queue =
-      std::make_shared<WorkerQueue>("background", true, ThreadPriority::background);
+  static const auto& queue =
+      *new auto(std::make_shared<WorkerQueue>("background", true, ThreadPriority::background));
   return queue;
 }
 

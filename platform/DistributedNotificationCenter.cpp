@@ -2,13 +2,17 @@
 
 #include <sdbus-c++/sdbus-c++.h>
 
+#include <exception>
 #include <map>
+#include <thread>
 #include <utility>
 #include <vector>
 
 #include "platform/DispatchQueue.h"
 #include "platform/Environment.h"
+#include "platform/Strings.h"
 #include "platform/ThreadSafety.h"
+#include "platform/WorkerThreads.h"
 
 namespace platform {
 
@@ -32,7 +36,7 @@ class Observers : public std::enable_shared_from_this<Observers> {
     DispatchQueue::main()->async([self = shared_from_this(), notification] {
       for (const auto& weak : self->_observersOf(notification.name)) {
         if (const auto handler = weak.lock()) {
-          (*handler)(notification);
+          runLoggingExceptions([&] { (*handler)(notification); });
         }
       }
     });
@@ -49,6 +53,22 @@ class Observers : public std::enable_shared_from_this<Observers> {
   std::map<std::string, std::vector<std::weak_ptr<const Handler>>> _observers GUARDED_BY(_mutex);
 };
 
+void logFailure(const std::string& text) {
+  Environment::current()->log->write(1, "Notification not posted: " + text);
+}
+
+/// Whether every centre can carry the strings of a notification; logs it when not.
+bool canBePosted(const std::string& name, const std::optional<std::string>& object) {
+  const auto isText = [](const std::string& string) {
+    return isValidUTF8(string) && string.find('\0') == std::string::npos;
+  };
+  const bool possible = isText(name) && (!object || isText(*object));
+  if (!possible) {
+    logFailure("its name or object is no text");
+  }
+  return possible;
+}
+
 class LocalCenter final : public DistributedNotificationCenter {
  public:
   Observation addObserver(const std::string& name, Handler handler) override {
@@ -56,7 +76,9 @@ class LocalCenter final : public DistributedNotificationCenter {
   }
 
   void postNotification(const std::string& name, std::optional<std::string> object) override {
-    _observers->deliver({name, std::move(object)});
+    if (canBePosted(name, object)) {
+      _observers->deliver({name, std::move(object)});
+    }
   }
 
  private:
@@ -82,34 +104,60 @@ class BusCenter final : public DistributedNotificationCenter {
     _match = _connection->addMatch(rule, [observers = _observers](sdbus::Message& message) {
       _received(*observers, message);
     });
-    _connection->enterEventLoopAsync();
+    // The library's own thread would end the process together with the bus.
+    _loop = std::thread([this] { _listen(); });
   }
 
-  ~BusCenter() override { _connection->leaveEventLoop(); }
+  ~BusCenter() override {
+    _connection->leaveEventLoop();
+    _loop.join();
+  }
 
   Observation addObserver(const std::string& name, Handler handler) override {
     return _observers->add(name, std::move(handler));
   }
 
   void postNotification(const std::string& name, std::optional<std::string> object) override {
+    if (!canBePosted(name, object)) {
+      return;
+    }
     const MutexLock lock(_postMutex);
     try {
       _object->emitSignal(busMember)
           .onInterface(busInterface)
           .withArguments(name, object.has_value(), object.value_or(std::string()));
     } catch (const sdbus::Error& error) {
-      // A bus that went away takes nothing with it but the notifications.
-      Environment::current()->log->write(1, "Notification not posted: " + error.getMessage());
+      logFailure(error.getMessage());
+      _observers->deliver({name, std::move(object)});
     }
   }
 
  private:
+  void _listen() {
+    try {
+      _connection->enterEventLoop();
+    } catch (const std::exception& error) {
+      Environment::current()->log->write(
+          1, std::string("Notifications of others are no longer heard: ") + error.what());
+    }
+  }
+
+  static bool _isAtEnd(const sdbus::Message& message) {
+    std::string type;
+    std::string contents;
+    message.peekType(type, contents);
+    return type.empty() || type.front() == '\0';
+  }
+
   static void _received(Observers& observers, sdbus::Message& message) {
     std::string name;
     std::string object;
     bool hasObject = false;
     try {
       message >> name >> hasObject >> object;
+      if (!message || !_isAtEnd(message)) {
+        return;  // fewer or more arguments than ours has
+      }
     } catch (const sdbus::Error&) {
       return;  // somebody else's idea of this signal
     }
@@ -122,6 +170,7 @@ class BusCenter final : public DistributedNotificationCenter {
   std::unique_ptr<sdbus::IConnection> _connection;
   std::unique_ptr<sdbus::IObject> _object;
   sdbus::Slot _match;
+  std::thread _loop;
 };
 
 }  // namespace

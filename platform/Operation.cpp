@@ -11,9 +11,9 @@ namespace platform {
 /// state need to do nothing but announce it.
 class Operation::StateObserver : public KeyValueObserver {
  public:
-  void observeValueForKeyPath(std::string_view, KeyValueObservable& object, const KeyValueChange&,
-                              void*) override {
-    static_cast<Operation&>(object)._stateDidChange();
+  void observeValueForKeyPath(std::string_view keyPath, KeyValueObservable& object,
+                              const KeyValueChange&, void*) override {
+    static_cast<Operation&>(object)._stateDidChange(keyPath);
   }
 };
 
@@ -90,7 +90,17 @@ bool Operation::isReady() const {
   }
   const std::vector<std::shared_ptr<Operation>> waitedFor = dependencies();
   return std::all_of(waitedFor.begin(), waitedFor.end(),
-                     [](const auto& operation) { return operation->isFinished(); });
+                     [](const auto& operation) { return operation->_isOver(); });
+}
+
+bool Operation::_isOver() const {
+  {
+    const MutexLock lock(_operationMutex);
+    if (_finishSeen) {
+      return true;
+    }
+  }
+  return isFinished();
 }
 
 void Operation::addDependency(const std::shared_ptr<Operation>& operation) {
@@ -165,12 +175,14 @@ void Operation::_announceReadiness() {
   }
 }
 
-void Operation::_stateDidChange() {
-  if (isFinished()) {
+void Operation::_stateDidChange(std::string_view key) {
+  const bool finished = isFinished();
+  if (key == isFinishedKey && finished) {
     _finishWasSeen();
-  } else {
+  } else if (!finished) {
     _announceReadiness();
   }
+  // Else it was cancelled and finished in one step: the announcement of its end follows.
 }
 
 void Operation::_finishWasSeen() {

@@ -4,6 +4,7 @@
 #include <atomic>
 #include <functional>
 #include <memory>
+#include <string_view>
 #include <vector>
 
 #include "platform/Condition.h"
@@ -70,8 +71,10 @@ class Operation : public KeyValueObservable, public std::enable_shared_from_this
   /// Calls `handler` whenever isReady() may have become true.
   void _whenReadinessChanges(std::function<void()> handler);
   void _announceReadiness();
-  void _stateDidChange();
+  void _stateDidChange(std::string_view key);
   void _finishWasSeen();
+  /// Whether others need not wait for it any more: it says so, or the platform has ended it.
+  bool _isOver() const;
   /// An operation whose start() threw never announces its end; this ends it for the platform,
   /// whatever its flags say.
   void _endAfterException() { _finishWasSeen(); }

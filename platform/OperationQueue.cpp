@@ -85,9 +85,17 @@ struct OperationQueue::Implementation : std::enable_shared_from_this<Implementat
       retired = std::move(found->operation);
       entries.erase(found);
       notices.push_back(entries.size());
+      // For an observer that waits in the midst of an announcement: its thread is the one that
+      // would tell the others.
+      changed.notifyAll();
     }
     announce();
     startWhatMayRun();
+  }
+
+  bool othersStillAnnounce() const REQUIRES(mutex) {
+    const bool mine = announcing && announcer == std::this_thread::get_id();
+    return !mine && (announcing || !notices.empty());
   }
 
   void announce() {
@@ -177,8 +185,7 @@ void OperationQueue::cancelAllOperations() {
 void OperationQueue::waitUntilAllOperationsAreFinished() {
   Implementation& implementation = *_implementation;
   const MutexLock lock(implementation.mutex);
-  while (!implementation.entries.empty() ||
-         (implementation.announcing && implementation.announcer != std::this_thread::get_id())) {
+  while (!implementation.entries.empty() || implementation.othersStillAnnounce()) {
     implementation.changed.wait(implementation.mutex);
   }
 }

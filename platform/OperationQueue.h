@@ -39,8 +39,9 @@ class OperationQueue : public KeyValueObservable,
 
   /// Cancels every operation that is in the queue now.
   void cancelAllOperations();
-  /// Blocks until the queue is empty and all observers heard of it. Never call it from an operation
-  /// of the queue itself.
+  /// Blocks until the queue is empty and all observers heard of it, but for one that calls this
+  /// when told that an operation has left. Never call it from an operation of the queue itself, nor
+  /// from an observer that is told of an addition: what was added starts after that.
   void waitUntilAllOperationsAreFinished();
 
   /// Waiting and running operations, in the order in which they were added.

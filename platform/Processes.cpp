@@ -3,6 +3,7 @@
 #include <dirent.h>
 #include <fcntl.h>
 #include <fmt/format.h>
+#include <signal.h>
 #include <spawn.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -29,21 +30,36 @@ constexpr const char* launchException = "LaunchException";
                                                strerror_r(errorNumber, buffer, sizeof buffer)));
 }
 
-/// What the child opens before it runs.
-class FileActions {
+/// What a child starts with: an empty standard input, the parent's two outputs, no other open file,
+/// and signals as a fresh process has them, whatever the host ignores or blocks for itself.
+class ChildSetup {
  public:
-  FileActions() { posix_spawn_file_actions_init(&_actions); }
-  ~FileActions() { posix_spawn_file_actions_destroy(&_actions); }
-  FileActions(const FileActions&) = delete;
-  FileActions& operator=(const FileActions&) = delete;
-
-  void emptyStandardInput() {
+  ChildSetup() {
+    posix_spawn_file_actions_init(&_actions);
     posix_spawn_file_actions_addopen(&_actions, STDIN_FILENO, "/dev/null", O_RDONLY, 0);
+    posix_spawn_file_actions_addclosefrom_np(&_actions, STDERR_FILENO + 1);
+
+    posix_spawnattr_init(&_attributes);
+    sigset_t signals;
+    sigemptyset(&signals);
+    posix_spawnattr_setsigmask(&_attributes, &signals);
+    sigfillset(&signals);
+    posix_spawnattr_setsigdefault(&_attributes, &signals);
+    posix_spawnattr_setflags(&_attributes, POSIX_SPAWN_SETSIGMASK | POSIX_SPAWN_SETSIGDEF);
   }
-  const posix_spawn_file_actions_t* get() const { return &_actions; }
+  ~ChildSetup() {
+    posix_spawnattr_destroy(&_attributes);
+    posix_spawn_file_actions_destroy(&_actions);
+  }
+  ChildSetup(const ChildSetup&) = delete;
+  ChildSetup& operator=(const ChildSetup&) = delete;
+
+  const posix_spawn_file_actions_t* actions() const { return &_actions; }
+  const posix_spawnattr_t* attributes() const { return &_attributes; }
 
  private:
   posix_spawn_file_actions_t _actions{};
+  posix_spawnattr_t _attributes{};
 };
 
 class SubstitutingLauncher final : public ProcessLauncher {
@@ -71,24 +87,21 @@ std::optional<int> processNumber(std::string_view name) {
 
 int ProcessLauncher::launchAndWait(const std::string& path,
                                    const std::vector<std::string>& arguments) {
-  for (const std::string& argument : arguments) {
-    if (argument.find('\0') != std::string::npos) {
-      throwLaunchException(path, EINVAL);
-    }
-  }
   std::vector<std::string> copies = {path};
   copies.insert(copies.end(), arguments.begin(), arguments.end());
   std::vector<char*> pointers;
   for (std::string& copy : copies) {
+    if (copy.find('\0') != std::string::npos) {
+      throwLaunchException(path, EINVAL);
+    }
     pointers.push_back(copy.data());
   }
   pointers.push_back(nullptr);
 
-  FileActions actions;
-  actions.emptyStandardInput();
+  const ChildSetup setup;
   pid_t child = 0;
-  const int failure =
-      posix_spawn(&child, path.c_str(), actions.get(), nullptr, pointers.data(), environ);
+  const int failure = posix_spawn(&child, path.c_str(), setup.actions(), setup.attributes(),
+                                  pointers.data(), environ);
   if (failure != 0) {
     throwLaunchException(path, failure);
   }
@@ -117,13 +130,20 @@ int ProcessTable::readProcesses(std::vector<ProcessEntry>& entries) const {
     return errno;
   }
   entries.clear();
+  errno = 0;
   // One stream, one thread: readdir is safe here.
   while (const dirent* entry = ::readdir(folder)) {  // NOLINT(concurrency-mt-unsafe)
     if (const std::optional<int> number = processNumber(entry->d_name)) {
       entries.push_back({*number, {}});
     }
+    errno = 0;
   }
+  const int failure = errno;
   ::closedir(folder);
+  if (failure != 0) {
+    entries.clear();
+    return failure;
+  }
   std::sort(entries.begin(), entries.end(),
             [](const ProcessEntry& a, const ProcessEntry& b) { return a.processID < b.processID; });
   const auto files = systemFileManager();
@@ -132,7 +152,11 @@ int ProcessTable::readProcesses(std::vector<ProcessEntry>& entries) const {
     if (!name) {
       return true;  // it ended meanwhile
     }
-    entry.commandName = std::string(name->view().substr(0, name->view().find('\n')));
+    // The line break at the end is the kernel's; one before it belongs to the name.
+    entry.commandName = std::string(name->view());
+    if (entry.commandName.ends_with('\n')) {
+      entry.commandName.pop_back();
+    }
     return false;
   });
   return 0;

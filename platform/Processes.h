@@ -17,8 +17,10 @@ class ProcessLauncher {
 
   /// Runs the program at `path` with `arguments` (without the program's own name) and waits until
   /// it has ended. Returns its exit status, or for one that a signal ended 128 plus the signal's
-  /// number. Standard input is empty; standard output and error are this process's. Throws
-  /// Exception "LaunchException" when it cannot be started.
+  /// number. Standard input is empty; standard output and error are this process's; the child gets
+  /// no other open file, and no signal is ignored or blocked in it. Throws Exception
+  /// "LaunchException" when it cannot be started: no such program, no right to run it, a NUL in its
+  /// path or in an argument.
   virtual int launchAndWait(const std::string& path, const std::vector<std::string>& arguments);
 };
 
@@ -43,7 +45,8 @@ class ProcessTable {
  public:
   virtual ~ProcessTable() = default;
 
-  /// Fills `entries`, lowest process number first. Returns 0, or an error number on failure.
+  /// Replaces `entries` by the processes, lowest number first. Returns 0, or an error number on
+  /// failure.
   virtual int readProcesses(std::vector<ProcessEntry>& entries) const;
 
   /// The longest argument area that a process may have; absent when that cannot be told.

@@ -138,7 +138,8 @@ RunLoop::RunLoop() : _implementation(std::make_shared<Implementation>()) {}
 RunLoop::~RunLoop() = default;
 
 std::shared_ptr<RunLoop> RunLoop::main() {
-  static const auto loop = std::make_shared<RunLoop>();
+  // Never destroyed: worker threads may hand it blocks while the process ends.
+  static const auto& loop = *new auto(std::make_shared<RunLoop>());
   return loop;
 }
 

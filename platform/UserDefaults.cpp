@@ -1,8 +1,11 @@
 #include "platform/UserDefaults.h"
 
+#include <algorithm>
 #include <charconv>
 #include <chrono>
+#include <limits>
 #include <optional>
+#include <system_error>
 #include <utility>
 
 #include "platform/Environment.h"
@@ -18,19 +21,27 @@ class FileDefaults final : public UserDefaults {
   explicit FileDefaults(std::string path) : _path(std::move(path)) {}
 
   Value valueForKey(std::string_view key) const override {
-    const auto date = Environment::current()->files->modificationDate(_path);
+    const auto environment = Environment::current();
+    const auto now = environment->clock->now();
+    const auto date = environment->files->modificationDate(_path);
     const MutexLock lock(_mutex);
-    if (date != _date) {
+    if (date != _date || !_settled) {
       _date = date;
+      _settled = !date || now - *date > settlingTime;
       _settings = date ? dictionaryWithContentsOfFile(_path).value_or(Value()) : Value();
     }
     return _settings[key];
   }
 
  private:
+  // A file that was changed just now may change again and keep its date, which file systems count
+  // in coarse steps; until it has rested this long it is read each time.
+  static constexpr std::chrono::seconds settlingTime{2};
+
   const std::string _path;
   mutable Mutex _mutex;
   mutable std::optional<std::chrono::system_clock::time_point> _date GUARDED_BY(_mutex);
+  mutable bool _settled GUARDED_BY(_mutex) = false;
   mutable Value _settings GUARDED_BY(_mutex);
 };
 
@@ -43,17 +54,28 @@ class FixedDefaults final : public UserDefaults {
   const Value _settings;
 };
 
+/// The number at the start of `text`, behind white space and a sign; 0 where there is none, the
+/// nearest possible one where it is out of range.
+int64_t leadingInteger(std::string_view text) {
+  text.remove_prefix(std::min(text.find_first_not_of(" \t\n\v\f\r"), text.size()));
+  if (text.starts_with('+') && !text.starts_with("+-")) {
+    text.remove_prefix(1);
+  }
+  int64_t number = 0;
+  const auto result = std::from_chars(text.data(), text.data() + text.size(), number);
+  if (result.ec == std::errc::result_out_of_range) {
+    return text.starts_with('-') ? std::numeric_limits<int64_t>::min()
+                                 : std::numeric_limits<int64_t>::max();
+  }
+  return number;
+}
+
 }  // namespace
 
 int64_t UserDefaults::integerForKey(std::string_view key) const {
   const Value value = valueForKey(key);
   const std::string* text = value.stringIf();
-  if (text == nullptr) {
-    return value.integerValue();
-  }
-  int64_t number = 0;
-  std::from_chars(text->data(), text->data() + text->size(), number);
-  return number;
+  return text == nullptr ? value.integerValue() : leadingInteger(*text);
 }
 
 std::shared_ptr<UserDefaults> userDefaultsFromFile(std::string path) {

@@ -17,8 +17,9 @@ class UserDefaults {
   /// The setting; absent when it was not made.
   virtual Value valueForKey(std::string_view key) const = 0;
 
-  /// The setting as a whole number: 0 when it was not made or is none. Numbers may also be written
-  /// as strings.
+  /// The setting as a whole number: 0 when it was not made or is none, the nearest one that fits
+  /// where it is out of range. Numbers may also be written as strings; what follows the digits is
+  /// left aside.
   int64_t integerForKey(std::string_view key) const;
 };
 

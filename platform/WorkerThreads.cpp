@@ -11,6 +11,7 @@
 #include <exception>
 #include <memory>
 #include <mutex>
+#include <system_error>
 #include <utility>
 
 #include "platform/Environment.h"
@@ -34,8 +35,18 @@ class WorkerPool {
       _taskAdded.notify_one();
       return;
     }
+    ++_workers;
     lock.unlock();
-    std::thread([this] { _work(); }).detach();
+    try {
+      std::thread([this] { _work(); }).detach();
+    } catch (const std::system_error&) {
+      // The machine gives no more threads. The first worker to become free takes the task; only
+      // where there is none at all is it lost.
+      lock.lock();
+      if (--_workers == 0) {
+        throw;
+      }
+    }
   }
 
  private:
@@ -62,6 +73,7 @@ class WorkerPool {
           _taskAdded.wait_for(lock, std::chrono::seconds(5), [&] { return !_tasks.empty(); });
       --_idle;
       if (!woken) {
+        --_workers;
         return;
       }
     }
@@ -72,6 +84,7 @@ class WorkerPool {
   std::condition_variable _taskAdded;
   std::deque<Task> _tasks;
   size_t _idle = 0;
+  size_t _workers = 0;
 };
 
 std::string& threadName() {

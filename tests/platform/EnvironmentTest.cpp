@@ -5,6 +5,11 @@
 #include <cstdlib>
 #include <map>
 
+#include "platform/DistributedNotificationCenter.h"
+#include "platform/Processes.h"
+#include "platform/UserDefaults.h"
+#include "tests/platform/TemporaryFolder.h"
+
 namespace platform {
 namespace {
 
@@ -79,6 +84,57 @@ TEST(Environment, withoutVariablesTheUserDatabaseKnowsTheHomeFolder) {
   if (directory) {
     EXPECT_TRUE(directory->ends_with("/.cache")) << *directory;
   }
+}
+
+TEST(Environment, theRealOneHasEveryService) {
+  const Environment environment = Environment::system();
+  EXPECT_NE(environment.clock, nullptr);
+  EXPECT_NE(environment.files, nullptr);
+  EXPECT_NE(environment.log, nullptr);
+  EXPECT_EQ(environment.processLauncher, systemProcessLauncher());
+  EXPECT_EQ(environment.processTable, systemProcessTable());
+  EXPECT_NE(environment.userDefaults, nullptr);
+  EXPECT_NE(environment.notificationCenter, nullptr);
+}
+
+TEST(Environment, settingsFollowTheBaseDirectoryConvention) {
+  const tests::TemporaryFolder folder;
+  const std::string settings =
+      "<plist version=\"1.0\"><dict><key>LogLevel</key><integer>3</integer></dict></plist>";
+  folder.write("config/zeb/settings.plist", settings);
+  folder.write("home/.config/zeb/settings.plist",
+               "<plist version=\"1.0\"><dict><key>LogLevel</key><integer>4</integer></dict>"
+               "</plist>");
+  const auto level = [] { return Environment::system().userDefaults->integerForKey("LogLevel"); };
+  {
+    const Variables variables(
+        {{"XDG_CONFIG_HOME", folder.path("config")}, {"HOME", folder.path("home")}});
+    EXPECT_EQ(level(), 3);
+  }
+  {
+    const Variables variables({{"XDG_CONFIG_HOME", std::nullopt}, {"HOME", folder.path("home")}});
+    EXPECT_EQ(level(), 4);
+  }
+  {
+    const Variables variables({{"XDG_CONFIG_HOME", folder.path("none")}, {"HOME", std::nullopt}});
+    EXPECT_EQ(level(), 0);
+  }
+}
+
+TEST(Environment, printsToStandardOutput) {
+  ::testing::internal::CaptureStdout();
+  Environment::system().standardOutput("--file\n");
+  Environment::system().standardOutput(std::string("a\0b", 3));
+  EXPECT_EQ(::testing::internal::GetCapturedStdout(), std::string("--file\na\0b", 10));
+}
+
+TEST(Environment, countsAtLeastOneProcessor) {
+  EXPECT_GE(Environment::system().processorCount(), 1);
+}
+
+TEST(Environment, eachRealOneHasANotificationCenterOfItsOwn) {
+  // Not on the session bus: who wants that says so.
+  EXPECT_NE(Environment::system().notificationCenter, Environment::system().notificationCenter);
 }
 
 TEST(EnvironmentOverride, replacesTheEnvironmentForItsLifetime) {

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
+#include <chrono>
 #include <thread>
 
 #include "tests/platform/TestEnvironment.h"
@@ -75,6 +76,29 @@ TEST(Condition, notificationEndsATimedWaitEarly) {
     const MutexLock lock(mutex);
     ready = true;
   }
+  condition.notifyAll();
+  waiter.join();
+  EXPECT_TRUE(inTime);
+}
+
+TEST(Condition, aDeadlineBeyondWhatTheMachineCanCountIsStillFarAway) {
+  Mutex mutex;
+  Condition condition;
+  std::atomic<bool> waiting = false;
+  bool inTime = false;
+  std::thread waiter([&] {
+    const MutexLock lock(mutex);
+    waiting = true;
+    inTime = condition.waitUntil(mutex, Clock::Instant(1e300));
+  });
+  while (!waiting) {
+    std::this_thread::yield();
+  }
+  {
+    // Free once the waiter has fallen asleep.
+    const MutexLock lock(mutex);
+  }
+  std::this_thread::sleep_for(std::chrono::milliseconds(5));
   condition.notifyAll();
   waiter.join();
   EXPECT_TRUE(inTime);

@@ -254,6 +254,68 @@ TEST(OperationQueue, anOperationWhoseStartThrowsLeavesTheQueue) {
   EXPECT_EQ(environment.log().messages(0), (std::vector<std::string>{"cannot start"}));
 }
 
+TEST(OperationQueue, anOperationThatThrewHoldsUpNobodyWhoWaitsForIt) {
+  class Thrower : public OpenEndedOperation {
+   public:
+    void start() override { throw Exception("Name", "cannot start"); }
+    static std::shared_ptr<Thrower> make() { return std::shared_ptr<Thrower>(new Thrower); }
+  };
+  tests::TestEnvironment environment;
+  const auto queue = OperationQueue::init();
+  const auto operation = Thrower::make();
+  bool ran = false;
+  const auto dependent = BlockOperation::blockOperationWithBlock([&] { ran = true; });
+  dependent->addDependency(operation);
+  queue->addOperation(dependent);
+  queue->addOperation(operation);
+  queue->waitUntilAllOperationsAreFinished();
+  EXPECT_FALSE(operation->isFinished());
+  EXPECT_TRUE(ran);
+  const auto late = BlockOperation::blockOperationWithBlock({});
+  late->addDependency(operation);
+  EXPECT_TRUE(late->isReady());
+}
+
+TEST(OperationQueue, anObserverThatHearsOfAnEndMayWaitForTheRest) {
+  class Waiter : public KeyValueObserver {
+   public:
+    void observeValueForKeyPath(std::string_view, KeyValueObservable& object,
+                                const KeyValueChange& change, void*) override {
+      const int64_t count = change.newValue.integerValue();
+      if (before == 2 && count == 1) {
+        release.signal();
+        static_cast<OperationQueue&>(object).waitUntilAllOperationsAreFinished();
+        waited = true;
+      }
+      before = count;
+    }
+    DispatchSemaphore release{0};
+    int64_t before = 0;
+    bool waited = false;
+  };
+  const auto queue = OperationQueue::init();
+  const auto waiter = std::make_shared<Waiter>();
+  queue->addObserver(waiter, operationCountKey, keyValueObservingOptionNew);
+  DispatchSemaphore bothAdded(0);
+  queue->addOperationWithBlock([&] { waiter->release.wait(); });
+  queue->addOperationWithBlock([&] { bothAdded.wait(); });
+  bothAdded.signal();
+  queue->waitUntilAllOperationsAreFinished();
+  EXPECT_TRUE(waiter->waited);
+}
+
+TEST(OperationQueue, waitingEndsOnlyAfterTheObserversHaveHeardOfIt) {
+  const auto queue = OperationQueue::init();
+  const auto recorder = std::make_shared<CountRecorder>();
+  queue->addObserver(recorder, operationCountKey, keyValueObservingOptionNew);
+  for (int i = 0; i < 200; ++i) {
+    queue->addOperationWithBlock([] {});
+    queue->waitUntilAllOperationsAreFinished();
+    const std::lock_guard lock(recorder->mutex);
+    ASSERT_EQ(recorder->counts.size(), static_cast<size_t>(2 * (i + 1)));
+  }
+}
+
 TEST(OperationQueue, refusesWhatItCannotRun) {
   const auto queue = OperationQueue::init();
   EXPECT_THROW(queue->addOperation(nullptr), Exception);
