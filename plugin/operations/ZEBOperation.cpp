@@ -12,6 +12,8 @@ void ZEBOperation::lockExec(const std::function<void()>& block) const {
 }
 
 void ZEBOperation::finishWithError(std::optional<platform::Error> error) {
+  // A queue lets go of the operation in the midst of the announcements.
+  const auto self = weak_from_this().lock();
   willChangeValueForKey(isFinishedKey);
   willChangeValueForKey(isExecutingKey);
   lockExec([&] {
@@ -24,6 +26,7 @@ void ZEBOperation::finishWithError(std::optional<platform::Error> error) {
 }
 
 void ZEBOperation::cancel() {
+  const auto self = weak_from_this().lock();
   willChangeValueForKey(isFinishedKey);
   willChangeValueForKey(isExecutingKey);
   willChangeValueForKey(isCancelledKey);

@@ -50,7 +50,7 @@ class ZEBOperationQueueCountObserver
 
 /// An operation queue with a block that runs on the main queue each time the number of operations
 /// falls to zero. The main thread must be running its loop for that. Thread-safety: internally
-/// synchronised.
+/// synchronised; the block is set by one thread at a time.
 class ZEBOperationQueue : public platform::OperationQueue {
  public:
   using Block = ZEBOperationQueueCountObserver::Block;
