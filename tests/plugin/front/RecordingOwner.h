@@ -139,7 +139,7 @@ class RecordingOwner : public ZEBPluginOwner {
   }
   std::shared_ptr<ZEBPlugin> lastPlugin() const {
     const platform::MutexLock lock(_mutex);
-    return _lastPlugin;
+    return _lastPlugin.lock();
   }
   std::shared_ptr<ZEBQuery> lastQuery() const {
     const platform::MutexLock lock(_mutex);
@@ -188,7 +188,8 @@ class RecordingOwner : public ZEBPluginOwner {
   mutable std::vector<std::string> _questions GUARDED_BY(_mutex);
   std::vector<ZEBResultBatch> _batches GUARDED_BY(_mutex);
   platform::Value _idleTimeOutDelay GUARDED_BY(_mutex);
-  std::shared_ptr<ZEBPlugin> _lastPlugin GUARDED_BY(_mutex);
+  // Not owned: the plug-in owns this.
+  std::weak_ptr<ZEBPlugin> _lastPlugin GUARDED_BY(_mutex);
   std::shared_ptr<ZEBQuery> _lastQuery GUARDED_BY(_mutex);
   std::atomic<int> _guards{0};
 };

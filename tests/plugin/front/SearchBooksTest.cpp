@@ -180,6 +180,27 @@ TEST(SearchBooks, OfflineWithNothingButRemoteBooksInScopeTheTopicThatSaysSoIsAll
   EXPECT_THAT(world.logged(3), Contains(expected));
 }
 
+TEST(SearchBooks, OfflineAScopeOfNothingButUnknownBooksIsEmptyNotOutOfReach) {
+  const FrontWorld world;
+  addOfflineBook(world);
+  world.owner->online = false;
+  for (const Strings& scope : {Strings{"nobody"}, Strings{"nobody", "no one"}}) {
+    world.owner->forgetMessages();
+    world.search(FrontWorld::query("print", scope));
+    EXPECT_THAT(world.owner->messages(),
+                ElementsAre("disableShutdown", "finished", "enableShutdown"));
+  }
+}
+
+TEST(SearchBooks, OfflineUnknownBooksBesideRemoteOnesDropOutFirst) {
+  const FrontWorld world;
+  addOfflineBook(world);
+  world.addRemoteBook("r1", {page("/p.html", "Printing", "print queue")});
+  world.owner->online = false;
+  world.search(FrontWorld::query("print", {"nobody", "r1"}));
+  EXPECT_THAT(booksOf(world.owner->records(0)), ElementsAre(KROfflineHelpbookID));
+}
+
 TEST(SearchBooks, OfflineWithoutTheOfflineBookNothingIsFound) {
   const FrontWorld world;
   world.addRemoteBook("r1", {page("/p.html", "Printing", "print queue")});
