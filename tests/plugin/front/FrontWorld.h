@@ -224,6 +224,7 @@ class FrontWorld {
 
 inline std::vector<std::string> titlesOf(const std::vector<std::shared_ptr<ZEBResult>>& results) {
   std::vector<std::string> titles;
+  titles.reserve(results.size());
   for (const auto& result : results) {
     titles.push_back(result->title().value_or("(none)"));
   }
@@ -232,6 +233,7 @@ inline std::vector<std::string> titlesOf(const std::vector<std::shared_ptr<ZEBRe
 
 inline std::vector<double> relevancesOf(const std::vector<std::shared_ptr<ZEBResult>>& results) {
   std::vector<double> relevances;
+  relevances.reserve(results.size());
   for (const auto& result : results) {
     relevances.push_back(result->relevance().doubleValue());
   }

@@ -12,14 +12,10 @@
 
 using platform::RunLoop;
 using platform::Seconds;
-using testing::AllOf;
 using testing::Contains;
 using testing::ElementsAre;
-using testing::Eq;
 using testing::IsEmpty;
 using testing::Key;
-using testing::Not;
-using tests::anchors;
 using tests::FrontWorld;
 using tests::page;
 

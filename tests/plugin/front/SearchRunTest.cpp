@@ -8,7 +8,6 @@
 #include "tests/plugin/front/FrontWorld.h"
 
 using platform::Value;
-using testing::AllOf;
 using testing::Contains;
 using testing::ElementsAre;
 using testing::IsEmpty;
@@ -17,7 +16,6 @@ using testing::SizeIs;
 using tests::anchors;
 using tests::FrontWorld;
 using tests::page;
-using tests::semanticResult;
 using tests::titlesOf;
 
 namespace {

@@ -49,7 +49,7 @@ std::string renamedBundle(const tests::TemporaryFolder& folder, const std::strin
     return {};
   }
   const auto files = platform::Environment::current()->files;
-  const std::string copy = folder.path("Renamed.bundle");
+  std::string copy = folder.path("Renamed.bundle");
   Dictionary information = *bundle->infoDictionary().dictionaryIf();
   information[platform::Bundle::identifierKey] = identifier;
   (void)files->createDirectoryWithParents(copy);
