@@ -103,7 +103,7 @@ void Value::_swap(Value& other) noexcept {
   std::swap(_kind, other._kind);
   std::swap(_negative, other._negative);
   // Every member of the union is eight plain bytes or fewer.
-  static_assert(sizeof(_bits) == sizeof(_node) && sizeof(_bits) == sizeof(_date));
+  static_assert(sizeof(uint64_t) >= sizeof(void*) && sizeof(uint64_t) == sizeof(Date));
   uint64_t mine = 0;
   uint64_t theirs = 0;
   std::memcpy(&mine, &_bits, sizeof mine);
