@@ -1,6 +1,7 @@
 #include "bvmake/PageReader.h"
 
 #include <fmt/format.h>
+#include <libxml/parser.h>
 
 #include "bvmake/CharacterSet.h"
 #include "bvmake/HTMLPage.h"
@@ -36,6 +37,9 @@ std::optional<Page> readPage(PageKind kind, std::string_view bytes, platform::Er
   if (bytes.size() > maximumPageSize) {
     return refuse(error, fmt::format("larger than {} bytes", maximumPageSize));
   }
+  // Two threads that begin with their first page at once could wait for each other for ever if
+  // libxml2 were left to set itself up when it is first used.
+  [[maybe_unused]] static const bool initialized = (xmlInitParser(), true);
   const Markup markup = kind == PageKind::html ? Markup::html : Markup::xml;
   std::optional<std::string> text = textFromBytes(bytes, markup);
   if (!text) {

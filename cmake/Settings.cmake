@@ -13,7 +13,9 @@ option(ZEB_FUZZ "Link fuzz targets with libFuzzer instead of the corpus replayer
 
 find_program(ZEB_CCACHE ccache)
 if(ZEB_CCACHE)
-  set(CMAKE_CXX_COMPILER_LAUNCHER ${ZEB_CCACHE})
+  # Where a build lies makes no difference to what comes out, so presets and clones share results.
+  set(CMAKE_CXX_COMPILER_LAUNCHER ${CMAKE_COMMAND} -E env CCACHE_NOHASHDIR=1
+      CCACHE_BASEDIR=${PROJECT_SOURCE_DIR} ${ZEB_CCACHE})
 endif()
 
 add_compile_options(-Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wnon-virtual-dtor

@@ -1,7 +1,6 @@
 #include "zeb/Scan.h"
 
 #include <fmt/format.h>
-#include <libxml/parser.h>
 
 #include <algorithm>
 #include <exception>
@@ -14,7 +13,6 @@
 #include <vector>
 
 #include "platform/Environment.h"
-#include "platform/Strings.h"
 #include "platform/ThreadSafety.h"
 #include "zeb/HelpFolders.h"
 #include "zeb/Indexer.h"
@@ -33,14 +31,6 @@ size_t workerCount(size_t bookCount) {
   return std::min({processors, bookCount, size_t{8}});
 }
 
-/// Libraries that set themselves up when first used do so here, before there are threads: libxml2
-/// asks for that (two threads that begin at once can wait for each other for ever), and ICU does it
-/// safely, but in a way that the thread sanitizer cannot see.
-void setUpLibraries() {
-  xmlInitParser();
-  platform::lowercaseString("A");
-}
-
 /// Hands out books to threads and takes in what became of them.
 class Work {
  public:
@@ -55,7 +45,6 @@ class Work {
         _finished(std::move(finished)) {}
 
   void run() {
-    setUpLibraries();
     std::vector<std::thread> threads;
     for (size_t i = 1; i < workerCount(_books.size()); ++i) {
       threads.emplace_back([this] { _work(); });
