@@ -35,7 +35,10 @@ std::shared_ptr<const Bundle> Bundle::bundleWithCode(const void* address) {
   const std::filesystem::path file = *object->l_name == '\0'
                                          ? std::filesystem::read_symlink("/proc/self/exe", error)
                                          : std::filesystem::absolute(object->l_name, error);
-  return error ? nullptr : bundleWithPath(stringByDeletingLastPathComponent(file.native()));
+  if (error) {
+    return nullptr;
+  }
+  return bundleWithPath(stringByDeletingLastPathComponent(file.native()));
 }
 
 std::string Bundle::bundleIdentifier() const {

@@ -155,11 +155,11 @@ class BusCenter final : public DistributedNotificationCenter {
     bool hasObject = false;
     try {
       message >> name >> hasObject >> object;
-      if (!message || !_isAtEnd(message)) {
-        return;  // fewer or more arguments than ours has
+      if (!_isAtEnd(message)) {
+        return;  // more arguments than ours has
       }
     } catch (const sdbus::Error&) {
-      return;  // somebody else's idea of this signal
+      return;  // fewer arguments, or others: somebody else's idea of this signal
     }
     observers.deliver({std::move(name),
                        hasObject ? std::optional<std::string>(std::move(object)) : std::nullopt});

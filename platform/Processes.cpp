@@ -16,8 +16,6 @@
 #include "platform/Exception.h"
 #include "platform/Files.h"
 
-extern char** environ;
-
 namespace platform {
 
 namespace {

@@ -346,6 +346,7 @@ TEST(OperationQueue, manyThreadsMayAddWaitAndCancel) {
   queue->setMaxConcurrentOperationCount(2);
   std::atomic<int> ended = 0;
   std::vector<std::thread> threads;
+  threads.reserve(4);
   for (int t = 0; t < 4; ++t) {
     threads.emplace_back([&, t] {
       for (int i = 0; i < 100; ++i) {

@@ -5,6 +5,7 @@
 
 #include <filesystem>
 
+#include "platform/Processes.h"
 #include "tests/platform/TemporaryFolder.h"
 
 namespace platform {
@@ -166,6 +167,21 @@ TEST(Bundle, codeOutsideABundleHasNone) {
   EXPECT_EQ(Bundle::bundleWithCode(nullptr), nullptr);
   const int onTheStack = 0;
   EXPECT_EQ(Bundle::bundleWithCode(&onTheStack), nullptr);
+}
+
+TEST(Bundle, aProgramKnowsTheBundleItStartedFromHoweverItWasCalled) {
+  const TemporaryFolder folder;
+  folder.write("Program.bundle/Info.plist",
+               information("<key>BundleIdentifier</key><string>org.example.program</string>"));
+  std::filesystem::copy_file(BUNDLE_PROGRAM, folder.path("Program.bundle/program"));
+  const auto launch = [&](const std::string& line) {
+    return systemProcessLauncher()->launchAndWait(
+        "/bin/sh", {"-c", "cd \"$1\" && " + line, "shell", folder.path("Program.bundle")});
+  };
+  EXPECT_EQ(launch("\"$1\"/program org.example.program"), 0);
+  EXPECT_EQ(launch("./program org.example.program"), 0);
+  EXPECT_EQ(launch("P=$1; cd / && PATH=$P program org.example.program"), 0);
+  EXPECT_EQ(launch("./program org.example.other"), 1);
 }
 
 int codeOfThisProgram() { return 7; }

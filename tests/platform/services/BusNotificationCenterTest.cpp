@@ -5,6 +5,17 @@
 #include <cstdlib>
 #include <thread>
 
+#if defined(__SANITIZE_ADDRESS__)
+#define ZEB_LEAK_CHECKER
+#elif defined(__has_feature)
+#if __has_feature(address_sanitizer)
+#define ZEB_LEAK_CHECKER
+#endif
+#endif
+#if defined(ZEB_LEAK_CHECKER)
+#include <sanitizer/lsan_interface.h>
+#endif
+
 #include "platform/Exception.h"
 #include "platform/Processes.h"
 #include "platform/WorkerThreads.h"
@@ -36,6 +47,21 @@ class Stranger {
 
  private:
   std::unique_ptr<sdbus::IConnection> _connection;
+};
+
+/// The bus library loses the connection object of an address that it cannot open; the leak checker
+/// overlooks what is allocated while this lives.
+class KnownLeak {
+ public:
+#if defined(ZEB_LEAK_CHECKER)
+  KnownLeak() { __lsan_disable(); }
+  ~KnownLeak() { __lsan_enable(); }
+#else
+  KnownLeak() = default;
+  ~KnownLeak() = default;
+#endif
+  KnownLeak(const KnownLeak&) = delete;
+  KnownLeak& operator=(const KnownLeak&) = delete;
 };
 
 constexpr const char* path = "/org/zeb/Notifications";
@@ -237,6 +263,7 @@ TEST(BusNotificationCenter, manyThreadsMayPost) {
   const auto center = busNotificationCenter(bus.address());
   const auto observation = center->addObserver("A", recorder.handler());
   std::vector<std::thread> threads;
+  threads.reserve(4);
   for (int t = 0; t < 4; ++t) {
     threads.emplace_back([&] {
       for (int i = 0; i < 50; ++i) {
@@ -283,19 +310,20 @@ TEST(BusNotificationCenter, whenTheBusDiesPostingIsLoggedAndReachesThisProcessOn
 TEST(BusNotificationCenter, withoutABusThereIsNoCenter) {
   NotificationRecorder recorder;
   const tests::TemporaryFolder folder;
-  EXPECT_EQ(busNotificationCenter("unix:path=" + folder.path("nothing")), nullptr);
-  EXPECT_EQ(busNotificationCenter("no address at all"), nullptr);
   PrivateBus bus;
   bus.stop();
+  [[maybe_unused]] const KnownLeak leak;
+  EXPECT_EQ(busNotificationCenter("unix:path=" + folder.path("nothing")), nullptr);
+  EXPECT_EQ(busNotificationCenter("no address at all"), nullptr);
   EXPECT_EQ(busNotificationCenter(bus.address()), nullptr);
 }
 
 TEST(BusNotificationCenter, withoutAnAddressItIsTheUsersSessionBus) {
   NotificationRecorder recorder;
   const PrivateBus bus;
-  ::setenv("DBUS_SESSION_BUS_ADDRESS", bus.address().c_str(), 1);
+  ::setenv("DBUS_SESSION_BUS_ADDRESS", bus.address().c_str(), 1);  // NOLINT(concurrency-mt-unsafe)
   const auto center = busNotificationCenter();
-  ::unsetenv("DBUS_SESSION_BUS_ADDRESS");
+  ::unsetenv("DBUS_SESSION_BUS_ADDRESS");  // NOLINT(concurrency-mt-unsafe)
   ASSERT_NE(center, nullptr);
   const auto other = busNotificationCenter(bus.address());
   const auto observation = other->addObserver("A", recorder.handler());

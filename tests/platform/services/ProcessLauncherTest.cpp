@@ -165,6 +165,7 @@ TEST(ProcessLauncher, theChildIgnoresAndBlocksNoSignal) {
 
 TEST(ProcessLauncher, launchesOfSeveralThreadsKeepTheirStatusApart) {
   std::vector<std::thread> threads;
+  threads.reserve(6);
   std::atomic<int> wrong = 0;
   for (int t = 0; t < 6; ++t) {
     threads.emplace_back([&, t] {

@@ -10,13 +10,11 @@
 #include "platform/Environment.h"
 #include "platform/PropertyList.h"
 #include "tests/platform/TemporaryFolder.h"
-#include "tests/platform/TestEnvironment.h"
 
 namespace platform {
 namespace {
 
 using tests::TemporaryFolder;
-using tests::TestEnvironment;
 
 std::string list(const std::string& entries) {
   return "<?xml version=\"1.0\" encoding=\"UTF-8\"?><plist version=\"1.0\"><dict>" + entries +
@@ -54,7 +52,6 @@ TEST(UserDefaults, aFileThatAppearsChangesAndGoesIsFollowed) {
   const auto defaults = userDefaultsFromFile(path);
   EXPECT_EQ(defaults->integerForKey("LogLevel"), 0);
   for (int level = 1; level < 20; ++level) {
-    // Quicker than a file system's dates can tell apart.
     folder.write("settings.plist", logLevel(level));
     EXPECT_EQ(defaults->integerForKey("LogLevel"), level);
   }
@@ -62,6 +59,17 @@ TEST(UserDefaults, aFileThatAppearsChangesAndGoesIsFollowed) {
   EXPECT_EQ(defaults->integerForKey("LogLevel"), 0);
   folder.write("settings.plist", logLevel(7));
   EXPECT_EQ(defaults->integerForKey("LogLevel"), 7);
+}
+
+TEST(UserDefaults, twoChangesOfTheSameDateAreBothSeen) {
+  const TemporaryFolder folder;
+  const std::string path = folder.write("settings.plist", logLevel(1));
+  const auto date = std::filesystem::last_write_time(path);
+  const auto defaults = userDefaultsFromFile(path);
+  EXPECT_EQ(defaults->integerForKey("LogLevel"), 1);
+  folder.write("settings.plist", logLevel(2));
+  std::filesystem::last_write_time(path, date);
+  EXPECT_EQ(defaults->integerForKey("LogLevel"), 2);
 }
 
 TEST(UserDefaults, aFileThatHasRestedIsReadOnlyWhenItsDateChanges) {
@@ -152,6 +160,7 @@ TEST(UserDefaults, manyThreadsMayAsk) {
   const TemporaryFolder folder;
   const auto defaults = userDefaultsFromFile(folder.write("settings.plist", logLevel(1)));
   std::vector<std::thread> threads;
+  threads.reserve(4);
   for (int t = 0; t < 4; ++t) {
     threads.emplace_back([&, t] {
       for (int i = 0; i < 20; ++i) {

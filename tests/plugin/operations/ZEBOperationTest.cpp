@@ -170,6 +170,15 @@ TEST(ZEBOperation, cancellingAFinishedOneMarksItCancelledAndRepeatsTheAnnounceme
   EXPECT_EQ(operation->error(), failure(1));
 }
 
+TEST(ZEBOperation, startLooksAtNoFlagButCancelled) {
+  int runs = 0;
+  const auto operation = SampleOperation::make([&] { ++runs; });
+  operation->finishWithError(failure(1));
+  operation->start();
+  EXPECT_EQ(runs, 1);
+  EXPECT_EQ(operation->error(), failure(1));
+}
+
 TEST(ZEBOperation, startDoesNotRunTheMainOfTheBaseClass) {
   class Plain : public ZEBOperation {
    public:
@@ -266,6 +275,7 @@ TEST(ZEBOperation, everyCallThatEndsItGivesOnePairOfFinishedAnnouncements) {
 
   constexpr int callsOfEach = 50;
   std::vector<std::thread> threads;
+  threads.reserve(4);
   for (int t = 0; t < 3; ++t) {
     threads.emplace_back([&, t] {
       for (int i = 0; i < callsOfEach; ++i) {
