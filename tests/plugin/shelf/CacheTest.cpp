@@ -343,14 +343,7 @@ TEST_F(Cache, isWrittenUnderTheLockOfTheShelf) {
   world.change([&](platform::Environment& environment) { environment.files = files; });
   ZEBIndexshelf& shelf = world.makeShelf();
   bool locked = false;
-  files->onWrite = [&] {
-    std::thread([&] {
-      locked = !shelf._shelfMonitor().try_lock();
-      if (!locked) {
-        shelf._shelfMonitor().unlock();
-      }
-    }).join();
-  };
+  files->onWrite = [&] { locked = !world.othersGetTheLock(); };
   shelf.archiveKnownIndices();
   EXPECT_TRUE(locked);
 }

@@ -34,6 +34,7 @@ TEST(Registration, registersABookTwoSecondsAfterItWasAdded) {
   EXPECT_TRUE(operationCountBecomes(world, 0));
   EXPECT_EQ(world.shelf->_pendingBookCount(), 0U);
   EXPECT_NE(world.knownRecord("org.one"), nullptr);
+  EXPECT_THAT(world.clock->sleeps(), ElementsAre(2.0));
 }
 
 TEST(Registration, registersBooksOneAtATimeAtLeastTwoSecondsApart) {

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <filesystem>
+#include <future>
 
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBStrings.h"
@@ -176,17 +177,40 @@ TEST_F(Resolution, addsUpdateFetchesUnderTheMonitorOfTheirQueue) {
   EXPECT_EQ(fetches().size(), 1U);
 }
 
+/// Calls back whenever a file is mapped.
+class WatchedFiles : public platform::FailingFileManager {
+ public:
+  std::optional<platform::Data> contentsMappedAtPath(const std::string& path,
+                                                     platform::Error* error) const override {
+    if (onRead) {
+      onRead();
+    }
+    return FailingFileManager::contentsMappedAtPath(path, error);
+  }
+  std::function<void()> onRead;
+};
+
 TEST_F(Resolution, addsGenerationsUnderTheLockOfTheShelf) {
+  const auto files = std::make_shared<WatchedFiles>();
+  world.change([&](platform::Environment& environment) { environment.files = files; });
   ZEBIndexshelf& shelf = makeShelf(true);
   const auto book = world.makeBook("org.one");
-  std::thread resolver;
+  std::promise<void> lookedUp;
+  std::promise<void> locked;
+  files->onRead = [&] {
+    lookedUp.set_value();
+    locked.get_future().wait();
+  };
+  std::thread resolver([&] { shelf.indicesForBook(book); });
+  lookedUp.get_future().wait();
   {
     const platform::MonitorLock lock(shelf._shelfMonitor());
-    resolver = std::thread([&] { shelf.indicesForBook(book); });
+    locked.set_value();
     std::this_thread::sleep_for(std::chrono::milliseconds(5));
     EXPECT_THAT(generations(), IsEmpty());
   }
   resolver.join();
+  files->onRead = nullptr;
   EXPECT_EQ(generations().size(), 1U);
 }
 
@@ -273,27 +297,17 @@ TEST_F(Resolution, logsAnExceptionAtLevelZeroAndReturnsWhatItHadFound) {
 }
 
 TEST_F(Resolution, readsFilesWithoutTheLockOfTheShelf) {
-  class BlockingFiles : public platform::FailingFileManager {
-   public:
-    std::optional<platform::Data> contentsMappedAtPath(const std::string& path,
-                                                       platform::Error* error) const override {
-      if (onRead) {
-        onRead();
-      }
-      return FailingFileManager::contentsMappedAtPath(path, error);
-    }
-    std::function<void()> onRead;
-  };
-  const auto files = std::make_shared<BlockingFiles>();
+  const auto files = std::make_shared<WatchedFiles>();
   world.change([&](platform::Environment& environment) { environment.files = files; });
   const auto book = world.makeBookWithIndex("org.one");
   makeShelf(false);
   int reads = 0;
   files->onRead = [&] {
     ++reads;
-    std::thread([&] { EXPECT_THAT(world.shelf->_knownIndices(), IsEmpty()); }).join();
+    EXPECT_TRUE(world.othersGetTheLock());
   };
   world.shelf->indicesForBook(book);
+  files->onRead = nullptr;
   EXPECT_EQ(reads, 1);
 }
 

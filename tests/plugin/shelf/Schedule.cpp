@@ -76,7 +76,6 @@ class Run {
     return _caches + "/" + ZEBDaemonBundleID + "/" + ZEBGeneratedIndexDirectory;
   }
 
-  const uint64_t _seed;
   const std::string _ground;
   const std::string _caches;
   const std::string _cachePath;
@@ -108,8 +107,7 @@ std::string uniqueCaches(const ScheduleGround& ground) {
 }
 
 Run::Run(uint64_t seed, const ScheduleGround& ground)
-    : _seed(seed),
-      _ground(ground.path()),
+    : _ground(ground.path()),
       _caches(uniqueCaches(ground)),
       _cachePath(_caches + "/help/HelpindexCache.plist"),
       _clock(std::make_shared<platform::SimulatedClock>(std::chrono::system_clock::now())),
@@ -425,6 +423,7 @@ void Run::_examine() {
     const auto known = _shelf->_knownIndices();
     const bool isKnown = known.contains(bookID) && !known.at(bookID).empty();
     _expect(!isKnown || stored || _revived.contains(bookID), bookID + " came from nowhere");
+    _expect(!isKnown || stored || !_removals.contains(bookID), bookID + " was not removed");
     const bool wasRemoved = _wasReset || _removals.contains(bookID);
     _expect(isKnown || wasRemoved || (!stored && !_revived.contains(bookID)), bookID + " is lost");
   }

@@ -15,8 +15,8 @@
 namespace tests {
 
 void ShelfOwner::disableShutdown() {
-  ++_disableCount;
   ++_depth;
+  ++_disableCount;
 }
 
 void ShelfOwner::enableShutdown() {
@@ -127,8 +127,21 @@ std::vector<ZEBIndexChange> RecordingObserver::kinds() const {
   return kinds;
 }
 
+void RecordingClock::sleep(platform::Seconds duration) {
+  {
+    const std::lock_guard lock(_mutex);
+    _sleeps.push_back(duration.count());
+  }
+  SimulatedClock::sleep(duration);
+}
+
+std::vector<double> RecordingClock::sleeps() const {
+  const std::lock_guard lock(_mutex);
+  return _sleeps;
+}
+
 ShelfWorld::ShelfWorld()
-    : clock(std::make_shared<platform::SimulatedClock>(std::chrono::system_clock::now())),
+    : clock(std::make_shared<RecordingClock>(std::chrono::system_clock::now())),
       log(std::make_shared<platform::CapturingLogSink>()),
       files(std::make_shared<platform::FailingFileManager>()),
       launcher(std::make_shared<RecordingLauncher>()),
@@ -254,6 +267,17 @@ std::shared_ptr<ZEBIndex> ShelfWorld::knownRecord(const std::string& bookID) con
   const auto known = shelf->_knownIndices();
   const auto found = known.find(bookID);
   return found == known.end() || found->second.size() != 1 ? nullptr : found->second.front();
+}
+
+bool ShelfWorld::othersGetTheLock() const {
+  bool got = false;
+  std::thread([&] {
+    if (shelf->_shelfMonitor().try_lock()) {
+      got = true;
+      shelf->_shelfMonitor().unlock();
+    }
+  }).join();
+  return got;
 }
 
 std::vector<LogEntry> ShelfWorld::logged() const {

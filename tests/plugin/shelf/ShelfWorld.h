@@ -134,6 +134,18 @@ class RecordingObserver : public ZEBIndexshelfObserver {
   std::vector<Change> _changes;
 };
 
+/// A simulated clock that notes for how long it was asked to sleep.
+class RecordingClock : public platform::SimulatedClock {
+ public:
+  using SimulatedClock::SimulatedClock;
+  void sleep(platform::Seconds duration) override;
+  std::vector<double> sleeps() const;
+
+ private:
+  mutable std::mutex _mutex;
+  std::vector<double> _sleeps;
+};
+
 /// A temporary folder, an environment over it, an owner and, once made, a shelf. On destruction it
 /// finishes all work and checks that the guard is balanced and nobody holds the shelf.
 class ShelfWorld {
@@ -172,6 +184,9 @@ class ShelfWorld {
   /// The only record of a book; null when it has none.
   std::shared_ptr<ZEBIndex> knownRecord(const std::string& bookID) const;
 
+  /// Whether another thread than this one can have the shelf's lock now.
+  bool othersGetTheLock() const;
+
   /// What was logged, but for what records say while they read their files.
   std::vector<LogEntry> logged() const;
 
@@ -181,7 +196,7 @@ class ShelfWorld {
   TemporaryFolder folder;
   const std::string caches = folder.path("caches");
   const std::string helpCaches = folder.path("caches/help");
-  const std::shared_ptr<platform::SimulatedClock> clock;
+  const std::shared_ptr<RecordingClock> clock;
   const std::shared_ptr<platform::CapturingLogSink> log;
   const std::shared_ptr<platform::FailingFileManager> files;
   const std::shared_ptr<RecordingLauncher> launcher;
