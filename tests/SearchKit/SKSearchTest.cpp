@@ -152,12 +152,13 @@ TEST(SKSearch, operatorsNeedNoBlanks) {
 
 TEST(SKSearch, danglingOperatorsAreIgnored) {
   for (const char* query :
-       {"applique cherry &",     "& applique cherry",   "applique & & cherry",   "applique | & cherry",
-        "applique cherry |",     "| applique cherry",   "applique cherry -",     "applique - cherry",
-        "applique + cherry",     "applique cherry +",   "applique cherry !",     "applique -& cherry",
-        "applique * cherry",     "applique cherry **",  "() applique cherry ()", "applique cherry \"\"",
-        "applique cherry \"?\"", "applique cherry (-)", "applique && cherry",    "applique cherry ((",
-        "applique )( cherry"}) {
+       {"applique cherry &",    "& applique cherry",     "applique & & cherry",
+        "applique | & cherry",  "applique cherry |",     "| applique cherry",
+        "applique cherry -",    "applique - cherry",     "applique + cherry",
+        "applique cherry +",    "applique cherry !",     "applique -& cherry",
+        "applique * cherry",    "applique cherry **",    "() applique cherry ()",
+        "applique cherry \"\"", "applique cherry \"?\"", "applique cherry (-)",
+        "applique && cherry",   "applique cherry ((",    "applique )( cherry"}) {
     EXPECT_EQ(found(fruits(), query), "/5 ") << query;
   }
   for (const char* query :
@@ -301,7 +302,8 @@ TEST(SKSearch, moreOfTheWordsScoreHigher) {
 
 TEST(SKSearch, aRepeatedWordScoresAsOne) {
   EXPECT_EQ(scores(fruits(), "applique applique APPLIQUE"), scores(fruits(), "applique"));
-  EXPECT_EQ(scores(fruits(), "applique applique date", orBlank), scores(fruits(), "applique date", orBlank));
+  EXPECT_EQ(scores(fruits(), "applique applique date", orBlank),
+            scores(fruits(), "applique date", orBlank));
 }
 
 TEST(SKSearch, scoresOfACompleteMatchAreTheSameForBothMeaningsOfABlank) {

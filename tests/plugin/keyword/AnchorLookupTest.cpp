@@ -69,10 +69,11 @@ TEST(AnchorLookup, NameIsTakenExactlyAsGiven) {
 
 TEST(AnchorLookup, AnchorOnThreePagesYieldsThreeResultsInTheOrderOfTheList) {
   const KeywordWorld world;
-  const auto index = indexWithAnchors(
-      world,
-      {page("/a.html", "A", "applet"), page("/b.html", "B", "applet"), page("/c.html", "C", "applet")},
-      anchors({{"top", {"/c.html", "/a.html", "/b.html"}}}));
+  const auto index =
+      indexWithAnchors(world,
+                       {page("/a.html", "A", "applet"), page("/b.html", "B", "applet"),
+                        page("/c.html", "C", "applet")},
+                       anchors({{"top", {"/c.html", "/a.html", "/b.html"}}}));
   const auto results = world.controller->doLookupOfAnchor("top", {index});
   EXPECT_THAT(titlesOf(results), ElementsAre("C", "A", "B"));
   for (const auto& result : results) {

@@ -358,7 +358,8 @@ TEST(ZEBHelpindexSearchController, PageWithoutATitleIsAResultWithoutOne) {
 
 TEST(ZEBHelpindexSearchController, IgnoredURLsLeavePagesOut) {
   const KeywordWorld world;
-  const auto index = world.index({page("/a.html", "A", "applet"), page("/b c.html", "B", "applet")});
+  const auto index =
+      world.index({page("/a.html", "A", "applet"), page("/b c.html", "B", "applet")});
   EXPECT_THAT(titlesOf(world.controller->doSearchForString(
                   "applet", {index}, {world.fileURL("x.html"), world.fileURL("book/b%20c.html")})),
               ElementsAre("A"));
@@ -397,9 +398,10 @@ TEST(ZEBHelpindexSearchController, IgnoredStringsThatAreNotEscapedOrNoURLsDoNoHa
   EXPECT_THAT(
       world.controller->doSearchForString("applet", {index}, {world.fileURL("book/a b.html")}),
       IsEmpty());
-  EXPECT_THAT(world.controller->doSearchForString(
-                  "applet", {index}, {"", std::string("\0", 1), "a b.html", "%", "http://x/a.html"}),
-              SizeIs(1));
+  EXPECT_THAT(
+      world.controller->doSearchForString(
+          "applet", {index}, {"", std::string("\0", 1), "a b.html", "%", "http://x/a.html"}),
+      SizeIs(1));
 }
 
 TEST(ZEBHelpindexSearchController, EmptyIgnoreListLeavesNothingOut) {
