@@ -8,9 +8,9 @@ namespace platform {
 
 void KeyValueObserver::observeValueForKeyPath(std::string_view keyPath, KeyValueObservable&,
                                               const KeyValueChange&, void*) {
-  throw Exception(internalInconsistencyException,
-                  "an observer got a notification for a key that it does not know: " +
-                      std::string(keyPath));
+  throw Exception(
+      internalInconsistencyException,
+      "an observer got a notification for a key that it does not know: " + std::string(keyPath));
 }
 
 void KeyValueObservable::addObserver(const std::shared_ptr<KeyValueObserver>& observer,

@@ -26,9 +26,9 @@ class KeyValueObserver {
  public:
   virtual ~KeyValueObserver() = default;
 
-  /// Called on the thread that makes the change, with no lock of the observed object held. An observer
-  /// passes key paths that it does not know on to this implementation, which throws Exception
-  /// "InternalInconsistencyException": such a notification was never asked for.
+  /// Called on the thread that makes the change, with no lock of the observed object held. An
+  /// observer passes key paths that it does not know on to this implementation, which throws
+  /// Exception "InternalInconsistencyException": such a notification was never asked for.
   virtual void observeValueForKeyPath(std::string_view keyPath, KeyValueObservable& object,
                                       const KeyValueChange& change, void* context);
 };
