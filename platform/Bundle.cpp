@@ -18,8 +18,26 @@ Bundle::Bundle(std::string path, Value information)
 std::shared_ptr<const Bundle> Bundle::bundleWithPath(const std::string& path) {
   const std::optional<Value> information =
       dictionaryWithContentsOfFile(stringByAppendingPathComponent(path, "Info.plist"));
-  return information ? std::shared_ptr<const Bundle>(new Bundle(path, *information)) : nullptr;
+  if (!information) {
+    return nullptr;
+  }
+  return std::shared_ptr<const Bundle>(new Bundle(path, *information));
 }
+
+namespace {
+
+/// The absolute path of a loaded object; empty where that cannot be told.
+std::string pathOfObject(const link_map& object) {
+  // The linker knows the program itself by no name, and dladdr would give the one that the caller
+  // typed, which may be no path at all.
+  std::error_code error;
+  if (*object.l_name == '\0') {
+    return std::filesystem::read_symlink("/proc/self/exe", error).native();
+  }
+  return std::filesystem::absolute(object.l_name, error).native();
+}
+
+}  // namespace
 
 std::shared_ptr<const Bundle> Bundle::bundleWithCode(const void* address) {
   Dl_info information{};
@@ -29,16 +47,11 @@ std::shared_ptr<const Bundle> Bundle::bundleWithCode(const void* address) {
   if (found == 0 || object == nullptr) {
     return nullptr;
   }
-  // The linker knows the program itself by no name, and dladdr would give the one that the caller
-  // typed, which may be no path at all.
-  std::error_code error;
-  const std::filesystem::path file = *object->l_name == '\0'
-                                         ? std::filesystem::read_symlink("/proc/self/exe", error)
-                                         : std::filesystem::absolute(object->l_name, error);
-  if (error) {
+  const std::string path = pathOfObject(*object);
+  if (path.empty()) {
     return nullptr;
   }
-  return bundleWithPath(stringByDeletingLastPathComponent(file.native()));
+  return bundleWithPath(stringByDeletingLastPathComponent(path));
 }
 
 std::string Bundle::bundleIdentifier() const {
