@@ -17,6 +17,11 @@ class SystemClock final : public Clock {
   Instant elapsed() const override { return std::chrono::steady_clock::now().time_since_epoch(); }
 
   void sleep(Seconds duration) override {
+    // In pieces: the machine's clock cannot count to every number that a double holds.
+    constexpr Seconds piece = std::chrono::hours(1);
+    for (; duration > piece; duration -= piece) {
+      std::this_thread::sleep_for(piece);
+    }
     if (duration > Seconds::zero()) {
       std::this_thread::sleep_for(duration);
     }

@@ -85,7 +85,8 @@ struct Current {
 };
 
 Current& currentHolder() {
-  static Current current;
+  // Never destroyed: worker threads may ask while the process ends.
+  static auto& current = *new Current;
   return current;
 }
 
