@@ -16,7 +16,6 @@ using platform::KeyedArchiver;
 using platform::KeyedObject;
 using platform::KeyedUnarchiver;
 using platform::Value;
-using testing::Contains;
 using testing::ElementsAre;
 using testing::IsEmpty;
 using tests::LogEntry;

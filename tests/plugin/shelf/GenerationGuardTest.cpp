@@ -203,6 +203,7 @@ class RealTool {
     std::vector<std::string> words = {program,  "-c",       "echo ready; read line",
                                       "--file", outputPath, "--verbose"};
     std::vector<char*> arguments;
+    arguments.reserve(words.size() + 1);
     for (std::string& word : words) {
       arguments.push_back(word.data());
     }

@@ -15,12 +15,9 @@
 
 using platform::FailingFileManager;
 using platform::Value;
-using testing::AllOf;
 using testing::Contains;
 using testing::ElementsAre;
-using testing::ElementsAreArray;
 using testing::IsEmpty;
-using testing::Not;
 using tests::LogEntry;
 using tests::RecordingLauncher;
 using tests::ShelfWorld;

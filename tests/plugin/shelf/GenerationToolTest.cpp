@@ -101,6 +101,7 @@ TEST_F(GenerationTool, twoRunsOfItOnOneFileAtOnceLeaveAWholeFile) {
   std::filesystem::create_directories(world.generatedRoot() + "/org.one");
   for (int round = 0; round < 3; ++round) {
     std::vector<std::thread> runs;
+    runs.reserve(3);
     for (int i = 0; i < 3; ++i) {
       runs.emplace_back([&] {
         EXPECT_EQ(platform::systemProcessLauncher()->launchAndWait(
@@ -125,6 +126,7 @@ TEST_F(GenerationTool, runByTwoProcessesForOneBookAtOnceLeavesAWholeFileAndAnInd
   for (int round = 0; round < 4; ++round) {
     std::vector<int> statuses(2, -1);
     std::vector<std::thread> others;
+    others.reserve(statuses.size());
     for (int& status : statuses) {
       others.emplace_back([&, place = &status] {
         *place = platform::systemProcessLauncher()->launchAndWait(

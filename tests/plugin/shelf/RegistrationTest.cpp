@@ -186,6 +186,7 @@ TEST(Registration, takesEachPendingBookExactlyOnceWhoeverAsks) {
     shelf.addRegistrationOperationForBook(books.back());
   }
   std::vector<std::thread> threads;
+  threads.reserve(4);
   for (int i = 0; i < 4; ++i) {
     threads.emplace_back([&, i] {
       for (const auto& book : books) {

@@ -257,7 +257,7 @@ std::shared_ptr<ZEBHelpBook> ShelfWorld::makeBook(const std::string& bookID, int
 
 std::shared_ptr<ZEBHelpBook> ShelfWorld::makeBookWithIndex(const std::string& bookID, int32_t type,
                                                            platform::Value::Dictionary more) const {
-  const std::shared_ptr<ZEBHelpBook> book = makeBook(bookID, type);
+  std::shared_ptr<ZEBHelpBook> book = makeBook(bookID, type);
   book->setIndexPaths(
       {writeIndex(book->path() + "/" + bookID + "." + ZEBHelpindexExtension, std::move(more))});
   return book;
