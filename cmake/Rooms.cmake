@@ -2,6 +2,8 @@
 
 # Everything but tests, fuzz targets and benchmarks.
 add_custom_target(rooms)
+# Every fuzz target.
+add_custom_target(fuzz_targets)
 
 # zeb_room(NAME [SHARED] SOURCES … USES …): a library that other rooms may link, and nothing more
 # than what its USES name (headers are found from the top folder). Static, but SHARED for the rooms
@@ -43,4 +45,5 @@ function(zeb_fuzz name)
     add_test(NAME fuzz.${name} COMMAND fuzz_${name} ${PROJECT_SOURCE_DIR}/fuzz/corpus/${name})
   endif()
   target_link_libraries(fuzz_${name} PRIVATE ${FUZZ_USES})
+  add_dependencies(fuzz_targets fuzz_${name})
 endfunction()
