@@ -6,63 +6,20 @@
 #include <utility>
 
 #include "host/Luxwell/LUXNumbers.h"
+#include "host/Luxwell/LUXRecords.h"
 #include "platform/Exception.h"
 #include "platform/PropertyList.h"
 #include "platform/Strings.h"
 #include "platform/ThreadSafety.h"
 
-using luxnumbers::readUInt32;
 using luxnumbers::readVarnumber;
 
 namespace {
 
-// The records of a section that begins with their number and their offsets: a slice each.
-class Records {
- public:
-  Records() = default;
-
-  // No records where the offsets do not lie in the section, in order.
-  explicit Records(const platform::Data& section) {
-    if (section.length() < 8) {
-      return;
-    }
-    const uint64_t count = readUInt32(section.bytes());
-    const uint64_t start = 4 + 4 * (count + 1);
-    if (start > section.length()) {
-      return;
-    }
-    const platform::Data bytes = section.slice(start, section.length() - start);
-    const uint8_t* const offsets = section.bytes() + 4;
-    for (uint64_t i = 0; i < count; ++i) {
-      if (readUInt32(offsets + 4 * i) > readUInt32(offsets + 4 * (i + 1))) {
-        return;
-      }
-    }
-    if (readUInt32(offsets) != 0 || readUInt32(offsets + 4 * count) != bytes.length()) {
-      return;
-    }
-    _count = count;
-    _section = section;
-    _bytes = bytes;
-  }
-
-  size_t count() const noexcept { return _count; }
-
-  std::string_view operator[](size_t i) const noexcept {
-    const uint8_t* const offsets = _section.bytes() + 4;
-    const size_t begin = readUInt32(offsets + 4 * i);
-    return _bytes.view().substr(begin, readUInt32(offsets + 4 * (i + 1)) - begin);
-  }
-
- private:
-  size_t _count = 0;
-  platform::Data _section;
-  platform::Data _bytes;
-};
-
-Records recordsOfSection(const LUXSectionedData& sections, uint32_t type) {
+LUXRecords recordsOfSection(const LUXSectionedData& sections, uint32_t type) {
   const LUXSection* section = sections.sectionWithType(type);
-  return section != nullptr && section->checksumMatches() ? Records(section->bytes) : Records();
+  return section != nullptr && section->checksumMatches() ? LUXRecords(section->bytes)
+                                                          : LUXRecords();
 }
 
 const uint8_t* bytesOf(std::string_view view) noexcept {
@@ -100,8 +57,8 @@ std::optional<std::vector<LUXTokenCounts::Entry>> entriesOfRecord(std::string_vi
 }  // namespace
 
 struct HelpLUXIndex::Documents {
-  Records keys;
-  Records properties;
+  LUXRecords keys;
+  LUXRecords properties;
 
   std::optional<size_t> indexOfKey(std::string_view key) const {
     size_t low = 0;
@@ -133,7 +90,7 @@ struct HelpLUXIndex::Lazy {
   Documents documents;
 
   std::once_flag countsOnce;
-  Records counts;
+  LUXRecords counts;
 
   platform::Mutex mutex;
   std::weak_ptr<const LUXTokenTable> table GUARDED_BY(mutex);
@@ -196,7 +153,7 @@ const HelpLUXIndex::Documents& HelpLUXIndex::_documents() const {
 }
 
 std::vector<std::string> HelpLUXIndex::documentKeys() const {
-  const Records& keys = _documents().keys;
+  const LUXRecords& keys = _documents().keys;
   std::vector<std::string> result;
   result.reserve(keys.count());
   for (size_t i = 0; i < keys.count(); ++i) {

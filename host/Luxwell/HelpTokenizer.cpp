@@ -255,6 +255,12 @@ void unifyApostrophes(std::string& word) {
   }
 }
 
+std::string formOfFolded(std::string_view folded) {
+  std::string form = luxfolding::withoutDiacritics(folded);
+  form.resize(beginningOf(form, HelpTokenizer::maximumFormLength).size());
+  return form;
+}
+
 std::string_view withoutPossessive(std::string_view surface) noexcept {
   for (const std::string_view ending : {"'s", "'S", "\u2019s", "\u2019S"}) {
     if (surface.size() > ending.size() && surface.ends_with(ending)) {
@@ -273,6 +279,10 @@ bool mayHaveWideForms(std::string_view text) noexcept {
     }
   }
   return false;
+}
+
+bool joinsNames(char connector) noexcept {
+  return connector == '.' || connector == '_' || connector == ':';
 }
 
 class Segmenter {
@@ -294,7 +304,7 @@ class Segmenter {
           at = _takeUnspaced(at);
           break;
         default:
-          _passOver(character);
+          _passOver(at, character);
           at = character.end;
       }
     }
@@ -303,7 +313,7 @@ class Segmenter {
  private:
   static constexpr size_t longestConnection = 2;
 
-  void _passOver(const Character& character) {
+  void _passOver(size_t at, const Character& character) {
     switch (character.kind) {
       case CharacterClass::blank:
         _gapHasBlank = true;
@@ -313,6 +323,7 @@ class Segmenter {
       case CharacterClass::connector:
       case CharacterClass::apostrophe:
         ++_connectors;
+        _gapJoinsNames = _gapJoinsNames && joinsNames(_text[at]);
         break;
       default:
         _gapBreaks = true;
@@ -321,10 +332,23 @@ class Segmenter {
 
   void _add(std::string_view surface) {
     const bool connected = _connectors == 0 || (!_gapHasBlank && _connectors <= longestConnection);
-    _segments.push_back({surface, _first || _gapBreaks || !connected});
+    const bool breaks = _first || _gapBreaks || !connected;
+    const auto begin = static_cast<size_t>(surface.data() - _text.data());
+    std::string_view whole;
+    if (!breaks && _connectors > 0 && _gapJoinsNames) {
+      whole = _text.substr(_wholeBegin, begin + surface.size() - _wholeBegin);
+      _segments.back().whole = {};
+    } else {
+      _wholeBegin = begin;
+    }
+    if (whole.size() > HelpTokenizer::maximumFormLength) {
+      whole = {};
+    }
+    _segments.push_back({surface, breaks, whole});
     _first = false;
     _gapBreaks = false;
     _gapHasBlank = false;
+    _gapJoinsNames = true;
     _connectors = 0;
   }
 
@@ -381,7 +405,9 @@ class Segmenter {
   bool _first = true;
   bool _gapBreaks = false;
   bool _gapHasBlank = false;
+  bool _gapJoinsNames = true;
   size_t _connectors = 0;
+  size_t _wholeBegin = 0;
 };
 
 bool isUnspacedAt(std::string_view text, size_t at) noexcept {
@@ -470,7 +496,7 @@ std::string HelpTokenizer::tokenizedStringFromString(std::string_view text) cons
     if (!result.empty()) {
       result += ' ';
     }
-    result += word.stem;
+    result += allStopWords ? word.form : word.stem;
   }
   return result;
 }
@@ -501,15 +527,12 @@ void HelpTokenizer::segmentsOfText(std::string_view text, std::vector<Segment>& 
 }
 
 std::optional<HelpTokenizer::Word> HelpTokenizer::wordOfSurface(std::string_view surface) const {
-  std::string folded = luxfolding::caseFolded(surface, _language);
-  unifyApostrophes(folded);
-  folded.resize(beginningOf(folded, maximumFormLength).size());
+  const std::string folded = _folded(surface);
   Word word;
-  word.form = luxfolding::withoutDiacritics(folded);
+  word.form = formOfFolded(folded);
   if (word.form.empty()) {
     return std::nullopt;
   }
-  word.form.resize(beginningOf(word.form, maximumFormLength).size());
   word.stem = _language.stemmer == nullptr
                   ? word.form
                   : luxfolding::withoutDiacritics(stemOf(folded, _language.stemmer));
@@ -521,6 +544,17 @@ std::optional<HelpTokenizer::Word> HelpTokenizer::wordOfSurface(std::string_view
   return word;
 }
 
+std::string HelpTokenizer::formOfSurface(std::string_view surface) const {
+  return formOfFolded(_folded(surface));
+}
+
+std::string HelpTokenizer::_folded(std::string_view surface) const {
+  std::string folded = luxfolding::caseFolded(surface, _language);
+  unifyApostrophes(folded);
+  folded.resize(beginningOf(folded, maximumFormLength).size());
+  return folded;
+}
+
 void HelpTokenizer::wordsOfText(std::string_view text, std::vector<Word>& words) const {
   std::vector<Segment> segments;
   std::string buffer;
@@ -530,6 +564,9 @@ void HelpTokenizer::wordsOfText(std::string_view text, std::vector<Word>& words)
     breaks = breaks || segment.breaksChain;
     if (std::optional<Word> word = wordOfSurface(segment.surface)) {
       word->breaksChain = breaks;
+      if (!segment.whole.empty()) {
+        word->wholeForm = formOfSurface(segment.whole);
+      }
       words.push_back(std::move(*word));
       breaks = false;
     }

@@ -38,6 +38,9 @@ class HelpTokenizer {
     /// Something other than blanks stands between the word before and this one: a comma, the end
     /// of a block. A single connecting character inside a name ("wi-fi", "os.path") does not count.
     bool breaksChain = false;
+    /// With the last word of a name whose parts are joined by '.', '_' or ':' ("os.path"), the form
+    /// of the whole name; else empty.
+    std::string wholeForm;
   };
 
   /// Changes whenever the same text may give other words or stems than before; models made by
@@ -61,7 +64,7 @@ class HelpTokenizer {
   std::string localization() const;
   std::string languageTag() const;
 
-  /// The stems of the words that are no stop words, joined by one blank; the stems of all words
+  /// The stems of the words that are no stop words, joined by one blank; the forms of all words
   /// where all are stop words. Two titles that differ only in what a search overlooks give the
   /// same.
   std::string tokenizedStringFromString(std::string_view text) const;
@@ -79,6 +82,8 @@ class HelpTokenizer {
   struct Segment {
     std::string_view surface;
     bool breaksChain = false;
+    /// As Word::wholeForm, not folded.
+    std::string_view whole;
   };
 
   /// Appends the words of `text` as they stand; wordsOfText() is this and wordOfSurface() for each.
@@ -89,8 +94,11 @@ class HelpTokenizer {
                       std::string& buffer) const;
 
   /// Form and stem of one segment; absent for one that leaves nothing when it is folded. Says
-  /// nothing of the chain.
+  /// nothing of the chain and of whole names.
   std::optional<Word> wordOfSurface(std::string_view surface) const;
+
+  /// The form alone; empty where wordOfSurface() gives nothing.
+  std::string formOfSurface(std::string_view surface) const;
 
   /// Words as a person reads them: joined by one blank, but by none beside a word of a script that
   /// has no blanks between words.
@@ -98,6 +106,8 @@ class HelpTokenizer {
 
  private:
   explicit HelpTokenizer(const LUXLanguage& language);
+
+  std::string _folded(std::string_view surface) const;
 
   const LUXLanguage& _language;
   std::unordered_set<std::string> _stopWords;

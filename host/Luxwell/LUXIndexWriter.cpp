@@ -1,10 +1,8 @@
 #include "host/Luxwell/LUXIndexWriter.h"
 
 #include <algorithm>
-#include <array>
 #include <cstdint>
 #include <functional>
-#include <limits>
 #include <string_view>
 #include <unordered_map>
 #include <unordered_set>
@@ -14,13 +12,12 @@
 #include "host/Luxwell/HelpTokenizer.h"
 #include "host/Luxwell/LUXNumbers.h"
 #include "host/Luxwell/LUXPhraseFinder.h"
-#include "host/Luxwell/LUXPhraseScore.h"
 #include "host/Luxwell/LUXSectionedData.h"
+#include "host/Luxwell/LUXTokenSections.h"
 #include "platform/Exception.h"
 #include "platform/PropertyList.h"
 #include "platform/Strings.h"
 
-using luxnumbers::appendUInt32;
 using luxnumbers::appendVarnumber;
 
 namespace {
@@ -43,16 +40,17 @@ class Names {
       return found->second;
     }
     const auto number = static_cast<uint32_t>(_names.size());
-    const auto added = _numbers.emplace(std::string(name), number).first;
-    _names.push_back(&added->first);
+    _numbers.emplace(std::string(name), number);
+    _names.emplace_back(name);
     return number;
   }
   size_t count() const noexcept { return _names.size(); }
-  const std::string& operator[](size_t number) const noexcept { return *_names[number]; }
+  const std::string& operator[](size_t number) const noexcept { return _names[number]; }
+  const std::vector<std::string>& all() const noexcept { return _names; }
 
  private:
   std::unordered_map<std::string, uint32_t, TextHash, std::equal_to<>> _numbers;
-  std::vector<const std::string*> _names;
+  std::vector<std::string> _names;
 };
 
 // A word as it is written.
@@ -65,86 +63,30 @@ struct Surface {
   uint32_t count = 0;
 };
 
-struct Document {
-  LUXDocument document;
-  // Numbers of surfaces.
-  LUXWordSequence sequence;
-};
-
-struct Entry {
-  uint32_t token = 0;
+// A name that is made of several words.
+struct Whole {
+  uint32_t form = 0;
   bool inTitle = false;
 };
 
-// The numbers that tokens of one kind get when they are put in order.
-struct Order {
-  std::vector<std::string> sorted;
-  std::vector<uint32_t> numberOf;
+struct Page {
+  std::string key;
+  std::string title;
+  std::optional<std::string> description;
+  bool excludedFromSearch = false;
+  // Numbers of surfaces.
+  LUXWordSequence sequence;
+  std::vector<Whole> wholes;
 };
 
-Order orderOf(const std::vector<std::string>& tokens, uint32_t start) {
-  std::vector<uint32_t> positions(tokens.size());
-  for (uint32_t i = 0; i < positions.size(); ++i) {
-    positions[i] = i;
-  }
-  std::sort(positions.begin(), positions.end(),
-            [&](uint32_t a, uint32_t b) { return tokens[a] < tokens[b]; });
-  Order order;
-  order.numberOf.resize(tokens.size());
-  for (const uint32_t position : positions) {
-    if (order.sorted.empty() || order.sorted.back() != tokens[position]) {
-      order.sorted.push_back(tokens[position]);
-    }
-    order.numberOf[position] = start + static_cast<uint32_t>(order.sorted.size() - 1);
-  }
-  return order;
+bool hasNoLetter(std::string_view form) {
+  return std::all_of(form.begin(), form.end(), [](char byte) {
+    return (byte >= '0' && byte <= '9') || byte == '.' || byte == ',';
+  });
 }
 
-// A section of records: their number, their offsets, their bytes.
-class RecordsWriter {
- public:
-  std::string& beginRecord() {
-    _offsets.push_back(_bytes.size());
-    return _bytes;
-  }
-
-  LUXSection section(uint32_t type) {
-    _offsets.push_back(_bytes.size());
-    if (_bytes.size() > std::numeric_limits<uint32_t>::max()) {
-      throw platform::Exception(platform::invalidArgumentException,
-                                "a book too large for semantic data");
-    }
-    std::string out;
-    out.reserve(4 * (_offsets.size() + 1) + _bytes.size());
-    appendUInt32(out, static_cast<uint32_t>(_offsets.size() - 1));
-    for (const uint64_t offset : _offsets) {
-      appendUInt32(out, static_cast<uint32_t>(offset));
-    }
-    out += _bytes;
-    return LUXSection::sectionWithBytes(type, platform::Data::adopt(std::move(out)));
-  }
-
- private:
-  std::vector<uint64_t> _offsets;
-  std::string _bytes;
-};
-
-// The score of the last phrase of this length that still gets into a budget of one a page; 0 where
-// all do.
-double thresholdOf(const std::vector<LUXPhrase>& phrases, uint32_t length, size_t pageCount) {
-  std::vector<double> scores;
-  for (const LUXPhrase& phrase : phrases) {
-    if (phrase.statistics.length == length &&
-        phrase.statistics.pageCount >= LUXPhraseMinimumPageCount) {
-      scores.push_back(LUXPhraseScore(phrase.statistics));
-    }
-  }
-  if (pageCount == 0 || scores.size() <= pageCount) {
-    return 0;
-  }
-  const auto last = scores.begin() + static_cast<std::ptrdiff_t>(pageCount - 1);
-  std::nth_element(scores.begin(), last, scores.end(), std::greater<>());
-  return *last;
+LUXSection section(uint32_t type, platform::Data bytes) {
+  return LUXSection::sectionWithBytes(type, std::move(bytes));
 }
 
 }  // namespace
@@ -152,7 +94,7 @@ double thresholdOf(const std::vector<LUXPhrase>& phrases, uint32_t length, size_
 struct LUXIndexWriter::Implementation {
   std::shared_ptr<const HelpTokenizer> tokenizer;
   std::unordered_set<std::string> keys;
-  std::vector<Document> documents;
+  std::vector<Page> pages;
   Names surfaceNames;
   std::vector<Surface> surfaces;
   Names forms;
@@ -176,7 +118,7 @@ struct LUXIndexWriter::Implementation {
     return number;
   }
 
-  void addText(std::string_view text, LUXWordSequence& sequence) {
+  void addText(std::string_view text, bool isTitle, Page& page) {
     segments.clear();
     tokenizer->segmentsOfText(text, segments, buffer);
     bool breaks = true;
@@ -184,24 +126,25 @@ struct LUXIndexWriter::Implementation {
       breaks = breaks || segment.breaksChain;
       const uint32_t number = surfaceNumber(segment.surface);
       if (surfaces[number].form != none) {
-        sequence.words.push_back({number, breaks});
+        page.sequence.words.push_back({number, breaks});
         breaks = false;
+      }
+      if (!segment.whole.empty()) {
+        if (const std::string form = tokenizer->formOfSurface(segment.whole); !form.empty()) {
+          page.wholes.push_back({forms.numberOf(form), isTitle});
+        }
       }
     }
   }
 
-  // How each form is shown: as it is written where it is not at the beginning of a sentence, as far
-  // as one can know: in small letters if it ever is.
+  // Which surface each form is shown as: as it is written where it does not begin a sentence, as
+  // far as one can know: in small letters if it ever is.
   std::vector<uint32_t> displaySurfaces() const {
     std::vector<uint32_t> best(forms.count(), none);
     for (uint32_t number = 0; number < surfaces.size(); ++number) {
-      const Surface& surface = surfaces[number];
-      if (surface.form == none) {
-        continue;
-      }
-      uint32_t& chosen = best[surface.form];
-      if (chosen == none || isBetterDisplay(number, chosen)) {
-        chosen = number;
+      if (surfaces[number].form != none) {
+        uint32_t& chosen = best[surfaces[number].form];
+        chosen = chosen == none || isBetterDisplay(number, chosen) ? number : chosen;
       }
     }
     return best;
@@ -218,175 +161,150 @@ struct LUXIndexWriter::Implementation {
   }
 
   std::vector<LUXWordSequence> formSequences() const {
-    std::vector<LUXWordSequence> pages;
-    pages.reserve(documents.size());
-    for (const Document& document : documents) {
-      LUXWordSequence page = document.sequence;
-      for (LUXWordSequence::Word& word : page.words) {
+    std::vector<LUXWordSequence> sequences;
+    sequences.reserve(pages.size());
+    for (const Page& page : pages) {
+      sequences.push_back(page.sequence);
+      for (LUXWordSequence::Word& word : sequences.back().words) {
         word.number = surfaces[word.number].form;
       }
-      pages.push_back(std::move(page));
     }
-    return pages;
+    return sequences;
   }
 
   // Forms that may begin or end a phrase: no stop words, and nothing without a letter.
   std::vector<bool> edgeForms() const {
-    std::vector<bool> result(forms.count(), true);
-    for (const Surface& surface : surfaces) {
-      if (surface.form != none && surface.isStopWord) {
-        result[surface.form] = false;
-      }
-    }
+    std::vector<bool> mayStand(forms.count());
     for (size_t form = 0; form < forms.count(); ++form) {
-      const std::string& text = forms[form];
-      if (std::all_of(text.begin(), text.end(), [](char byte) {
-            return (byte >= '0' && byte <= '9') || byte == '.' || byte == ',';
-          })) {
-        result[form] = false;
-      }
+      mayStand[form] = !hasNoLetter(forms[form]);
     }
-    return result;
-  }
-
-  platform::Data finish();
-};
-
-platform::Data LUXIndexWriter::Implementation::finish() {
-  std::sort(documents.begin(), documents.end(),
-            [](const Document& a, const Document& b) { return a.document.key < b.document.key; });
-  LUXPhraseFinder finder;
-  finder.find(formSequences(), edgeForms());
-
-  std::unordered_map<uint64_t, uint32_t> bigramNumbers;
-  std::vector<uint64_t> bigrams;
-  std::array<std::vector<std::vector<Entry>>, LUXTokenKindCount> entries;
-  for (auto& kind : entries) {
-    kind.resize(documents.size());
-  }
-  for (size_t page = 0; page < documents.size(); ++page) {
-    const LUXWordSequence& sequence = documents[page].sequence;
-    uint32_t before = none;
-    for (size_t at = 0; at < sequence.words.size(); ++at) {
-      const LUXWordSequence::Word& word = sequence.words[at];
-      const Surface& surface = surfaces[word.number];
-      const bool inTitle = at < sequence.titleLength;
-      entries[2][page].push_back({surface.form, inTitle});
+    for (const Surface& surface : surfaces) {
       if (surface.isStopWord) {
-        before = none;
-        continue;
+        mayStand[surface.form] = false;
       }
-      entries[0][page].push_back({surface.stem, inTitle});
-      if (before != none && !word.breaksChain) {
-        const uint64_t pair = static_cast<uint64_t>(before) << 32U | surface.stem;
-        const auto [found, isNew] =
-            bigramNumbers.emplace(pair, static_cast<uint32_t>(bigrams.size()));
-        if (isNew) {
-          bigrams.push_back(pair);
+    }
+    return mayStand;
+  }
+
+  void addWords(LUXTokenSections& tokens) const {
+    std::unordered_map<uint64_t, uint32_t> bigrams;
+    std::vector<std::string> bigramNames;
+    for (size_t number = 0; number < pages.size(); ++number) {
+      const Page& page = pages[number];
+      uint32_t before = none;
+      for (size_t at = 0; at < page.sequence.words.size(); ++at) {
+        const LUXWordSequence::Word& word = page.sequence.words[at];
+        const Surface& surface = surfaces[word.number];
+        const uint32_t inTitle = at < page.sequence.titleLength ? 1 : 0;
+        tokens.add(number, LUXTokenKind::form, surface.form, inTitle, 1 - inTitle);
+        if (surface.isStopWord) {
+          before = none;
+          continue;
         }
-        entries[1][page].push_back({found->second, inTitle});
+        tokens.add(number, LUXTokenKind::stem, surface.stem, inTitle, 1 - inTitle);
+        if (before != none && !word.breaksChain) {
+          const uint64_t pair = static_cast<uint64_t>(before) << 32U | surface.stem;
+          const auto [found, isNew] =
+              bigrams.emplace(pair, static_cast<uint32_t>(bigramNames.size()));
+          if (isNew) {
+            bigramNames.push_back(stems[before] + ' ' + stems[surface.stem]);
+          }
+          tokens.add(number, LUXTokenKind::bigram, found->second, inTitle, 1 - inTitle);
+        }
+        before = surface.stem;
       }
-      before = surface.stem;
-    }
-  }
-
-  // Names of the tokens of each kind, and their numbers in order.
-  std::array<std::vector<std::string>, LUXTokenKindCount> names;
-  std::vector<bool> stemIsKept(stems.count(), false);
-  for (const Surface& surface : surfaces) {
-    if (surface.stem != none && !surface.isStopWord) {
-      stemIsKept[surface.stem] = true;
-    }
-  }
-  for (size_t stem = 0; stem < stems.count(); ++stem) {
-    names[0].push_back(stems[stem]);
-  }
-  for (const uint64_t pair : bigrams) {
-    names[1].push_back(stems[pair >> 32U] + ' ' + stems[pair & 0xFFFFFFFFU]);
-  }
-  for (size_t form = 0; form < forms.count(); ++form) {
-    names[2].push_back(forms[form]);
-  }
-  const std::vector<uint32_t> displays = displaySurfaces();
-  for (const LUXPhrase& phrase : finder.phrases()) {
-    std::string display;
-    for (size_t i = 0; i < phrase.statistics.length; ++i) {
-      HelpTokenizer::appendToDisplay(display, surfaceNames[displays[phrase.words[i]]]);
-    }
-    names[3].push_back(std::move(display));
-  }
-
-  std::array<Order, LUXTokenKindCount> orders;
-  std::array<std::vector<std::string>, LUXTokenKindCount> sorted;
-  uint32_t start = 0;
-  for (size_t kind = 0; kind < LUXTokenKindCount; ++kind) {
-    orders[kind] = orderOf(names[kind], start);
-    sorted[kind] = std::move(orders[kind].sorted);
-    start += static_cast<uint32_t>(sorted[kind].size());
-  }
-
-  RecordsWriter counts;
-  RecordsWriter keySection;
-  RecordsWriter properties;
-  for (size_t page = 0; page < documents.size(); ++page) {
-    const LUXDocument& document = documents[page].document;
-    keySection.beginRecord() += document.key;
-
-    std::string& record = properties.beginRecord();
-    appendVarnumber(record, (document.excludedFromSearch ? HelpLUXIndex::excludedFlag : 0) |
-                                (document.description ? HelpLUXIndex::hasDescriptionFlag : 0));
-    appendVarnumber(record, document.title.size());
-    record += document.title;
-    record += document.description.value_or(std::string());
-
-    std::vector<LUXTokenCounts::Entry> all;
-    for (size_t kind = 0; kind < LUXTokenKindCount; ++kind) {
-      for (const Entry& entry : entries[kind][page]) {
-        all.push_back(
-            {orders[kind].numberOf[entry.token], entry.inTitle ? 1U : 0U, entry.inTitle ? 0U : 1U});
+      for (const Whole& whole : page.wholes) {
+        const uint32_t inTitle = whole.inTitle ? 1 : 0;
+        tokens.add(number, LUXTokenKind::form, whole.form, inTitle, 1 - inTitle);
       }
     }
-    for (const LUXPhraseFinder::Count& count : finder.countsOfPages()[page]) {
-      all.push_back({orders[3].numberOf[count.phrase], count.titleCount, count.bodyCount});
-    }
-    std::sort(all.begin(), all.end(),
-              [](const auto& a, const auto& b) { return a.number < b.number; });
-    std::string& bytes = counts.beginRecord();
-    uint32_t next = 0;
-    for (size_t i = 0; i < all.size();) {
-      LUXTokenCounts::Entry sum = all[i];
-      for (++i; i < all.size() && all[i].number == sum.number; ++i) {
-        sum.titleCount += all[i].titleCount;
-        sum.bodyCount += all[i].bodyCount;
-      }
-      const bool isPlain = sum.titleCount == 0 && sum.bodyCount == 1;
-      appendVarnumber(bytes, static_cast<uint64_t>(sum.number - next) << 1U | (isPlain ? 0U : 1U));
-      if (!isPlain) {
-        appendVarnumber(bytes, sum.titleCount);
-        appendVarnumber(bytes, sum.bodyCount);
-      }
-      next = sum.number + 1;
-    }
+    tokens.setNames(LUXTokenKind::stem, stems.all());
+    tokens.setNames(LUXTokenKind::bigram, std::move(bigramNames));
+    tokens.setNames(LUXTokenKind::form, forms.all());
   }
 
-  platform::Value::Dictionary attributes;
-  attributes.emplace(HelpLUXIndexAttributeLanguageKey, tokenizer->languageTag());
-  attributes.emplace(HelpLUXIndexAttributeBigramThresholdKey,
-                     thresholdOf(finder.phrases(), 2, documents.size()));
-  attributes.emplace(HelpLUXIndexAttributeTrigramThresholdKey,
-                     thresholdOf(finder.phrases(), 3, documents.size()));
+  void addTitles(LUXTokenSections& tokens) const {
+    std::vector<std::string> names;
+    for (size_t number = 0; number < pages.size(); ++number) {
+      std::string title = tokenizer->tokenizedStringFromString(pages[number].title);
+      if (!title.empty() && title.size() <= LUXTokenTable::maximumTokenLength) {
+        tokens.add(number, LUXTokenKind::title, static_cast<uint32_t>(names.size()), 1, 0);
+        names.push_back(std::move(title));
+      }
+    }
+    tokens.setNames(LUXTokenKind::title, std::move(names));
+  }
 
-  std::vector<LUXSection> sections;
-  sections.push_back(LUXSection::sectionWithBytes(
-      HelpLUXIndex::attributesSectionType,
-      platform::dataFromPropertyList(std::move(attributes), platform::PropertyListFormat::binary)));
-  sections.push_back(counts.section(HelpLUXIndex::countsSectionType));
-  sections.push_back(keySection.section(HelpLUXIndex::keysSectionType));
-  sections.push_back(properties.section(HelpLUXIndex::propertiesSectionType));
-  sections.push_back(LUXSection::sectionWithBytes(
-      HelpLUXIndex::tokensSectionType, LUXTokenTable::withTokens(sorted)->sectionBytes()));
-  return LUXSectionedData(std::move(sections)).write();
-}
+  void addPhrases(const LUXPhraseFinder& finder, LUXTokenSections& tokens) const {
+    const std::vector<uint32_t> displays = displaySurfaces();
+    std::vector<std::string> names;
+    names.reserve(finder.phrases().size());
+    for (const LUXPhrase& phrase : finder.phrases()) {
+      std::string display;
+      for (size_t i = 0; i < phrase.statistics.length; ++i) {
+        HelpTokenizer::appendToDisplay(display, surfaceNames[displays[phrase.words[i]]]);
+      }
+      names.push_back(std::move(display));
+    }
+    for (size_t number = 0; number < pages.size(); ++number) {
+      for (const LUXPhraseFinder::Count& count : finder.countsOfPages()[number]) {
+        tokens.add(number, LUXTokenKind::phrase, count.phrase, count.titleCount, count.bodyCount);
+      }
+    }
+    tokens.setNames(LUXTokenKind::phrase, std::move(names));
+  }
+
+  platform::Data attributes(const LUXPhraseFinder& finder) const {
+    platform::Value::Dictionary attributes;
+    attributes.emplace(HelpLUXIndexAttributeLanguageKey, tokenizer->languageTag());
+    attributes.emplace(HelpLUXIndexAttributeBigramThresholdKey,
+                       LUXPhraseThreshold(finder.phrases(), 1, 2, pages.size()));
+    attributes.emplace(HelpLUXIndexAttributeTrigramThresholdKey,
+                       LUXPhraseThreshold(finder.phrases(), 3, 4, pages.size()));
+    return platform::dataFromPropertyList(std::move(attributes),
+                                          platform::PropertyListFormat::binary);
+  }
+
+  LUXRecordsWriter keyRecords() const {
+    LUXRecordsWriter records;
+    for (const Page& page : pages) {
+      records.beginRecord() += page.key;
+    }
+    return records;
+  }
+
+  LUXRecordsWriter propertyRecords() const {
+    LUXRecordsWriter records;
+    for (const Page& page : pages) {
+      std::string& record = records.beginRecord();
+      appendVarnumber(record, (page.excludedFromSearch ? HelpLUXIndex::excludedFlag : 0) |
+                                  (page.description ? HelpLUXIndex::hasDescriptionFlag : 0));
+      appendVarnumber(record, page.title.size());
+      record += page.title;
+      record += page.description.value_or(std::string());
+    }
+    return records;
+  }
+
+  platform::Data finish() {
+    std::sort(pages.begin(), pages.end(),
+              [](const Page& a, const Page& b) { return a.key < b.key; });
+    LUXPhraseFinder finder;
+    finder.find(formSequences(), edgeForms());
+    LUXTokenSections tokens(pages.size());
+    addWords(tokens);
+    addTitles(tokens);
+    addPhrases(finder, tokens);
+    tokens.finish();
+    return LUXSectionedData(
+               {section(HelpLUXIndex::attributesSectionType, attributes(finder)),
+                section(HelpLUXIndex::countsSectionType, tokens.countRecords().finish()),
+                section(HelpLUXIndex::keysSectionType, keyRecords().finish()),
+                section(HelpLUXIndex::propertiesSectionType, propertyRecords().finish()),
+                section(HelpLUXIndex::tokensSectionType, tokens.tokenBytes())})
+        .write();
+  }
+};
 
 LUXIndexWriter::LUXIndexWriter(std::shared_ptr<const HelpTokenizer> tokenizer)
     : _implementation(std::make_unique<Implementation>()) {
@@ -400,17 +318,16 @@ void LUXIndexWriter::addDocument(const LUXDocument& document) {
     throw platform::Exception(platform::invalidArgumentException,
                               "the page " + document.key + " comes twice");
   }
-  Document added;
-  added.document = document;
-  added.document.blocks.clear();
-  _implementation->addText(document.title, added.sequence);
-  added.sequence.titleLength = added.sequence.words.size();
+  Page page{
+      document.key, document.title, document.description, document.excludedFromSearch, {}, {}};
+  _implementation->addText(document.title, true, page);
+  page.sequence.titleLength = page.sequence.words.size();
   for (const std::string& block : document.blocks) {
-    _implementation->addText(block, added.sequence);
+    _implementation->addText(block, false, page);
   }
-  _implementation->documents.push_back(std::move(added));
+  _implementation->pages.push_back(std::move(page));
 }
 
-size_t LUXIndexWriter::documentCount() const noexcept { return _implementation->documents.size(); }
+size_t LUXIndexWriter::documentCount() const noexcept { return _implementation->pages.size(); }
 
 platform::Data LUXIndexWriter::finish() { return _implementation->finish(); }

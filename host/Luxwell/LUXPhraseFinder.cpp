@@ -1,6 +1,7 @@
 #include "host/Luxwell/LUXPhraseFinder.h"
 
 #include <algorithm>
+#include <functional>
 #include <unordered_map>
 
 namespace {
@@ -172,4 +173,22 @@ void LUXPhraseFinder::_countLongerPhrases() {
       _phrases[phrase].statistics.longerPhraseFrequency += _phrases[number].statistics.frequency;
     }
   }
+}
+
+double LUXPhraseThreshold(const std::vector<LUXPhrase>& phrases, uint32_t shortest,
+                          uint32_t longest, size_t budget) {
+  std::vector<double> scores;
+  for (const LUXPhrase& phrase : phrases) {
+    const LUXPhraseStatistics& statistics = phrase.statistics;
+    if (statistics.length >= shortest && statistics.length <= longest &&
+        statistics.pageCount >= LUXPhraseMinimumPageCount) {
+      scores.push_back(LUXPhraseScore(statistics));
+    }
+  }
+  if (budget == 0 || scores.size() <= budget) {
+    return 0;
+  }
+  const auto last = scores.begin() + static_cast<std::ptrdiff_t>(budget - 1);
+  std::nth_element(scores.begin(), last, scores.end(), std::greater<>());
+  return *last;
 }

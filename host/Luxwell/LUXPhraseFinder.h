@@ -81,3 +81,8 @@ class LUXPhraseFinder {
   std::vector<uint32_t> _groupOfPhrase;
   std::vector<std::vector<Count>> _counts;
 };
+
+/// The score of the last phrase that still gets into a budget of `budget` phrases of `shortest` to
+/// `longest` words, of those in LUXPhraseMinimumPageCount pages or more; 0 where all get in.
+double LUXPhraseThreshold(const std::vector<LUXPhrase>& phrases, uint32_t shortest,
+                          uint32_t longest, size_t budget);

@@ -18,9 +18,6 @@ namespace {
 
 constexpr size_t headerLength = 4 * LUXTokenKindCount;
 
-// No writer makes longer ones: a phrase has four words of at most 255 bytes.
-constexpr uint64_t longestToken = 1024;
-
 // How much text a section may stand for: damaged sizes must not take all memory.
 constexpr uint64_t mostTextPerByte = 64;
 
@@ -117,7 +114,7 @@ std::shared_ptr<const LUXTokenTable> LUXTokenTable::withSectionBytes(const platf
       const size_t begin = text.size();
       if (!readVarnumber(at, end, shared) || !readVarnumber(at, end, length) ||
           length > static_cast<uint64_t>(end - at) || shared > begin - before ||
-          shared + length > longestToken || begin + shared + length > mostText) {
+          shared + length > maximumTokenLength || begin + shared + length > mostText) {
         return nullptr;
       }
       text.append(text, before, shared);

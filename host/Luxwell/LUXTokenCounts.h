@@ -18,14 +18,17 @@ enum class LUXTokenKind : uint8_t {
   /// Two stems that follow one another, joined by one blank; stop words and punctuation between
   /// two words keep them apart.
   bigram = 1,
-  /// The folded form of a word, stop words too.
+  /// The folded form of a word, stop words too, and of a name that is made of several ("os.path").
   form = 2,
   /// What can be shown as a suggestion: one to four words that follow one another without
   /// punctuation between them, as a person reads them, with no stop word at either end.
   phrase = 3,
+  /// The whole title, once for each page: HelpTokenizer::tokenizedStringFromString() of it. Titles
+  /// longer than LUXTokenTable::maximumTokenLength have none.
+  title = 4,
 };
 
-inline constexpr size_t LUXTokenKindCount = 4;
+inline constexpr size_t LUXTokenKindCount = 5;
 
 /// One token of a page. `token` lives as long as the table that it comes from.
 struct LUXTokenCount {
@@ -43,6 +46,9 @@ struct LUXTokenCount {
 /// Thread-safety: immutable.
 class LUXTokenTable {
  public:
+  /// In bytes.
+  static constexpr size_t maximumTokenLength = 1100;
+
   struct Token {
     LUXTokenKind kind;
     /// Lives as long as the table.
