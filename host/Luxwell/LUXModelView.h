@@ -47,6 +47,10 @@ inline constexpr double titleWeight = 4;
 inline constexpr double titleLengthShare = 0.5;
 inline constexpr double bodyLengthShare = 0.75;
 
+/// Vectors are filled up with zeros to a multiple of this, and no longer than that.
+inline constexpr uint32_t vectorBlock = 32;
+inline constexpr uint32_t maximumStride = 320;
+
 }  // namespace luxmodel
 
 /// What a model knows: pages, terms with the pages that they are in, the meaning of terms and pages
@@ -68,12 +72,10 @@ inline constexpr double bodyLengthShare = 0.75;
 /// Thread-safety: immutable.
 class LUXModelView {
  public:
-  /// Versions of the format. A file of another major version is built anew.
-  static constexpr uint16_t majorVersion = 1;
-  static constexpr uint16_t minorVersion = 0;
-
   /// Null for what is no model, is of another version, or does not have all of its bytes.
   static std::shared_ptr<const LUXModelView> viewWithData(const platform::Data& data);
+  /// The same for a model that is not written yet. Sections must start at multiples of 8.
+  static std::shared_ptr<const LUXModelView> viewWithSections(LUXSectionedData sections);
 
   ~LUXModelView();
   LUXModelView(const LUXModelView&) = delete;
@@ -81,12 +83,11 @@ class LUXModelView {
 
   /// Reads all bytes and tells whether they are those that were written. Linear in the size.
   bool checksumsMatch() const;
-  size_t byteCount() const noexcept { return _data.length(); }
 
   /// HelpTokenizer::version() of the process that made the model.
   uint32_t tokenizerVersion() const noexcept { return _numbers.tokenizerVersion; }
   /// Folder name of the language.
-  std::string_view language() const noexcept;
+  std::string_view language() const noexcept { return _language; }
   /// What HelpLUXModel::saveWithOptions() was given; absent when that cannot be read.
   platform::Value options() const;
 
@@ -209,14 +210,15 @@ class LUXModelView {
     std::span<const uint32_t> hiddenCounts;
   };
 
-  LUXModelView() = default;
-  bool _open(const LUXSectionedData& sections);
+  LUXModelView();
+  bool _open();
 
-  platform::Data _data;
+  std::unique_ptr<const LUXSectionedData> _sections;
   platform::Data _optionsBytes;
   Numbers _numbers;
   std::string_view _language;
-  Strings _books;
+  std::span<const uint32_t> _bookOffsets;
+  std::string_view _bookText;
   std::span<const uint32_t> _pageStartsOfBooks;
   std::span<const uint32_t> _pageKeyOffsets;
   std::string_view _pageKeyText;
