@@ -121,6 +121,9 @@ LUXQueryTerms LUXQueryTerms::termsOfText(const HelpTokenizer& tokenizer, std::st
       HelpTokenizer::appendToDisplay(terms.foldedText, word.form);
       terms.wordStarts.push_back(terms.foldedText.size() - word.form.size());
     }
+    if (!word.wholeForm.empty()) {
+      forms.add(word.wholeForm);
+    }
     if (word.isStopWord && !terms.onlyStopWords) {
       continue;
     }
@@ -128,7 +131,7 @@ LUXQueryTerms LUXQueryTerms::termsOfText(const HelpTokenizer& tokenizer, std::st
       if (!terms.normalizedTitle.empty()) {
         terms.normalizedTitle += ' ';
       }
-      terms.normalizedTitle += word.stem;
+      terms.normalizedTitle += terms.onlyStopWords ? word.form : word.stem;
     }
     stems.add(word.stem);
     forms.add(word.form);

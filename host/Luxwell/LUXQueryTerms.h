@@ -24,7 +24,7 @@ struct LUXQueryTerms {
   std::vector<Term> stems;
   /// Pairs of stems that follow one another, joined by one blank, as pages have them.
   std::vector<Term> bigrams;
-  /// Folded forms of the words that `stems` comes from.
+  /// Folded forms of the words that `stems` comes from, and of names that are made of several.
   std::vector<Term> forms;
   /// There are words, and all of them are stop words: no model counts their stems, only their
   /// forms.

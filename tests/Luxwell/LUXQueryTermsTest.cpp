@@ -35,6 +35,12 @@ TEST(LUXQueryTerms, KeepsStemsAndFormsOfWordsThatTellPagesApart) {
   EXPECT_FALSE(terms.onlyStopWords);
 }
 
+TEST(LUXQueryTerms, NamesMadeOfSeveralWordsAreFormsToo) {
+  const LUXQueryTerms terms = termsOf("import os.path ");
+  EXPECT_EQ(tokensOf(terms.stems), (Strings{"import", "os", "path"}));
+  EXPECT_EQ(tokensOf(terms.forms), (Strings{"import", "os", "os.path", "path"}));
+}
+
 TEST(LUXQueryTerms, CountsWordsThatOccurAgain) {
   const LUXQueryTerms terms = termsOf("print, printing or printed?");
   ASSERT_EQ(terms.stems.size(), 1U);
@@ -66,7 +72,8 @@ TEST(LUXQueryTerms, TheLastWordIsUnfinishedWhileNothingFollowsIt) {
 }
 
 TEST(LUXQueryTerms, TheNormalizedTitleIsTheTokenizers) {
-  for (const char* text : {"Print the queue", "Who is it", "Files, folders & more", "x"}) {
+  for (const char* text :
+       {"Print the queue", "Who is it", "Files, folders & more", "x", "os.path and more"}) {
     EXPECT_EQ(termsOf(text).normalizedTitle, english().tokenizedStringFromString(text)) << text;
   }
 }
