@@ -54,6 +54,7 @@ bool Update::_isUpToDate(const CatalogueEntry& entry) const {
 
 void Update::_removeOldIndexes(HelpSearch& search, const std::vector<CatalogueEntry>& gone) {
   std::vector<std::string> bookIDs;
+  bookIDs.reserve(gone.size() + _changed.size());
   for (const CatalogueEntry& entry : gone) {
     bookIDs.push_back(entry.bookID);
   }
