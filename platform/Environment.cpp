@@ -11,6 +11,7 @@
 #include <thread>
 
 #include "platform/DistributedNotificationCenter.h"
+#include "platform/Network.h"
 #include "platform/Processes.h"
 #include "platform/UserDefaults.h"
 
@@ -108,6 +109,7 @@ Environment Environment::system() {
   environment.standardOutput = [](const std::string& text) {
     std::fwrite(text.data(), 1, text.size(), stdout);
   };
+  environment.networkIsReachable = systemNetworkIsReachable;
   environment.processorCount = [] {
     return std::max(1, static_cast<int>(std::thread::hardware_concurrency()));
   };

@@ -34,6 +34,8 @@ struct Environment {
   std::function<void(const std::string& text)> standardOutput;
   /// Number of processors; 1 where that cannot be told.
   std::function<int()> processorCount;
+  /// Whether there is a network; may change at any time.
+  std::function<bool()> networkIsReachable;
 
   /// Language tags, the user's favourite first; never empty.
   std::vector<std::string> preferredLanguages;

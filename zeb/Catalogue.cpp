@@ -24,11 +24,8 @@ constexpr const char* titleKey = "title";
 constexpr const char* typeKey = "type";
 constexpr const char* folderKey = "folder";
 constexpr const char* accessPageKey = "accessPage";
-constexpr const char* indexKey = "index";
 constexpr const char* languageKey = "language";
-constexpr const char* pageCountKey = "pageCount";
 constexpr const char* fingerprintKey = "fingerprint";
-constexpr const char* indexIsShippedKey = "indexIsShipped";
 
 /// Paths are bytes, strings of a property list are text: a path that is no printable text is kept
 /// as data.
@@ -61,11 +58,8 @@ Value propertyList(const CatalogueEntry& entry) {
       {typeKey, entry.type},
       {folderKey, pathValue(entry.folder)},
       {accessPageKey, pathValue(entry.accessPagePath)},
-      {indexKey, pathValue(entry.indexPath)},
       {languageKey, entry.language},
-      {pageCountKey, entry.pageCount},
       {fingerprintKey, entry.fingerprint},
-      {indexIsShippedKey, entry.indexIsShipped},
   };
 }
 
@@ -73,9 +67,8 @@ std::optional<CatalogueEntry> entryFromPropertyList(const Value& list) {
   const std::optional<std::string> bookID = list[bookIDKey].stringValue();
   const std::optional<std::string> folder = pathFromValue(list[folderKey]);
   const std::optional<std::string> accessPage = pathFromValue(list[accessPageKey]);
-  const std::optional<std::string> index = pathFromValue(list[indexKey]);
   const int64_t type = list[typeKey].integerValue();
-  if (!bookID || !ZEBHelpBook::isValidBookID(*bookID) || !folder || !accessPage || !index ||
+  if (!bookID || !ZEBHelpBook::isValidBookID(*bookID) || !folder || !accessPage ||
       type < ZEBHelpBookType1 || type > ZEBHelpBookType4) {
     return std::nullopt;
   }
@@ -85,11 +78,8 @@ std::optional<CatalogueEntry> entryFromPropertyList(const Value& list) {
   entry.type = static_cast<int32_t>(type);
   entry.folder = *folder;
   entry.accessPagePath = *accessPage;
-  entry.indexPath = *index;
   entry.language = list[languageKey].stringValue().value_or("");
-  entry.pageCount = list[pageCountKey].unsignedValue();
   entry.fingerprint = list[fingerprintKey].stringValue().value_or("");
-  entry.indexIsShipped = list[indexIsShippedKey].boolValue();
   return entry;
 }
 
@@ -98,11 +88,6 @@ std::optional<CatalogueEntry> entryFromPropertyList(const Value& list) {
 std::string Catalogue::_entryPath(std::string_view bookID) const {
   return platform::stringByAppendingPathComponent(_folder,
                                                   std::string(bookID) + '.' + entryExtension);
-}
-
-std::string Catalogue::indexPathForBookID(std::string_view bookID) const {
-  return platform::stringByAppendingPathComponent(
-      _folder, std::string(bookID) + '.' + ZEBHelpindexExtension);
 }
 
 std::vector<CatalogueEntry> Catalogue::entries() const {
@@ -151,11 +136,9 @@ std::optional<platform::Error> Catalogue::store(const CatalogueEntry& entry) con
   return environment->files->writeAtomically(_entryPath(entry.bookID), bytes);
 }
 
-void Catalogue::remove(const CatalogueEntry& entry) const {
-  const auto environment = platform::Environment::current();
-  environment->files->removeItem(_entryPath(entry.bookID));
-  if (entry.indexPath == indexPathForBookID(entry.bookID)) {
-    environment->files->removeItem(entry.indexPath);
+void Catalogue::remove(const std::string& bookID) const {
+  if (ZEBHelpBook::isValidBookID(bookID)) {
+    (void)platform::Environment::current()->files->removeItem(_entryPath(bookID));
   }
 }
 

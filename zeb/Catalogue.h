@@ -1,4 +1,5 @@
-// The list of books that can be searched, kept on the disk between runs.
+// The list of books that can be searched, kept on the disk between runs. Their indexes are not its
+// concern.
 #pragma once
 
 #include <cstdint>
@@ -20,18 +21,12 @@ struct CatalogueEntry {
   int32_t type = 1;
   /// The folder that was given or found: what to look at when the book is scanned again.
   std::string folder;
-  /// The page that opens the book. The pages in the index are relative to its folder
-  /// unless the index is a shipped one.
+  /// The page that opens the book.
   std::string accessPagePath;
-  /// The help-index file, in the catalogue's folder or elsewhere.
-  std::string indexPath;
   /// As the folder of that language is named; empty where there is only one.
   std::string language;
-  uint64_t pageCount = 0;
-  /// What the folder looked like when it was indexed; see folderFingerprint().
+  /// What the folder looked like when it was entered; see folderFingerprint().
   std::string fingerprint;
-  /// The index came with the book; its pages are relative to the folder that the index is in.
-  bool indexIsShipped = false;
 
   friend bool operator==(const CatalogueEntry&, const CatalogueEntry&) = default;
 };
@@ -58,11 +53,8 @@ class Catalogue {
   /// Adds or replaces a book. On failure the earlier entry is untouched.
   std::optional<platform::Error> store(const CatalogueEntry& entry) const;
 
-  /// Forgets a book, and deletes its index where that is in the catalogue's folder.
-  void remove(const CatalogueEntry& entry) const;
-
-  /// Where a book's index goes that is to be kept in the catalogue's folder.
-  std::string indexPathForBookID(std::string_view bookID) const;
+  /// Forgets a book.
+  void remove(const std::string& bookID) const;
 
  private:
   std::string _entryPath(std::string_view bookID) const;

@@ -30,14 +30,9 @@ bool isOption(std::string_view argument) { return argument.starts_with('-'); }
 /// with marks where they are needed.
 std::vector<std::string> argumentsForParser(const std::vector<std::string>& arguments) {
   std::vector<std::string> prepared;
-  std::string_view command;
   bool onlyWords = false;
   for (const std::string& argument : arguments) {
-    if (command.empty() && isCommand(argument)) {
-      command = argument;
-    }
-    const bool isForParser = !onlyWords && (argument.starts_with("--") ||
-                                            (command == "index" && argument.starts_with("-o")));
+    const bool isForParser = !onlyWords && argument.starts_with("--");
     const bool isMistakable =
         !argument.empty() && (argument[0] == '-' || argument[0] == '[' || argument[0] == wordMark);
     prepared.push_back(isMistakable && !isForParser ? wordMark + argument : argument);
@@ -71,9 +66,9 @@ struct Parser {
   AnchorCommand anchorCommand;
   BooksCommand booksCommand;
   IndexCommand indexCommand;
-  std::string output;
   ScanCommand scanCommand;
   bool noInstalledBooks = false;
+  bool noWait = false;
 
  private:
   CLI::App* _addCommand(const std::string& name, const std::string& description);
@@ -98,6 +93,13 @@ Parser::Parser() {
   app.add_option("--cache-dir", cacheFolder, "The folder for indexes and the list of books")
       ->envname("ZEB_CACHE_DIR")
       ->option_text("DIR");
+  app.add_flag("--no-wait", noWait, "Do not wait for indexes that are being made");
+  app.add_option("--wait", common.waiting.limit, "Wait for them at most this long (300)")
+      ->check(CLI::Range(0.0, 1e9).description(""))
+      ->check([](const std::string& seconds) {
+        return seconds.find_first_of("nN") == std::string::npos ? "" : "wait: not a number";
+      })
+      ->option_text("SECONDS");
   app.add_flag("--verbose", common.verbosity, "Say more; may be repeated");
   app.footer(
       "Exit status: 0 something was found, 1 nothing was found, 2 the command line is wrong,\n"
@@ -134,8 +136,6 @@ Parser::Parser() {
   index->add_option("--book-id", indexCommand.bookIDs, "Identifier of the book; one a folder")
       ->allow_extra_args(false)
       ->option_text("ID");
-  index->add_option("-o,--output", output, "The index file; for several folders, a folder")
-      ->option_text("FILE");
 
   scan = _addCommand("scan", "Index the books that are installed, and the given folders");
   scan->add_option("folders", scanCommand.folders, "Further folders of help pages")
@@ -182,6 +182,7 @@ std::optional<CommandLine> parseCommandLine(const std::vector<std::string>& argu
   if (!parser.cacheFolder.empty()) {
     line.cacheFolder = unmarked(parser.cacheFolder);
   }
+  line.waiting.waits = !parser.noWait;
   if (parser.search->parsed()) {
     unmark(parser.searchCommand.words);
     unmark(parser.searchCommand.books);
@@ -195,9 +196,6 @@ std::optional<CommandLine> parseCommandLine(const std::vector<std::string>& argu
   } else if (parser.index->parsed()) {
     unmark(parser.indexCommand.folders);
     unmark(parser.indexCommand.bookIDs);
-    if (!parser.output.empty()) {
-      parser.indexCommand.output = unmarked(parser.output);
-    }
     line.command = parser.indexCommand;
   } else {
     unmark(parser.scanCommand.folders);

@@ -21,6 +21,13 @@ enum class ExitCode : int {
   failure = 3,
 };
 
+/// Whether a command waits for indexes that are being made, and for how long.
+struct Waiting {
+  bool waits = true;
+  /// Seconds.
+  double limit = 300;
+};
+
 struct SearchCommand {
   std::vector<std::string> words;
   /// Only these books; all where there is none.
@@ -43,8 +50,6 @@ struct IndexCommand {
   std::vector<std::string> folders;
   /// None, or one a folder.
   std::vector<std::string> bookIDs;
-  /// A file for one folder, a folder for several.
-  std::optional<std::string> output;
 };
 
 struct ScanCommand {
@@ -60,8 +65,9 @@ struct ScanCommand {
 struct CommandLine {
   std::variant<SearchCommand, AnchorCommand, BooksCommand, IndexCommand, ScanCommand> command;
   ColorMode color = ColorMode::automatic;
-  /// The folder for indexes and the catalogue, when the user names one.
+  /// The caches folder, for indexes and the catalogue, when the user names one.
   std::optional<std::string> cacheFolder;
+  Waiting waiting;
   int verbosity = 0;
 };
 

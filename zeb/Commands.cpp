@@ -4,17 +4,21 @@
 
 #include <algorithm>
 #include <exception>
+#include <functional>
+#include <memory>
 #include <ostream>
 #include <utility>
 
-#include "host/Zebrine/ZEBConstants.h"
+#include "host/Zebrine/ZEBHelpBook.h"
 #include "platform/Environment.h"
 #include "platform/Files.h"
 #include "platform/Log.h"
+#include "platform/Processes.h"
 #include "platform/Strings.h"
+#include "zeb/BookFolder.h"
 #include "zeb/Catalogue.h"
 #include "zeb/HelpSearch.h"
-#include "zeb/Indexer.h"
+#include "zeb/Indexing.h"
 #include "zeb/Output.h"
 #include "zeb/Paths.h"
 #include "zeb/Scan.h"
@@ -25,109 +29,151 @@ namespace {
 
 using platform::stringByAppendingPathComponent;
 
+/// The plug-in's work goes on for at most this long after an answer has been given, so that what it
+/// has begun need not begin again with the next search.
+constexpr platform::Seconds lingering{2};
+
 class Session {
  public:
-  Session(Console& console, Catalogue catalogue, int verbosity)
-      : _console(console), _catalogue(std::move(catalogue)), _verbosity(verbosity) {}
+  Session(Console& console, Catalogue catalogue, const Installation& installation,
+          const CommandLine& line)
+      : _console(console),
+        _catalogue(std::move(catalogue)),
+        _installation(installation),
+        _waiting(line.waiting),
+        _verbosity(line.verbosity) {}
 
   ExitCode operator()(const SearchCommand& command);
   ExitCode operator()(const AnchorCommand& command);
   ExitCode operator()(const BooksCommand& command);
   ExitCode operator()(const IndexCommand& command);
   ExitCode operator()(const ScanCommand& command) {
-    return scan(command, _catalogue, _console, _verbosity);
+    return scan(command, _catalogue, _installation, _waiting, _console, _verbosity);
   }
 
  private:
-  std::optional<std::vector<CatalogueEntry>> _books(const std::vector<std::string>& bookIDs);
-  void _warnOfUnreadableBooks(const HelpSearch& search);
-  ExitCode _show(const std::string& query, const Answer& answer, bool json);
+  using Question = std::function<std::optional<Answer>(HelpSearch& search)>;
+
+  ExitCode _answer(const std::string& asked, const std::vector<std::string>& bookIDs, bool json,
+                   const Question& question);
+  bool _knowsBooks(const std::vector<CatalogueEntry>& entries,
+                   const std::vector<std::string>& bookIDs);
+  void _makeMissingIndexes(HelpSearch& search, const std::vector<std::string>& bookIDs);
+  void _show(const std::string& asked, const Answer& answer, bool json);
 
   Console& _console;
   const Catalogue _catalogue;
+  const Installation& _installation;
+  const Waiting _waiting;
   const int _verbosity;
 };
 
-/// The catalogue's entries for these identifiers, or all; absent, and said, when there are none or
-/// one is unknown.
-std::optional<std::vector<CatalogueEntry>> Session::_books(
-    const std::vector<std::string>& bookIDs) {
-  std::vector<CatalogueEntry> entries = _catalogue.entries();
+/// Whether there are books, and these among them; says what is wrong where not.
+bool Session::_knowsBooks(const std::vector<CatalogueEntry>& entries,
+                          const std::vector<std::string>& bookIDs) {
   if (entries.empty()) {
     _console.error("no book has been indexed yet; 'zeb scan' looks for some");
-    return std::nullopt;
+    return false;
   }
   for (const std::string& bookID : bookIDs) {
     if (std::none_of(entries.begin(), entries.end(),
                      [&bookID](const CatalogueEntry& entry) { return entry.bookID == bookID; })) {
       _console.error(fmt::format("there is no book \"{}\"; 'zeb books' lists all", bookID));
-      return std::nullopt;
+      return false;
     }
   }
-  if (!bookIDs.empty()) {
-    std::erase_if(entries, [&bookIDs](const CatalogueEntry& entry) {
-      return std::find(bookIDs.begin(), bookIDs.end(), entry.bookID) == bookIDs.end();
-    });
-  }
-  return entries;
+  return true;
 }
 
-void Session::_warnOfUnreadableBooks(const HelpSearch& search) {
-  for (const CatalogueEntry& book : search.unreadableBooks()) {
-    _console.warning(fmt::format("the index of {} cannot be read; 'zeb scan' makes it again ({})",
-                                 book.bookID, book.indexPath));
+std::string countOfBooks(size_t count, std::string_view one, std::string_view several) {
+  return count == 1 ? fmt::format("1 book {}", one) : fmt::format("{} books {}", count, several);
+}
+
+void Session::_makeMissingIndexes(HelpSearch& search, const std::vector<std::string>& bookIDs) {
+  const std::vector<std::string> missing = search.booksWithoutIndex(bookIDs);
+  if (missing.empty()) {
+    return;
+  }
+  if (!_waiting.waits) {
+    _console.note(countOfBooks(missing.size(), "is not indexed yet", "are not indexed yet"));
+    return;
+  }
+  _console.note(countOfBooks(missing.size(), "is being indexed for the first time",
+                             "are being indexed for the first time"));
+  _console.progress(fmt::format("0 of {} books", missing.size()));
+  const HelpSearch::Indexing indexing = search.makeIndexes(
+      missing, platform::Seconds(_waiting.limit), [&](const std::string& /*bookID*/, size_t count) {
+        _console.progress(fmt::format("{} of {} books", count, missing.size()));
+      });
+  _console.clearProgress();
+  if (!indexing.ended) {
+    _console.note(fmt::format(
+        "gave up waiting after {:g} seconds; {}", _waiting.limit,
+        countOfBooks(indexing.missing.size(), "is not indexed yet", "are not indexed yet")));
+    return;
+  }
+  for (const std::string& bookID : indexing.missing) {
+    _console.warning(fmt::format("{}: it could not be indexed", bookID));
   }
 }
 
-ExitCode Session::_show(const std::string& query, const Answer& answer, bool json) {
+void Session::_show(const std::string& asked, const Answer& answer, bool json) {
   if (json) {
-    printAnswerAsJSON(query, answer, _console);
+    printAnswerAsJSON(asked, answer, _console);
   } else if (answer.pages.empty()) {
-    _console.note(fmt::format("nothing found for {}", query));
+    _console.note(fmt::format("nothing found for {}", asked));
   } else {
     printAnswer(answer, _console);
   }
-  return answer.pages.empty() ? ExitCode::nothingFound : ExitCode::success;
+}
+
+ExitCode Session::_answer(const std::string& asked, const std::vector<std::string>& bookIDs,
+                          bool json, const Question& question) {
+  const std::vector<CatalogueEntry> entries = _catalogue.entries();
+  if (!_knowsBooks(entries, bookIDs)) {
+    return ExitCode::failure;
+  }
+  platform::Error error;
+  const std::unique_ptr<HelpSearch> search = HelpSearch::start(entries, _installation, error);
+  if (search == nullptr) {
+    _console.error(error.description);
+    return ExitCode::failure;
+  }
+  _makeMissingIndexes(*search, bookIDs);
+  const std::optional<Answer> answer = question(*search);
+  if (!answer) {
+    _console.error("the search broke off; --verbose says more");
+    return ExitCode::failure;
+  }
+  _show(asked, *answer, json);
+  if (_waiting.waits && _console.flush()) {
+    search->settle(lingering);
+  }
+  return answer->pages.empty() ? ExitCode::nothingFound : ExitCode::success;
 }
 
 ExitCode Session::operator()(const SearchCommand& command) {
-  const auto books = _books(command.books);
-  if (!books) {
-    return ExitCode::failure;
-  }
   std::string words;
   for (const std::string& word : command.words) {
     words += words.empty() ? "" : " ";
     words += platform::stringByRepairingUTF8(word);
   }
-  const HelpSearch search(*books);
-  _warnOfUnreadableBooks(search);
-  if (search.unreadableBooks().size() == books->size()) {
-    return ExitCode::failure;
-  }
-  return _show(words, search.search(words, command.limit), command.json);
+  return _answer(words, command.books, command.json, [&](HelpSearch& search) {
+    return search.search(words, command.books, command.limit);
+  });
 }
 
 ExitCode Session::operator()(const AnchorCommand& command) {
-  const auto books = _books(command.books);
-  if (!books) {
-    return ExitCode::failure;
-  }
-  const HelpSearch search(*books);
-  _warnOfUnreadableBooks(search);
-  if (search.unreadableBooks().size() == books->size()) {
-    return ExitCode::failure;
-  }
-  return _show(command.name, search.lookUpAnchor(command.name, SIZE_MAX), command.json);
+  return _answer(command.name, command.books, command.json, [&](HelpSearch& search) {
+    return search.lookUpAnchor(command.name, command.books);
+  });
 }
 
 ExitCode Session::operator()(const BooksCommand& command) {
   std::vector<ListedBook> books;
   for (CatalogueEntry& entry : _catalogue.entries()) {
-    bool isDirectory = false;
-    const bool exists =
-        platform::Environment::current()->files->fileExistsAtPath(entry.indexPath, &isDirectory);
-    books.push_back({std::move(entry), exists && !isDirectory});
+    const std::shared_ptr<ZEBHelpBook> book = bookOfEntry(entry);
+    books.push_back({std::move(entry), book == nullptr ? std::nullopt : indexPathOfBook(*book)});
   }
   if (command.json) {
     printBooksAsJSON(books, _console);
@@ -145,48 +191,22 @@ ExitCode Session::operator()(const IndexCommand& command) {
                                command.folders.size(), command.bookIDs.size()));
     return ExitCode::usage;
   }
-  ExitCode code = ExitCode::success;
+  bool succeeded = true;
+  std::vector<CatalogueEntry> books;
   for (size_t i = 0; i < command.folders.size(); ++i) {
     const std::string folder = absolutePath(command.folders[i]);
     const auto bookID = command.bookIDs.empty() ? std::nullopt : std::optional(command.bookIDs[i]);
     std::string reason;
-    std::optional<BookFolder> book = bookInFolder(folder, _catalogue, bookID, {}, reason);
-    if (!book) {
-      _console.error(fmt::format("{}: {}", folder, reason));
-      code = ExitCode::failure;
-      continue;
-    }
-    CatalogueEntry& entry = book->entry;
-    entry.indexIsShipped = false;
-    entry.indexPath = _catalogue.indexPathForBookID(entry.bookID);
-    if (command.output) {
-      entry.indexPath = absolutePath(*command.output);
-      if (command.folders.size() > 1) {
-        entry.indexPath = stringByAppendingPathComponent(
-            entry.indexPath, entry.bookID + '.' + ZEBHelpindexExtension);
-      }
-    }
-    _console.progress(fmt::format("indexing {}", folder));
-    const IndexingOutcome outcome = indexBook(*book, _catalogue, true);
-    for (const std::string& warning : outcome.warnings) {
-      _console.warning(warning);
-    }
-    for (const std::string& error : outcome.errors) {
-      _console.error(error);
-    }
-    if (outcome.kind == IndexingOutcome::Kind::indexed) {
-      _console.clearProgress();
-      _console.out() << fmt::format(
-          "{}  {} pages  {:.1f} s  {}\n", _console.styled(Style::book, singleLine(outcome.bookID)),
-          outcome.pageCount, outcome.seconds, singleLine(entry.indexPath));
+    if (std::optional<CatalogueEntry> book = entryForFolder(folder, bookID, {}, reason)) {
+      books.push_back(std::move(*book));
     } else {
-      if (outcome.kind == IndexingOutcome::Kind::empty) {
-        _console.error(fmt::format("{}: there are no pages in it", folder));
-      }
-      code = ExitCode::failure;
+      _console.error(fmt::format("{}: {}", folder, reason));
+      succeeded = false;
     }
   }
-  return code;
+  const IndexingCounts counts =
+      Update(_catalogue, _waiting, _console).run(books, {}, _installation, true);
+  return succeeded && counts.failed == 0 ? ExitCode::success : ExitCode::failure;
 }
 
 std::optional<std::string> cacheFolder(const CommandLine& line) {
@@ -200,20 +220,31 @@ std::optional<std::string> cacheFolder(const CommandLine& line) {
   return stringByAppendingPathComponent(*caches, "zeb");
 }
 
-ExitCode runCommand(const CommandLine& line, Console& console) {
+ExitCode runCommand(const CommandLine& line, const Installation& installation, Console& console) {
   console.setColorMode(line.color);
-  // What goes wrong is told in the user's terms below; the log is for those who ask for it.
-  platform::Environment environment = *platform::Environment::current();
-  environment.log = platform::standardErrorLogSink(line.verbosity - 1);
-  const platform::EnvironmentOverride quiet(std::move(environment));
-
   const std::optional<std::string> folder = cacheFolder(line);
   if (!folder) {
     console.error("there is no caches folder; name one with --cache-dir");
     return ExitCode::failure;
   }
+  platform::Environment environment = *platform::Environment::current();
+  // What goes wrong is told in the user's terms; the log is for those who ask for it.
+  environment.log = platform::standardErrorLogSink(line.verbosity - 1);
+  // Results are all that this program prints there.
+  environment.standardOutput = [log = environment.log](const std::string& text) {
+    log->write(5, text);
+  };
+  if (line.cacheFolder) {
+    environment.cachesDirectory = folder;
+  }
+  if (!installation.indexingToolPath.empty()) {
+    environment.processLauncher =
+        platform::substitutingProcessLauncher("/usr/bin/bvmake", installation.indexingToolPath);
+  }
+  const platform::EnvironmentOverride override(std::move(environment));
+
   Session session(console, Catalogue(stringByAppendingPathComponent(*folder, "books")),
-                  line.verbosity);
+                  installation, line);
   const ExitCode code = std::visit(session, line.command);
   if (!console.flush()) {
     console.error("cannot write the results");
@@ -224,11 +255,12 @@ ExitCode runCommand(const CommandLine& line, Console& console) {
 
 }  // namespace
 
-ExitCode run(const std::vector<std::string>& arguments, Console& console) {
+ExitCode run(const std::vector<std::string>& arguments, const Installation& installation,
+             Console& console) {
   try {
     ExitCode code = ExitCode::success;
     const std::optional<CommandLine> line = parseCommandLine(arguments, console, code);
-    return line ? runCommand(*line, console) : code;
+    return line ? runCommand(*line, installation, console) : code;
   } catch (const std::exception& exception) {
     console.error(exception.what());
     return ExitCode::failure;

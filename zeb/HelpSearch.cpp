@@ -1,51 +1,33 @@
 #include "zeb/HelpSearch.h"
 
 #include <algorithm>
-#include <map>
-#include <tuple>
+#include <set>
 #include <utility>
 
-#include "SearchKit/SearchKit.h"
 #include "host/Zebrine/ZEBConstants.h"
+#include "host/Zebrine/ZEBHelpBook.h"
+#include "host/Zebrine/ZEBQuery.h"
 #include "host/Zebrine/ZEBResult.h"
+#include "platform/Environment.h"
+#include "platform/Files.h"
+#include "platform/Processes.h"
+#include "platform/RunLoop.h"
+#include "platform/ThreadSafety.h"
 #include "platform/URL.h"
-#include "plugin/keyword/ZEBHelpindexSearchController.h"
-#include "plugin/records/ZEBHelpindexIndex.h"
-#include "zeb/BookOwner.h"
-#include "zeb/Ranking.h"
+#include "zeb/BookFolder.h"
+#include "zebd/Host.h"
 
 namespace zeb {
 
-struct HelpSearch::Implementation {
-  explicit Implementation(const std::vector<CatalogueEntry>& entries);
-
-  FoundPage pageOfResult(const ZEBResult& result) const;
-  uint64_t pageCountOfBook(const std::string& bookID) const;
-  std::vector<double> relevances(std::string_view words, const std::vector<FoundPage>& pages) const;
-
-  std::map<std::string, CatalogueEntry> books;
-  std::vector<CatalogueEntry> unreadableBooks;
-  std::shared_ptr<ZEBHelpindexSearchController> controller;
-  std::vector<std::shared_ptr<ZEBHelpindexIndex>> records;
-  ZEBHelpindexSearchController::Indices indices;
-};
-
 namespace {
 
-std::shared_ptr<ZEBHelpindexIndex> recordOfEntry(const CatalogueEntry& entry) {
-  auto record = ZEBHelpindexIndex::initWithPath(entry.indexPath);
-  if (record == nullptr) {
-    return nullptr;
-  }
-  SKIndexRef index = record->copyIndexRef();
-  if (index == nullptr) {
-    return nullptr;
-  }
-  record->disposeIndexRef(index);
-  record->setBookID(entry.bookID);
-  record->setLoadedFromGeneratedCache(!entry.indexIsShipped);
-  return record;
-}
+using zebd::Host;
+
+/// Work that follows from work does so within a few milliseconds; this is ample.
+constexpr platform::Seconds quietSpan{0.2};
+constexpr platform::Seconds removalLimit{10};
+/// Searches bound their own waits.
+constexpr platform::Seconds forever = platform::Seconds::max();
 
 std::string nameOfPage(const std::string& url) {
   const std::optional<platform::URL> parsed = platform::URL::URLWithString(url);
@@ -53,103 +35,241 @@ std::string nameOfPage(const std::string& url) {
   return name.empty() ? url : name;
 }
 
-Answer cutToLimit(std::vector<FoundPage> pages, size_t limit) {
-  Answer answer;
-  answer.count = pages.size();
-  if (pages.size() > limit) {
-    pages.resize(limit);
-  }
-  answer.pages = std::move(pages);
-  return answer;
+/// Somebody's: whose it is, its command line does not say.
+bool anIndexingToolIsRunning() {
+  std::vector<platform::ProcessEntry> processes;
+  return platform::Environment::current()->processTable->readProcesses(processes) == 0 &&
+         std::any_of(processes.begin(), processes.end(),
+                     [](const auto& process) { return process.commandName == "bvmake"; });
 }
+
+/// Keeps the records of one search, and wakes the main loop at its end.
+class Collector : public zebd::SearchReceiver {
+ public:
+  using Records = std::vector<std::shared_ptr<ZEBResult>>;
+
+  void foundResults(const ZEBResultBatch& batch) override {
+    if (const auto* records = std::get_if<Records>(&batch)) {
+      const platform::MutexLock lock(_mutex);
+      _records.insert(_records.end(), records->begin(), records->end());
+    }
+  }
+  void searchEnded(bool finished) override {
+    {
+      const platform::MutexLock lock(_mutex);
+      _ended = true;
+      _finished = finished;
+    }
+    platform::RunLoop::main()->stop();
+  }
+
+  bool ended() const {
+    const platform::MutexLock lock(_mutex);
+    return _ended;
+  }
+  /// Absent when the search broke off.
+  std::optional<Records> records() const {
+    const platform::MutexLock lock(_mutex);
+    return _finished ? std::optional(_records) : std::nullopt;
+  }
+
+ private:
+  mutable platform::Mutex _mutex;
+  Records _records GUARDED_BY(_mutex);
+  bool _ended GUARDED_BY(_mutex) = false;
+  bool _finished GUARDED_BY(_mutex) = false;
+};
+
+/// Which books the plug-in has reported since it was last asked.
+class Reports {
+ public:
+  void add(const std::string& bookID) {
+    const platform::MutexLock lock(_mutex);
+    _bookIDs.insert(bookID);
+  }
+  std::set<std::string> take() {
+    const platform::MutexLock lock(_mutex);
+    return std::exchange(_bookIDs, {});
+  }
+
+ private:
+  platform::Mutex _mutex;
+  std::set<std::string> _bookIDs GUARDED_BY(_mutex);
+};
 
 }  // namespace
 
-HelpSearch::Implementation::Implementation(const std::vector<CatalogueEntry>& entries)
-    : controller(ZEBHelpindexSearchController::init()) {
-  std::vector<CatalogueEntry> readable;
-  for (const CatalogueEntry& entry : entries) {
-    if (std::shared_ptr<ZEBHelpindexIndex> record = recordOfEntry(entry)) {
-      records.push_back(record);
-      indices.push_back(std::move(record));
-      readable.push_back(entry);
-      books.emplace(entry.bookID, entry);
-    } else {
-      unreadableBooks.push_back(entry);
+struct HelpSearch::Implementation {
+  std::unique_ptr<Host> host;
+  std::shared_ptr<Reports> reports = std::make_shared<Reports>();
+
+  bool lacksIndex(const std::string& bookID) const {
+    const auto book = host->bookshelf().bookWithID(bookID);
+    return book != nullptr && book->type() != ZEBHelpBookType4 && !indexPathOfBook(*book);
+  }
+
+  FoundPage pageOfResult(const ZEBResult& result) const {
+    FoundPage page;
+    page.bookID = result.bookID().value_or("");
+    const auto book = host->bookshelf().bookWithID(page.bookID);
+    page.bookTitle = book == nullptr ? page.bookID : book->title();
+    page.url = result.payloadValueForKey(ZEBResultURLKey).stringValue().value_or("");
+    page.abstract = result.payloadValueForKey(ZEBResultAbstractKey).stringValue();
+    page.title = result.title().value_or("");
+    if (page.title.empty()) {
+      page.title = nameOfPage(page.url);
     }
+    page.relevance = result.relevance().doubleValue();
+    return page;
   }
-  controller->setPluginOwner(std::make_shared<BookOwner>(readable));
-}
 
-uint64_t HelpSearch::Implementation::pageCountOfBook(const std::string& bookID) const {
-  const auto book = books.find(bookID);
-  return book == books.end() ? 0 : book->second.pageCount;
-}
-
-std::vector<double> HelpSearch::Implementation::relevances(
-    std::string_view words, const std::vector<FoundPage>& pages) const {
-  // All indexes split and fold text alike, so any of them will do.
-  SKIndexRef index = records.front()->copyIndexRef();
-  std::vector<RankedPage> ranked;
-  ranked.reserve(pages.size());
-  for (const FoundPage& page : pages) {
-    ranked.push_back(
-        {page.relevance, pageCountOfBook(page.bookID), SKIndexCopyUniqueTerms(index, page.title)});
+  std::optional<Answer> answer(const std::shared_ptr<ZEBQuery>& query, size_t limit) {
+    const auto collector = std::make_shared<Collector>();
+    host->startSearch(query, collector);
+    Host::runMainLoopUntil([&] { return collector->ended(); }, forever);
+    const auto records = collector->records();
+    if (!records) {
+      return std::nullopt;
+    }
+    Answer answer;
+    std::set<std::string> shown;
+    for (const auto& record : *records) {
+      FoundPage page = pageOfResult(*record);
+      // A book may name one page for the words in several of its lists.
+      if (shown.insert(page.url).second && ++answer.count <= limit) {
+        answer.pages.push_back(std::move(page));
+      }
+    }
+    return answer;
   }
-  std::vector<double> result = zeb::relevances(ranked, SKIndexCopyUniqueTerms(index, words));
-  records.front()->disposeIndexRef(index);
-  return result;
-}
+};
 
-FoundPage HelpSearch::Implementation::pageOfResult(const ZEBResult& result) const {
-  FoundPage page;
-  page.bookID = result.bookID().value_or("");
-  const auto book = books.find(page.bookID);
-  page.bookTitle = book == books.end() ? page.bookID : book->second.title;
-  page.url = result.payloadValueForKey(ZEBResultURLKey).stringValue().value_or("");
-  page.abstract = result.payloadValueForKey(ZEBResultAbstractKey).stringValue();
-  page.title = result.title().value_or("");
-  if (page.title.empty()) {
-    page.title = nameOfPage(page.url);
-  }
-  page.relevance = result.relevance().doubleValue();
-  return page;
-}
-
-HelpSearch::HelpSearch(const std::vector<CatalogueEntry>& books)
-    : _implementation(std::make_unique<const Implementation>(books)) {}
+HelpSearch::HelpSearch(std::unique_ptr<Implementation> implementation)
+    : _implementation(std::move(implementation)) {}
 
 HelpSearch::~HelpSearch() = default;
 
-const std::vector<CatalogueEntry>& HelpSearch::unreadableBooks() const {
-  return _implementation->unreadableBooks;
+std::unique_ptr<HelpSearch> HelpSearch::start(const std::vector<CatalogueEntry>& entries,
+                                              const Installation& installation,
+                                              platform::Error& error) {
+  zebd::OwnerSettings settings;
+  if (const auto caches = platform::Environment::current()->cachesDirectory) {
+    settings.userHelpCachesDirectoryPath =
+        platform::stringByAppendingPathComponent(*caches, ZEBDaemonBundleID);
+  }
+  auto implementation = std::make_unique<Implementation>();
+  implementation->host = Host::start(installation.pluginBundlePath, std::move(settings), error);
+  if (implementation->host == nullptr) {
+    return nullptr;
+  }
+  implementation->host->owner().setBookModifiedHandler(
+      [reports = implementation->reports](const std::shared_ptr<ZEBHelpBook>& book) {
+        if (book != nullptr) {
+          reports->add(book->bookID());
+        }
+      });
+  for (const CatalogueEntry& entry : entries) {
+    implementation->host->bookshelf().addBook(bookOfEntry(entry));
+  }
+  return std::unique_ptr<HelpSearch>(new HelpSearch(std::move(implementation)));
 }
 
-Answer HelpSearch::search(std::string_view words, size_t limit) const {
-  std::vector<FoundPage> pages;
-  for (const auto& result :
-       _implementation->controller->doSearchForString(words, _implementation->indices, {})) {
-    pages.push_back(_implementation->pageOfResult(*result));
-  }
-  if (!pages.empty()) {
-    const std::vector<double> relevances = _implementation->relevances(words, pages);
-    for (size_t i = 0; i < pages.size(); ++i) {
-      pages[i].relevance = relevances[i];
+std::vector<std::string> HelpSearch::booksWithoutIndex(
+    const std::vector<std::string>& bookIDs) const {
+  std::vector<std::string> missing;
+  if (bookIDs.empty()) {
+    for (const auto& entry : _implementation->host->bookshelf().books()) {
+      if (_implementation->lacksIndex(entry.first)) {
+        missing.push_back(entry.first);
+      }
     }
+    return missing;
   }
-  std::sort(pages.begin(), pages.end(), [](const FoundPage& a, const FoundPage& b) {
-    return std::tie(b.relevance, a.bookID, a.url) < std::tie(a.relevance, b.bookID, b.url);
-  });
-  return cutToLimit(std::move(pages), limit);
+  std::copy_if(bookIDs.begin(), bookIDs.end(), std::back_inserter(missing),
+               [&](const std::string& bookID) { return _implementation->lacksIndex(bookID); });
+  return missing;
 }
 
-Answer HelpSearch::lookUpAnchor(std::string_view name, size_t limit) const {
-  std::vector<FoundPage> pages;
-  for (const auto& result :
-       _implementation->controller->doLookupOfAnchor(name, _implementation->indices)) {
-    pages.push_back(_implementation->pageOfResult(*result));
+HelpSearch::Indexing HelpSearch::makeIndexes(const std::vector<std::string>& bookIDs,
+                                             platform::Seconds limit, const Progress& progress) {
+  std::set<std::string> waiting(bookIDs.begin(), bookIDs.end());
+  size_t count = 0;
+  const auto tell = [&](const std::string& bookID) {
+    if (!_implementation->lacksIndex(bookID) && waiting.erase(bookID) > 0) {
+      ++count;
+      progress(bookID, count);
+    }
+  };
+  (void)_implementation->reports->take();
+  const auto collector = std::make_shared<Collector>();
+  _implementation->host->registerBooks(bookIDs, collector);
+  Indexing indexing;
+  indexing.ended = Host::runMainLoopUntil(
+      [&] {
+        for (const std::string& bookID : _implementation->reports->take()) {
+          tell(bookID);
+        }
+        return collector->ended() && _implementation->host->owner().isQuietFor(quietSpan);
+      },
+      limit);
+  // Not reported are books whose indexes were there before, and those that another process has made
+  // meanwhile: the plug-in leaves them to it.
+  const auto tellAll = [&] {
+    for (const std::string& bookID : bookIDs) {
+      tell(bookID);
+    }
+  };
+  tellAll();
+  if (indexing.ended && !waiting.empty()) {
+    Host::runMainLoopUntil(
+        [&] {
+          tellAll();
+          return waiting.empty() || !anIndexingToolIsRunning();
+        },
+        limit);
+    tellAll();
   }
-  return cutToLimit(std::move(pages), limit);
+  indexing.missing.assign(waiting.begin(), waiting.end());
+  return indexing;
+}
+
+bool HelpSearch::removeIndexes(const std::vector<std::string>& bookIDs) {
+  (void)_implementation->reports->take();
+  std::set<std::string> waiting(bookIDs.begin(), bookIDs.end());
+  for (const std::string& bookID : bookIDs) {
+    _implementation->host->removeIndexOfBook(bookID);
+  }
+  return Host::runMainLoopUntil(
+      [&] {
+        for (const std::string& bookID : _implementation->reports->take()) {
+          waiting.erase(bookID);
+        }
+        return waiting.empty();
+      },
+      removalLimit);
+}
+
+std::optional<Answer> HelpSearch::search(std::string_view words,
+                                         const std::vector<std::string>& bookIDs, size_t limit) {
+  const auto query = ZEBQuery::initWithQueryString(std::string(words));
+  query->setScope(bookIDs);
+  query->setResultTypes({ZEBHelpArticleResult});
+  query->setLimit(limit);
+  return _implementation->answer(query, limit);
+}
+
+std::optional<Answer> HelpSearch::lookUpAnchor(std::string_view name,
+                                               const std::vector<std::string>& bookIDs) {
+  const auto query = ZEBQuery::initWithQueryString(std::string(name));
+  query->setScope(bookIDs);
+  query->setResultTypes({ZEBHelpArticleResult});
+  query->setOptions(platform::Value::Dictionary{{ZEBQueryAnchorSearchOptionKey, true}});
+  return _implementation->answer(query, SIZE_MAX);
+}
+
+void HelpSearch::settle(platform::Seconds limit) {
+  Host::runMainLoopUntil(
+      [&] { return _implementation->host->owner().isQuietFor(platform::Seconds::zero()); }, limit);
 }
 
 }  // namespace zeb

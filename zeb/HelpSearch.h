@@ -1,14 +1,18 @@
-// Searches and anchor look-ups over the books of the catalogue.
+// Searches, anchor look-ups and indexing over the books of the catalogue.
 #pragma once
 
 #include <cstddef>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
 
+#include "platform/Clock.h"
+#include "platform/Error.h"
 #include "zeb/Catalogue.h"
+#include "zeb/Installation.h"
 
 namespace zeb {
 
@@ -20,7 +24,7 @@ struct FoundPage {
   std::string bookTitle;
   std::optional<std::string> abstract;
   std::string url;
-  /// Orders the pages of one answer, higher first; see HelpSearch::search().
+  /// Orders the pages of one answer, higher first.
   double relevance = 0;
 };
 
@@ -31,30 +35,60 @@ struct Answer {
   size_t count = 0;
 };
 
-/// The one place in which the command line meets the search. It opens the indexes in this process
-/// and asks the keyword search directly; whoever answers in its place has to fill the same answers.
-/// Thread-safety: internally synchronised.
+/// The one place in which the command line meets the search: a host in this process, with the
+/// plug-in. Its functions run the main loop while they wait, so all of them belong to the main
+/// thread. Lists of identifiers that are empty stand for all books.
 class HelpSearch {
  public:
-  /// Opens the indexes of these books. Those that cannot be opened are left out and named in
-  /// unreadableBooks().
-  explicit HelpSearch(const std::vector<CatalogueEntry>& books);
+  /// Null, with `error` set, when the plug-in cannot be loaded. Entries whose books are gone are
+  /// left out.
+  static std::unique_ptr<HelpSearch> start(const std::vector<CatalogueEntry>& entries,
+                                           const Installation& installation,
+                                           platform::Error& error);
   ~HelpSearch();
   HelpSearch(const HelpSearch&) = delete;
   HelpSearch& operator=(const HelpSearch&) = delete;
 
-  const std::vector<CatalogueEntry>& unreadableBooks() const;
+  /// Those of the books for which there is no index yet, by identifier. Remote books are not among
+  /// them: their indexes are a server's.
+  std::vector<std::string> booksWithoutIndex(const std::vector<std::string>& bookIDs) const;
 
-  /// The pages that match the words, up to `limit`, in the order of zeb::relevances(). Pages of
-  /// equal relevance are ordered by book and URL.
-  Answer search(std::string_view words, size_t limit) const;
+  /// What became of makeIndexes().
+  struct Indexing {
+    /// Books that still have no index.
+    std::vector<std::string> missing;
+    /// Whether all work came to its end within the limit; if not, missing indexes may still come.
+    bool ended = false;
+  };
+  /// Told of each book that has got its index, and how many have by then.
+  using Progress = std::function<void(const std::string& bookID, size_t count)>;
 
-  /// The pages that carry the anchor of exactly this name, each with relevance 1, book by book.
-  Answer lookUpAnchor(std::string_view name, size_t limit) const;
+  /// Has the indexes of the books made that have none, and waits until the plug-in is quiet or
+  /// `limit` has passed.
+  Indexing makeIndexes(const std::vector<std::string>& bookIDs, platform::Seconds limit,
+                       const Progress& progress);
+
+  /// Has indexes forgotten that are no longer those of their books' pages. Returns whether the
+  /// plug-in has done so for all.
+  bool removeIndexes(const std::vector<std::string>& bookIDs);
+
+  /// The pages that match the words, up to `limit`, in the order of the plug-in. Absent when the
+  /// search broke off.
+  std::optional<Answer> search(std::string_view words, const std::vector<std::string>& bookIDs,
+                               size_t limit);
+
+  /// The pages that carry the anchor of exactly this name. Absent when the search broke off.
+  std::optional<Answer> lookUpAnchor(std::string_view name,
+                                     const std::vector<std::string>& bookIDs);
+
+  /// Lets the plug-in come to an end with what it is doing, for `limit` at most.
+  void settle(platform::Seconds limit);
 
  private:
   struct Implementation;
-  std::unique_ptr<const Implementation> _implementation;
+  explicit HelpSearch(std::unique_ptr<Implementation> implementation);
+
+  const std::unique_ptr<Implementation> _implementation;
 };
 
 }  // namespace zeb

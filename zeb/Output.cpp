@@ -71,23 +71,23 @@ void printAnswerAsJSON(std::string_view query, const Answer& answer, Console& co
 }
 
 void printBooks(const std::vector<ListedBook>& books, Console& console) {
-  const auto pages = [](const ListedBook& book) {
-    return book.hasIndex ? fmt::format("{} pages", book.entry.pageCount) : std::string("no index");
+  const auto state = [](const ListedBook& book) {
+    return std::string_view(book.indexPath ? "indexed" : "not indexed yet");
   };
   size_t idWidth = 0;
   size_t languageWidth = 0;
-  size_t pagesWidth = 0;
+  size_t stateWidth = 0;
   for (const ListedBook& book : books) {
     idWidth = std::max(idWidth, singleLine(book.entry.bookID).size());
     languageWidth = std::max(languageWidth, singleLine(book.entry.language).size());
-    pagesWidth = std::max(pagesWidth, pages(book).size());
+    stateWidth = std::max(stateWidth, state(book).size());
   }
   for (const ListedBook& book : books) {
     console.out() << console.styled(Style::book,
                                     fmt::format("{:<{}}", singleLine(book.entry.bookID), idWidth))
                   << fmt::format("  {:<{}}  ", singleLine(book.entry.language), languageWidth)
-                  << console.styled(book.hasIndex ? Style::label : Style::error,
-                                    fmt::format("{:>{}}", pages(book), pagesWidth))
+                  << console.styled(book.indexPath ? Style::label : Style::error,
+                                    fmt::format("{:<{}}", state(book), stateWidth))
                   << "  " << console.styled(Style::title, singleLine(book.entry.title)) << '\n';
   }
 }
@@ -101,9 +101,10 @@ void printBooksAsJSON(const std::vector<ListedBook>& books, Console& console) {
     entry["type"] = book.entry.type;
     entry["language"] = text(book.entry.language);
     entry["folder"] = text(book.entry.folder);
-    entry["index"] = text(book.entry.indexPath);
-    entry["pages"] = book.entry.pageCount;
-    entry["indexed"] = book.hasIndex;
+    if (book.indexPath) {
+      entry["index"] = text(*book.indexPath);
+    }
+    entry["indexed"] = book.indexPath.has_value();
     list.push_back(std::move(entry));
   }
   JSON object;

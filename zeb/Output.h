@@ -2,6 +2,8 @@
 #pragma once
 
 #include <cstddef>
+#include <optional>
+#include <string>
 #include <string_view>
 #include <vector>
 
@@ -22,14 +24,15 @@ void printAnswerAsJSON(std::string_view query, const Answer& answer, Console& co
 /// A book as it is listed.
 struct ListedBook {
   CatalogueEntry entry;
-  bool hasIndex = false;
+  /// The help-index file; absent when there is none yet.
+  std::optional<std::string> indexPath;
 };
 
-/// One line a book: identifier, language, number of pages, title.
+/// One line a book: identifier, language, whether it is indexed, title.
 void printBooks(const std::vector<ListedBook>& books, Console& console);
 
 /// One JSON object: "count", "books" (each with "id", "title", "type", "language", "folder",
-/// "index", "pages", "indexed").
+/// "index" where there is one, "indexed").
 void printBooksAsJSON(const std::vector<ListedBook>& books, Console& console);
 
 }  // namespace zeb

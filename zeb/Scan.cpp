@@ -2,20 +2,17 @@
 
 #include <fmt/format.h>
 
-#include <algorithm>
-#include <exception>
-#include <functional>
 #include <ostream>
 #include <set>
 #include <string>
-#include <thread>
 #include <utility>
 #include <vector>
 
 #include "platform/Environment.h"
-#include "platform/ThreadSafety.h"
+#include "platform/Files.h"
+#include "zeb/BookFolder.h"
 #include "zeb/HelpFolders.h"
-#include "zeb/Indexer.h"
+#include "zeb/Indexing.h"
 #include "zeb/Languages.h"
 #include "zeb/Paths.h"
 
@@ -23,91 +20,20 @@ namespace zeb {
 
 namespace {
 
-/// More at once than the machine has processors gain nothing, and each holds a book's words in
-/// memory.
-size_t workerCount(size_t bookCount) {
-  const auto processors =
-      static_cast<size_t>(std::max(1, platform::Environment::current()->processorCount()));
-  return std::min({processors, bookCount, size_t{8}});
-}
-
-/// Hands out books to threads and takes in what became of them.
-class Work {
- public:
-  using Finished = std::function<void(const IndexingOutcome&, size_t finished, size_t total)>;
-
-  /// `finished` is called by one thread at a time.
-  Work(std::vector<BookFolder> books, const Catalogue& catalogue, bool evenIfUnchanged,
-       Finished finished)
-      : _books(std::move(books)),
-        _catalogue(catalogue),
-        _evenIfUnchanged(evenIfUnchanged),
-        _finished(std::move(finished)) {}
-
-  void run() {
-    std::vector<std::thread> threads;
-    for (size_t i = 1; i < workerCount(_books.size()); ++i) {
-      threads.emplace_back([this] { _work(); });
-    }
-    _work();
-    for (std::thread& thread : threads) {
-      thread.join();
-    }
-  }
-
- private:
-  void _work() EXCLUDES(_mutex) {
-    while (true) {
-      size_t index = 0;
-      {
-        const platform::MutexLock lock(_mutex);
-        if (_next == _books.size()) {
-          return;
-        }
-        index = _next++;
-      }
-      const IndexingOutcome outcome = _index(_books[index]);
-      const platform::MutexLock lock(_mutex);
-      ++_finishedCount;
-      _finished(outcome, _finishedCount, _books.size());
-    }
-  }
-
-  IndexingOutcome _index(const BookFolder& book) const {
-    try {
-      return indexBook(book, _catalogue, _evenIfUnchanged);
-    } catch (const std::exception& exception) {
-      IndexingOutcome outcome;
-      outcome.bookID = book.entry.bookID;
-      outcome.errors.emplace_back(exception.what());
-      return outcome;
-    }
-  }
-
-  const std::vector<BookFolder> _books;
-  const Catalogue& _catalogue;
-  const bool _evenIfUnchanged;
-  const Finished _finished;
-  platform::Mutex _mutex;
-  size_t _next GUARDED_BY(_mutex) = 0;
-  size_t _finishedCount GUARDED_BY(_mutex) = 0;
-};
-
 /// The books to index, each identifier once.
 class BookList {
  public:
-  BookList(const Catalogue& catalogue, Console& console, int verbosity)
-      : _catalogue(catalogue), _console(console), _verbosity(verbosity) {}
+  BookList(Console& console, int verbosity) : _console(console), _verbosity(verbosity) {}
 
   bool add(const std::string& folder, const std::optional<std::string>& bookID,
            const std::string& language, std::string& reason) {
-    std::optional<BookFolder> book = bookInFolder(folder, _catalogue, bookID, language, reason);
+    std::optional<CatalogueEntry> book = entryForFolder(folder, bookID, language, reason);
     if (!book) {
       return false;
     }
-    if (!_bookIDs.insert(book->entry.bookID).second) {
-      if (_verbosity > 0 && !_folders.contains(folder)) {
-        passedOver(folder, fmt::format("there is another book \"{}\"", book->entry.bookID));
+    if (!_bookIDs.insert(book->bookID).second) {
+      if (!_folders.contains(folder)) {
+        passedOver(folder, fmt::format("there is another book \"{}\"", book->bookID));
       }
       return true;
     }
@@ -131,15 +57,15 @@ class BookList {
     }
   }
 
-  std::vector<BookFolder> take() { return std::move(_books); }
+  bool contains(const std::string& bookID) const { return _bookIDs.contains(bookID); }
+  const std::vector<CatalogueEntry>& books() const { return _books; }
 
  private:
-  const Catalogue& _catalogue;
   Console& _console;
   int _verbosity;
   std::set<std::string> _bookIDs;
   std::set<std::string> _folders;
-  std::vector<BookFolder> _books;
+  std::vector<CatalogueEntry> _books;
 };
 
 void addInstalledBooks(const ScanCommand& command, BookList& books) {
@@ -154,81 +80,30 @@ void addInstalledBooks(const ScanCommand& command, BookList& books) {
   books.addInstalled(manualFolders(root, passedOver));
 }
 
-/// Books that were added by name before are looked at again; those that are gone are forgotten.
-void addKnownBooks(const Catalogue& catalogue, BookList& books, size_t& forgottenCount) {
+/// Books that were added by name before are looked at again. Returns those whose folder is gone.
+std::vector<CatalogueEntry> addKnownBooks(const Catalogue& catalogue, BookList& books) {
+  std::vector<CatalogueEntry> gone;
   for (const CatalogueEntry& entry : catalogue.entries()) {
     bool isDirectory = false;
     if (!platform::Environment::current()->files->fileExistsAtPath(entry.folder, &isDirectory) ||
         !isDirectory) {
-      catalogue.remove(entry);
-      ++forgottenCount;
+      gone.push_back(entry);
       continue;
     }
-    const bool isIndexOurs = entry.indexPath == catalogue.indexPathForBookID(entry.bookID);
     std::string reason;
-    if ((isIndexOurs || entry.indexIsShipped) &&
-        !books.add(entry.folder, entry.bookID, entry.language, reason)) {
+    if (!books.add(entry.folder, entry.bookID, entry.language, reason)) {
       books.passedOver(entry.folder, reason);
     }
   }
+  return gone;
 }
-
-/// Says what became of the books as it happens, and keeps count.
-class Progress {
- public:
-  Progress(Console& console, int verbosity) : _console(console), _verbosity(verbosity) {}
-
-  void report(const IndexingOutcome& outcome, size_t finished, size_t total) {
-    switch (outcome.kind) {
-      case IndexingOutcome::Kind::indexed:
-        ++indexedCount;
-        _console.clearProgress();
-        _console.out() << fmt::format("{}  {}{} pages  {:.1f} s\n",
-                                      _console.styled(Style::book, singleLine(outcome.bookID)),
-                                      outcome.language.empty() ? "" : outcome.language + "  ",
-                                      outcome.pageCount, outcome.seconds)
-                       << std::flush;
-        break;
-      case IndexingOutcome::Kind::unchanged:
-        ++unchangedCount;
-        break;
-      case IndexingOutcome::Kind::empty:
-        if (_verbosity > 0) {
-          _console.note(fmt::format("{}: there are no pages in it", outcome.bookID));
-        }
-        break;
-      case IndexingOutcome::Kind::failed:
-        ++failedCount;
-        for (const std::string& error : outcome.errors) {
-          _console.error(fmt::format("{}: {}", outcome.bookID, error));
-        }
-        break;
-    }
-    if (_verbosity > 0) {
-      for (const std::string& warning : outcome.warnings) {
-        _console.warning(fmt::format("{}: {}", outcome.bookID, warning));
-      }
-    } else if (!outcome.warnings.empty()) {
-      _console.warning(fmt::format("{}: {} pages or folders could not be read", outcome.bookID,
-                                   outcome.warnings.size()));
-    }
-    _console.progress(fmt::format("{} of {} books", finished, total));
-  }
-
-  size_t indexedCount = 0;
-  size_t unchangedCount = 0;
-  size_t failedCount = 0;
-
- private:
-  Console& _console;
-  int _verbosity;
-};
 
 }  // namespace
 
-ExitCode scan(const ScanCommand& command, const Catalogue& catalogue, Console& console,
+ExitCode scan(const ScanCommand& command, const Catalogue& catalogue,
+              const Installation& installation, const Waiting& waiting, Console& console,
               int verbosity) {
-  BookList books(catalogue, console, verbosity);
+  BookList books(console, verbosity);
   size_t brokenCount = 0;
   for (const std::string& folder : command.folders) {
     std::string reason;
@@ -242,20 +117,22 @@ ExitCode scan(const ScanCommand& command, const Catalogue& catalogue, Console& c
     console.progress("looking for books");
     addInstalledBooks(command, books);
   }
-  size_t forgottenCount = 0;
-  addKnownBooks(catalogue, books, forgottenCount);
+  std::vector<CatalogueEntry> gone = addKnownBooks(catalogue, books);
+  // One that was found in another place under its old name is not gone.
+  std::erase_if(gone, [&](const CatalogueEntry& entry) { return books.contains(entry.bookID); });
 
-  Progress progress(console, verbosity);
-  Work work(books.take(), catalogue, command.evenIfUnchanged,
-            [&progress](const IndexingOutcome& outcome, size_t finished, size_t total) {
-              progress.report(outcome, finished, total);
-            });
-  work.run();
+  const IndexingCounts counts =
+      Update(catalogue, waiting, console)
+          .run(books.books(), gone, installation, command.evenIfUnchanged);
+  const size_t failedCount = counts.failed + brokenCount;
   console.clearProgress();
-  console.out() << fmt::format("{} indexed, {} unchanged, {} forgotten, {} failed\n",
-                               progress.indexedCount, progress.unchangedCount, forgottenCount,
-                               progress.failedCount + brokenCount);
-  return progress.failedCount + brokenCount == 0 ? ExitCode::success : ExitCode::failure;
+  console.out() << fmt::format("{} indexed, {} unchanged, {} forgotten, {} failed", counts.indexed,
+                               counts.unchanged, counts.forgotten, failedCount);
+  if (counts.left > 0) {
+    console.out() << fmt::format(", {} still to be indexed", counts.left);
+  }
+  console.out() << '\n';
+  return failedCount == 0 ? ExitCode::success : ExitCode::failure;
 }
 
 }  // namespace zeb

@@ -4,15 +4,17 @@
 #include "zeb/Catalogue.h"
 #include "zeb/CommandLine.h"
 #include "zeb/Console.h"
+#include "zeb/Installation.h"
 
 namespace zeb {
 
-/// Indexes the command's folders, the books of the catalogue whose index is in its folder, and the
-/// computer's installed books, each once and only where something changed; of two folders with one
-/// identifier the one named first in this list wins. Books whose folder is gone are forgotten.
-/// Several are indexed at once. What was done goes to the console; folders of the command that
-/// cannot be books make it a failure, others only a warning.
-ExitCode scan(const ScanCommand& command, const Catalogue& catalogue, Console& console,
+/// Indexes the command's folders, the books of the catalogue, and the computer's installed books,
+/// each once and only where something changed; of two folders with one identifier the one named
+/// first in this list wins. Books whose folder is gone are forgotten. What was done goes to the
+/// console; folders of the command that cannot be books make it a failure, others are passed over.
+/// Runs the main loop; to be called on the main thread.
+ExitCode scan(const ScanCommand& command, const Catalogue& catalogue,
+              const Installation& installation, const Waiting& waiting, Console& console,
               int verbosity);
 
 }  // namespace zeb

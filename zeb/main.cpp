@@ -1,11 +1,28 @@
 #include <unistd.h>
 
 #include <cstdlib>
+#include <filesystem>
 #include <iostream>
 #include <string>
+#include <system_error>
 #include <vector>
 
+#include "platform/DistributedNotificationCenter.h"
+#include "platform/Environment.h"
 #include "zeb/Commands.h"
+
+namespace {
+
+/// Changes of indexes are told to all programs of the user's session, where there is a session.
+platform::Environment environmentOfProgram() {
+  platform::Environment environment = *platform::Environment::current();
+  if (auto center = platform::busNotificationCenter()) {
+    environment.notificationCenter = std::move(center);
+  }
+  return environment;
+}
+
+}  // namespace
 
 int main(int argc, char** argv) {
   zeb::Console console(std::cout, std::cerr);
@@ -15,6 +32,12 @@ int main(int argc, char** argv) {
   const char* noColor = std::getenv("NO_COLOR");  // NOLINT(concurrency-mt-unsafe)
   console.setColorsUnwanted(noColor != nullptr && *noColor != '\0');
 
+  const platform::EnvironmentOverride override(environmentOfProgram());
+  std::error_code unknown;
+  const auto program = std::filesystem::read_symlink("/proc/self/exe", unknown);
   const std::vector<std::string> arguments(argv + (argc > 0 ? 1 : 0), argv + argc);
-  return static_cast<int>(zeb::run(arguments, console));
+  const zeb::ExitCode code =
+      zeb::run(arguments, zeb::Installation::ofProgramAtPath(program.string()), console);
+  // Background work may be going on, and would find what it uses destroyed.
+  std::_Exit(static_cast<int>(code));
 }

@@ -1,3 +1,4 @@
+#include "host/Zebrine/ZEBGeneratedFiles.h"
 #include "host/Zebrine/ZEBLog.h"
 #include "platform/Environment.h"
 #include "platform/Files.h"
@@ -42,7 +43,7 @@ void ZEBIndexshelf::removeIndexForBookID(const std::string& bookID) {
   } else if (const auto path = _generatedIndexPathForBookID(bookID, std::nullopt)) {
     folder = platform::stringByDeletingLastPathComponent(*path);
   }
-  deleteGeneratedFolder(folder, _generatedRoot());
+  deleteGeneratedFolder(folder, ZEBGeneratedRoot());
   if (!record) {
     record = ZEBIndex::init();
     record->setBookID(bookID);

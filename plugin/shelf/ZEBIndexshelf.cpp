@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "host/Zebrine/ZEBConstants.h"
+#include "host/Zebrine/ZEBGeneratedFiles.h"
 #include "host/Zebrine/ZEBLog.h"
 #include "host/Zebrine/ZEBPluginOwner.h"
 #include "platform/Environment.h"
@@ -117,13 +118,6 @@ void ZEBIndexshelf::_addIndex(const std::shared_ptr<ZEBIndex>& index,
   _indices[forBookID] = {index};
 }
 
-std::optional<std::string> ZEBIndexshelf::_generatedRoot() {
-  const std::optional<std::string> caches = platform::Environment::current()->cachesDirectory;
-  return caches ? std::optional(ZEBStringWithFormat("%@/%@/%@", *caches, ZEBDaemonBundleID,
-                                                    ZEBGeneratedIndexDirectory))
-                : std::nullopt;
-}
-
 std::optional<std::string> ZEBIndexshelf::_generatedIndexPathForBookID(
     const std::optional<std::string>& bookID, const std::optional<std::string>& withLocalization) {
   return _generatedFilePathForBookID(bookID, withLocalization, ZEBHelpindexExtension);
@@ -144,16 +138,12 @@ std::optional<std::string> ZEBIndexshelf::_generatedFilePathForBookID(
   {
     const platform::MutexLock lock(_generatedIndexDirMutex);
     if (!_generatedIndexDir) {
-      _generatedIndexDir = _generatedRoot();
+      _generatedIndexDir = ZEBGeneratedRoot();
     }
     folder = _generatedIndexDir;
   }
   if (!folder) {
     return std::nullopt;
   }
-  const bool localized = withLocalization && !withLocalization->empty();
-  const std::string file =
-      ZEBStringWithFormat("%@/%@", *bookID, localized ? *withLocalization : *bookID);
-  return platform::stringByAppendingPathComponent(
-      *folder, platform::stringByAppendingPathExtension(file, andExtension));
+  return ZEBGeneratedFilePath(*folder, *bookID, withLocalization.value_or(""), andExtension);
 }

@@ -165,8 +165,6 @@ class ZEBIndexshelf : public std::enable_shared_from_this<ZEBIndexshelf> {
   explicit ZEBIndexshelf(const std::shared_ptr<ZEBPluginOwner>& owner) : _owner(owner) {}
   void _setUp();
   void _resolveIndicesForBook(const std::shared_ptr<ZEBHelpBook>& book, Indices& found);
-  /// Caches folder, daemon and generated-index folder; absent without a caches folder.
-  static std::optional<std::string> _generatedRoot();
 
   const std::weak_ptr<ZEBPluginOwner> _owner;
 

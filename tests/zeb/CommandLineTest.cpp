@@ -106,14 +106,22 @@ TEST_F(CommandLineTest, BooksTakesNothingButJSON) {
   expectUsageError({"books", "a"}, "a");
 }
 
-TEST_F(CommandLineTest, IndexTakesFoldersIdentifiersAndOutput) {
-  const auto command = parsed<zeb::IndexCommand>(
-      {"index", "one", "-o", "out", "two", "--book-id", "a", "--book-id", "b"});
+TEST_F(CommandLineTest, IndexTakesFoldersAndIdentifiers) {
+  const auto command =
+      parsed<zeb::IndexCommand>({"index", "one", "two", "--book-id", "a", "--book-id", "b"});
   EXPECT_THAT(command.folders, ElementsAre("one", "two"));
   EXPECT_THAT(command.bookIDs, ElementsAre("a", "b"));
-  EXPECT_EQ(command.output, "out");
-  EXPECT_EQ(parsed<zeb::IndexCommand>({"index", "one"}).output, std::nullopt);
-  expectUsageError({"index", "-o", "out"}, "folders");
+  expectUsageError({"index", "--book-id", "a"}, "folders");
+}
+
+TEST_F(CommandLineTest, CommandsWaitUnlessToldOtherwise) {
+  EXPECT_TRUE(parse({"search", "a"})->waiting.waits);
+  EXPECT_EQ(parse({"search", "a"})->waiting.limit, 300);
+  EXPECT_FALSE(parse({"search", "a", "--no-wait"})->waiting.waits);
+  EXPECT_EQ(parse({"--wait", "2.5", "scan"})->waiting.limit, 2.5);
+  expectUsageError({"search", "a", "--wait", "-1"}, "wait");
+  expectUsageError({"search", "a", "--wait", "soon"}, "wait");
+  expectUsageError({"search", "a", "--wait", "nan"}, "wait");
 }
 
 TEST_F(CommandLineTest, ScanTakesFoldersRootLanguagesAndForce) {

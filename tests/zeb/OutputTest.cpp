@@ -141,15 +141,14 @@ TEST_F(OutputTest, BooksAreListedInColumns) {
   one.entry.bookID = "a";
   one.entry.title = "First";
   one.entry.language = "pt_BR";
-  one.entry.pageCount = 7;
-  one.hasIndex = true;
+  one.indexPath = "/a.helpindex";
   zeb::ListedBook two;
   two.entry.bookID = "longer";
   two.entry.title = "Second";
   zeb::printBooks({one, two}, console);
   EXPECT_EQ(out.str(),
-            "a       pt_BR   7 pages  First\n"
-            "longer         no index  Second\n");
+            "a       pt_BR  indexed          First\n"
+            "longer         not indexed yet  Second\n");
 }
 
 TEST_F(OutputTest, BooksAsJSONHaveEverything) {
@@ -159,14 +158,12 @@ TEST_F(OutputTest, BooksAsJSONHaveEverything) {
   book.entry.type = 4;
   book.entry.language = "de";
   book.entry.folder = "/a";
-  book.entry.indexPath = "/a.helpindex";
-  book.entry.pageCount = 7;
-  book.hasIndex = true;
+  book.indexPath = "/a.helpindex";
   zeb::printBooksAsJSON({book}, console);
   EXPECT_EQ(nlohmann::json::parse(out.str()), nlohmann::json::parse(R"({
     "count": 1,
     "books": [{"id": "a", "title": "First", "type": 4, "language": "de", "folder": "/a",
-               "index": "/a.helpindex", "pages": 7, "indexed": true}]
+               "index": "/a.helpindex", "indexed": true}]
   })"));
 }
 

@@ -160,18 +160,19 @@ TEST_F(ProgramTest, CachesFolderThatCannotBeMadeIsNamed) {
   files.write("cache", "a file");
   const ProgramRun run = zeb({"scan", "--no-system", tests::shippedBook("manual")});
   EXPECT_EQ(run.status, 3);
-  EXPECT_THAT(run.err, HasSubstr("org.zeb.manual: cannot write"));
+  EXPECT_THAT(run.err, HasSubstr("zeb: error: org.zeb.manual: " + files.path("cache")));
 }
 
 TEST_F(ProgramTest, IndexOfTheToolAndOfTheCommandAreTheSameBytes) {
   const std::string ofTool = files.path("tool.helpindex");
-  const std::string ofCommand = files.path("command.helpindex");
+  const std::string ofCommand =
+      files.path("cache/org.zeb.zebd/GeneratedIndexes/org.zeb.manual/org.zeb.manual.helpindex");
   const std::string manual = tests::shippedBook("manual");
   ASSERT_EQ(shell(quoted(ZEB_TOOL) + " --create --anchors --generate-summaries --file " +
                   quoted(ofTool) + " --min-term-length 3 " + quoted(manual))
                 .status,
             0);
-  ASSERT_EQ(zeb({"index", manual, "-o", ofCommand}).status, 0);
+  ASSERT_EQ(zeb({"index", manual}).status, 0);
   std::ifstream a(ofTool, std::ios::binary);
   std::ifstream b(ofCommand, std::ios::binary);
   const std::string bytes((std::istreambuf_iterator<char>(a)), {});
@@ -192,11 +193,29 @@ TEST_F(ProgramTest, TwoScansAtOnceBothSucceedAndLeaveAWholeCatalogue) {
   EXPECT_EQ(zeb({"search", "half"}).status, 0);
   size_t count = 0;
   for (const auto& file : std::filesystem::directory_iterator(files.path("cache/books"))) {
-    EXPECT_THAT(file.path().string(),
-                testing::AnyOf(testing::EndsWith(".plist"), testing::EndsWith(".helpindex")));
+    EXPECT_THAT(file.path().string(), testing::EndsWith(".plist"));
     ++count;
   }
-  EXPECT_EQ(count, 4U);
+  EXPECT_EQ(count, 2U);
+}
+
+TEST_F(ProgramTest, IndexesAreRememberedInTheCacheFile) {
+  scanManual();
+  const std::string cache = files.path("cache/org.zeb.zebd/HelpindexCache.plist");
+  ASSERT_TRUE(std::filesystem::exists(cache));
+  const auto before = std::filesystem::last_write_time(cache);
+  const ProgramRun run = zeb({"search", "half", "--verbose", "--verbose", "--verbose"});
+  EXPECT_EQ(run.status, 0);
+  EXPECT_EQ(std::filesystem::last_write_time(cache), before);
+  EXPECT_THAT(run.err, Not(HasSubstr("Writing generated index")));
+}
+
+TEST_F(ProgramTest, EndsAtOnceThoughBooksAreStillBeingIndexedWhenToldNotToWait) {
+  ASSERT_EQ(zeb({"scan", "--no-wait", "--no-system", tests::shippedBook("manual")}).status, 0);
+  const ProgramRun run = zeb({"search", "half", "--no-wait"});
+  EXPECT_EQ(run.err, "zeb: 1 book is not indexed yet\nzeb: nothing found for half\n");
+  EXPECT_EQ(run.status, 1);
+  EXPECT_EQ(zeb({"search", "half"}).status, 0);
 }
 
 TEST_F(ProgramTest, DemonstrationSearchesWithoutAnyHelpOnTheComputer) {

@@ -4,6 +4,7 @@
 
 #include <chrono>
 #include <filesystem>
+#include <sstream>
 #include <string>
 
 #include "tests/zeb/World.h"
@@ -93,12 +94,13 @@ TEST_F(ScanTest, PagesOfAnUpgradeAreNoticedThoughTheyAreOlderThanTheIndex) {
   EXPECT_EQ(world.zeb({"search", "afterwards"}).code, ExitCode::success);
 }
 
-TEST_F(ScanTest, LostAndDamagedIndexesAreMadeAgain) {
+TEST_F(ScanTest, LostIndexesAndDamagedEntriesAreMadeAgain) {
   scan();
-  std::filesystem::remove(world.booksFolder() + "/editor.helpindex");
-  std::filesystem::resize_file(world.booksFolder() + "/player.helpindex", 5);
+  std::filesystem::remove(world.indexPath("editor", "C"));
   world.files().write("cache/books/doc.tool.plist", "garbage");
-  EXPECT_THAT(scan().out, EndsWith("3 indexed, 0 unchanged, 0 forgotten, 0 failed\n"));
+  EXPECT_THAT(scan().out, EndsWith("2 indexed, 1 unchanged, 0 forgotten, 0 failed\n"));
+  EXPECT_EQ(world.zeb({"search", "type", "--book", "editor"}).code, ExitCode::success);
+  EXPECT_EQ(world.zeb({"search", "tool", "--book", "doc.tool"}).code, ExitCode::success);
 }
 
 TEST_F(ScanTest, BooksThatAreGoneAreForgotten) {
@@ -106,7 +108,7 @@ TEST_F(ScanTest, BooksThatAreGoneAreForgotten) {
   std::filesystem::remove_all(world.files().path("root/usr/share/help/C/player"));
   EXPECT_EQ(scan({"--language", "en"}).out, "0 indexed, 2 unchanged, 1 forgotten, 0 failed\n");
   EXPECT_THAT(titles(), ElementsAre("doc.tool: Tool Manual", "editor: Text Editor"));
-  EXPECT_FALSE(std::filesystem::exists(world.booksFolder() + "/player.helpindex"));
+  EXPECT_FALSE(std::filesystem::exists(world.indexPath("player", "C")));
 }
 
 TEST_F(ScanTest, AnotherLanguageTakesTheBooksPlace) {
@@ -133,32 +135,18 @@ TEST_F(ScanTest, FolderOfOnesOwnComesBeforeAnInstalledBookOfThatName) {
   EXPECT_THAT(titles(), testing::Contains("editor: My Editor"));
 }
 
-TEST_F(ScanTest, IndexesWrittenElsewhereAreLeftAlone) {
-  world.writePage("mine/index.html", "My Book", "Secrets.");
-  const std::string index = world.files().path("mine.helpindex");
-  ASSERT_EQ(world.zeb({"index", world.files().path("mine"), "-o", index}).code, ExitCode::success);
-  const auto date = std::filesystem::last_write_time(index);
-  world.writePage("mine/more.html", "More", "Riddles.");
-  EXPECT_EQ(world.zeb({"scan", "--no-system"}).out,
-            "0 indexed, 0 unchanged, 0 forgotten, 0 failed\n");
-  EXPECT_EQ(std::filesystem::last_write_time(index), date);
-}
-
 TEST_F(ScanTest, BookWithItsOwnIndexIsSearchedThroughIt) {
   world.writePage("book/index.html", "Boxed", "Treasure.");
   world.writePage("book/deep/page.html", "Deep", "Pearls.");
-  ASSERT_EQ(world
-                .zeb({"index", world.files().path("book"), "-o",
-                      world.files().path("book/own.helpindex"), "--book-id", "org.box"})
-                .code,
+  ASSERT_EQ(world.zeb({"index", world.files().path("book"), "--book-id", "org.box"}).code,
             ExitCode::success);
+  std::filesystem::rename(world.indexPath("org.box"), world.files().path("book/own.helpindex"));
   world.files().write("book/Info.plist",
                       "<plist><dict><key>ZEBBookIdentifier</key><string>org.box</string>"
                       "<key>ZEBBookIndexFiles</key><string>own.helpindex</string>"
                       "<key>ZEBBookTitle</key><string>The Box</string></dict></plist>");
   const tests::World other;
   ASSERT_EQ(other.zeb({"scan", "--no-system", world.files().path("book")}).code, ExitCode::success);
-  EXPECT_FALSE(std::filesystem::exists(other.booksFolder() + "/org.box.helpindex"));
   const Outcome run = other.zeb({"search", "pearls"});
   EXPECT_THAT(run.out, HasSubstr("1. Deep  The Box\n"));
   EXPECT_THAT(run.out, HasSubstr("file://" + world.files().path("book/deep/page.html")));
@@ -184,12 +172,12 @@ TEST_F(ScanTest, ComputerWithoutHelpIsNoFailure) {
   EXPECT_EQ(run.out, "0 indexed, 0 unchanged, 0 forgotten, 0 failed\n");
 }
 
-TEST_F(ScanTest, PagesThatCannotBeReadAreCountedAndTheBookIsIndexed) {
+TEST_F(ScanTest, PagesThatCannotBeReadDoNotKeepTheOthersOut) {
   world.files().write("root/usr/share/help/C/editor/broken.page", "<page><title>");
   const Outcome run = scan({"--language", "en"});
   EXPECT_EQ(run.code, ExitCode::success);
-  EXPECT_THAT(run.err, HasSubstr("zeb: warning: editor: 1 pages or folders could not be read\n"));
-  EXPECT_THAT(scan({"--force", "--verbose", "--language", "en"}).err, HasSubstr("broken.page"));
+  EXPECT_THAT(run.out, EndsWith("3 indexed, 0 unchanged, 0 forgotten, 0 failed\n"));
+  EXPECT_EQ(world.zeb({"search", "type"}).code, ExitCode::success);
 }
 
 TEST_F(ScanTest, ProgressIsShownOnATerminalAndGoneAtTheEnd) {
@@ -198,6 +186,36 @@ TEST_F(ScanTest, ProgressIsShownOnATerminalAndGoneAtTheEnd) {
   EXPECT_THAT(run.err, HasSubstr("3 of 3 books"));
   EXPECT_THAT(run.err, EndsWith("\r\033[K"));
   EXPECT_THAT(run.out, Not(HasSubstr("\033")));
+}
+
+TEST_F(ScanTest, WithoutWaitingTheBooksAreLeftToALaterCommand) {
+  const Outcome run = scan({"--no-wait"});
+  EXPECT_EQ(run.code, ExitCode::success);
+  EXPECT_EQ(run.out, "0 indexed, 0 unchanged, 0 forgotten, 0 failed, 3 still to be indexed\n");
+  EXPECT_EQ(titles().size(), 3U);
+  EXPECT_FALSE(std::filesystem::exists(world.indexPath("player", "C")));
+  EXPECT_THAT(scan().out, EndsWith("3 indexed, 0 unchanged, 0 forgotten, 0 failed\n"));
+}
+
+TEST_F(ScanTest, BookThatCannotBeIndexedIsNamedAndTheOthersAreIndexed) {
+  // A file where the book's folder of generated files is to be.
+  world.files().write("cache/org.zeb.zebd/GeneratedIndexes/player", "");
+  const Outcome run = scan();
+  EXPECT_EQ(run.code, ExitCode::failure);
+  EXPECT_EQ(run.err, "zeb: error: player: it could not be indexed\n");
+  EXPECT_THAT(run.out, EndsWith("2 indexed, 0 unchanged, 0 forgotten, 1 failed\n"));
+}
+
+TEST_F(ScanTest, WithoutThePluginItFailsAndSaysWhy) {
+  std::ostringstream out;
+  std::ostringstream err;
+  zeb::Console console(out, err);
+  EXPECT_EQ(
+      zeb::run({"scan", "--root", world.files().path("root"), "--cache-dir", world.cacheFolder()},
+               {world.files().path("No.bundle"), {}}, console),
+      ExitCode::failure);
+  EXPECT_THAT(err.str(), HasSubstr("No.bundle cannot be used: "));
+  EXPECT_TRUE(titles().empty());
 }
 
 TEST_F(ScanTest, ManyBooksAtOnceAllArrive) {

@@ -6,6 +6,9 @@
 #include <string_view>
 #include <vector>
 
+#include "platform/DistributedNotificationCenter.h"
+#include "platform/Environment.h"
+#include "tests/platform/QuickClock.h"
 #include "tests/platform/TemporaryFolder.h"
 #include "zeb/Commands.h"
 
@@ -22,12 +25,23 @@ inline std::string shippedBook(const std::string& name) {
   return std::string(ZEB_SOURCE_DIR) + "/books/" + name;
 }
 
+/// The parts of this build.
+inline zeb::Installation installation() { return {ZEB_PLUGIN_BUNDLE, ZEB_TOOL}; }
+
 class World {
  public:
+  World() : _environment(_madeEnvironment()) {}
+
   const TemporaryFolder& files() const { return _files; }
   std::string cacheFolder() const { return _files.path("cache"); }
   /// The folder of the catalogue.
   std::string booksFolder() const { return cacheFolder() + "/books"; }
+  /// Where the plug-in puts the index of a book without localization.
+  std::string indexPath(const std::string& bookID) const { return indexPath(bookID, bookID); }
+  std::string indexPath(const std::string& bookID, const std::string& localization) const {
+    return cacheFolder() + "/org.zeb.zebd/GeneratedIndexes/" + bookID + "/" + localization +
+           ".helpindex";
+  }
 
   /// Runs a command line in this process. `setUp` may change the console first.
   template <typename SetUp>
@@ -38,7 +52,7 @@ class World {
     zeb::Console console(out, err);
     setUp(console);
     Outcome run;
-    run.code = zeb::run(arguments, console);
+    run.code = zeb::run(arguments, installation(), console);
     run.out = out.str();
     run.err = err.str();
     return run;
@@ -57,7 +71,18 @@ class World {
   }
 
  private:
+  /// What is still going on after a command goes on in the world's own folder, and time passes so
+  /// quickly that waits for quiet cost next to nothing.
+  platform::Environment _madeEnvironment() const {
+    platform::Environment environment = *platform::Environment::current();
+    environment.clock = std::make_shared<QuickClock>(10);
+    environment.cachesDirectory = cacheFolder();
+    environment.notificationCenter = platform::localNotificationCenter();
+    return environment;
+  }
+
   TemporaryFolder _files;
+  platform::EnvironmentOverride _environment;
 };
 
 }  // namespace tests

@@ -20,9 +20,9 @@
 #include "platform/Processes.h"
 #include "platform/PropertyList.h"
 #include "platform/RunLoop.h"
+#include "tests/platform/QuickClock.h"
 #include "tests/platform/TemporaryFolder.h"
 #include "tests/plugin/front/host/HostOwner.h"
-#include "tests/plugin/front/host/QuickClock.h"
 
 namespace {
 

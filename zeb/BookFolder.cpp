@@ -1,0 +1,154 @@
+#include "zeb/BookFolder.h"
+
+#include <fmt/format.h>
+
+#include <filesystem>
+#include <system_error>
+
+#include "bvmake/PageReader.h"
+#include "host/Zebrine/ZEBConstants.h"
+#include "host/Zebrine/ZEBGeneratedFiles.h"
+#include "host/Zebrine/ZEBHelpBook.h"
+#include "platform/Environment.h"
+#include "platform/Strings.h"
+#include "zeb/HelpFolders.h"
+
+namespace zeb {
+
+namespace {
+
+/// Part of every fingerprint: raised when indexes made so far should be made again although their
+/// pages are the same.
+constexpr int recipe = 2;
+
+constexpr const char* informationListName = "Info.plist";
+
+bool isFile(const std::string& path) {
+  bool isDirectory = false;
+  return platform::Environment::current()->files->fileExistsAtPath(path, &isDirectory) &&
+         !isDirectory;
+}
+
+bool isFolder(const std::string& path) {
+  bool isDirectory = false;
+  return platform::Environment::current()->files->fileExistsAtPath(path, &isDirectory) &&
+         isDirectory;
+}
+
+bool hasInformationList(const std::string& folder) {
+  return isFile(platform::stringByAppendingPathComponent(folder, informationListName));
+}
+
+/// The page that opens a folder which does not say. It need not exist: what counts is its folder.
+std::string accessPageIn(const std::string& folder) {
+  for (const char* name : {"index.html", "index.page", "index.xhtml", "index.htm"}) {
+    std::string path = platform::stringByAppendingPathComponent(folder, name);
+    if (isFile(path)) {
+      return path;
+    }
+  }
+  return platform::stringByAppendingPathComponent(folder, "index.html");
+}
+
+/// Empty when there is no such page, or it has no title.
+std::string titleOfPage(const std::string& path) {
+  const auto kind = bvmake::pageKindOfFileName(platform::lastPathComponent(path));
+  const auto bytes = platform::Environment::current()->files->contentsMappedAtPath(path);
+  if (!kind || !bytes) {
+    return {};
+  }
+  const auto page = bvmake::readPage(*kind, bytes->view());
+  return page ? page->title : std::string();
+}
+
+/// Whether there is a help page in the folder or below. Symbolic links are not followed.
+bool holdsPages(const std::string& folder) {
+  std::error_code error;
+  const auto options = std::filesystem::directory_options::skip_permission_denied;
+  for (std::filesystem::recursive_directory_iterator entry(folder, options, error), end;
+       !error && entry != end; entry.increment(error)) {
+    if (bvmake::pageKindOfFileName(entry->path().filename().native())) {
+      return true;
+    }
+  }
+  return false;
+}
+
+std::string pagesFolderOf(const CatalogueEntry& entry) {
+  return platform::stringByDeletingLastPathComponent(entry.accessPagePath);
+}
+
+}  // namespace
+
+std::optional<CatalogueEntry> entryForFolder(const std::string& folder,
+                                             const std::optional<std::string>& bookID,
+                                             const std::string& language, std::string& reason) {
+  if (!isFolder(folder)) {
+    reason = "there is no such folder";
+    return std::nullopt;
+  }
+  CatalogueEntry entry;
+  entry.folder = folder;
+  if (const std::shared_ptr<ZEBHelpBook> described = ZEBHelpBook::initWithPath(folder)) {
+    entry.bookID = described->bookID();
+    entry.title = described->title();
+    entry.type = described->type();
+    entry.language = described->localization();
+    entry.accessPagePath = described->accessPagePath().value_or(accessPageIn(folder));
+  } else if (hasInformationList(folder)) {
+    reason = "its information list does not describe a book";
+    return std::nullopt;
+  } else {
+    entry.bookID =
+        bookID.value_or(platform::stringByRepairingUTF8(platform::lastPathComponent(folder)));
+    if (!ZEBHelpBook::isValidBookID(entry.bookID)) {
+      reason = fmt::format("\"{}\" cannot be the identifier of a book", entry.bookID);
+      return std::nullopt;
+    }
+    entry.language = language;
+    entry.accessPagePath = accessPageIn(folder);
+    entry.title = titleOfPage(entry.accessPagePath);
+  }
+  if (entry.title.empty()) {
+    entry.title = entry.bookID;
+  }
+  if (entry.type != ZEBHelpBookType4 && !holdsPages(pagesFolderOf(entry))) {
+    reason = "there are no pages in it";
+    return std::nullopt;
+  }
+  entry.fingerprint = fmt::format("{}:{}", recipe, folderFingerprint(pagesFolderOf(entry)));
+  return entry;
+}
+
+std::shared_ptr<ZEBHelpBook> bookOfEntry(const CatalogueEntry& entry) {
+  if (hasInformationList(entry.folder)) {
+    std::shared_ptr<ZEBHelpBook> described = ZEBHelpBook::initWithPath(entry.folder);
+    return described != nullptr && described->bookID() == entry.bookID ? described : nullptr;
+  }
+  std::shared_ptr<ZEBHelpBook> book =
+      ZEBHelpBook::bookWithID(entry.bookID, entry.type, entry.folder);
+  if (book != nullptr) {
+    book->setTitle(entry.title);
+    book->setLocalization(entry.language);
+    book->setAccessPagePath(entry.accessPagePath);
+  }
+  return book;
+}
+
+std::optional<std::string> indexPathOfBook(const ZEBHelpBook& book) {
+  if (const std::optional<std::string> root = ZEBGeneratedRoot()) {
+    std::string path =
+        ZEBGeneratedFilePath(*root, book.bookID(), book.localization(), ZEBHelpindexExtension);
+    if (isFile(path)) {
+      return path;
+    }
+  }
+  for (std::string& path : book.indexPaths()) {
+    if (isFile(path)) {
+      return std::move(path);
+    }
+  }
+  return std::nullopt;
+}
+
+}  // namespace zeb

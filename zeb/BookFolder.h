@@ -1,0 +1,31 @@
+// From a folder of help pages to an entry of the catalogue, and to a book.
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+
+#include "zeb/Catalogue.h"
+
+class ZEBHelpBook;
+
+namespace zeb {
+
+/// What the catalogue is to say of a folder: a help book with an information list, or else any
+/// folder, which then needs the identifier and language given here (the name of the folder when
+/// there is none). A help book's own identifier wins. The title of a folder is that of the page
+/// that opens it. Absent, with `reason` set, for what is no folder, for one without help pages, for
+/// an information list that does not describe a book, and for an identifier that cannot be one.
+std::optional<CatalogueEntry> entryForFolder(const std::string& folder,
+                                             const std::optional<std::string>& bookID,
+                                             const std::string& language, std::string& reason);
+
+/// The book that the entry is about. Null when the folder's information list is no longer that of
+/// this book.
+std::shared_ptr<ZEBHelpBook> bookOfEntry(const CatalogueEntry& entry);
+
+/// The help-index file of the book that is there now: a generated one, or the one that it ships.
+/// Absent when there is none yet.
+std::optional<std::string> indexPathOfBook(const ZEBHelpBook& book);
+
+}  // namespace zeb

@@ -1,0 +1,71 @@
+// A running host: bookshelf, owner and plug-in.
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "platform/Clock.h"
+#include "platform/DispatchQueue.h"
+#include "platform/Error.h"
+#include "zebd/Owner.h"
+
+class ZEBPlugin;
+class ZEBQuery;
+
+namespace zebd {
+
+/// Loads the plug-in and runs it in this process. Searches run on threads of the host; the main
+/// loop runs on the main thread, and has to run while anything else does: the plug-in's background
+/// work waits for it.
+///
+/// The plug-in outlives the host: what it has begun it carries on with, answering to nobody, until
+/// the process ends.
+/// Thread-safety: internally synchronised, where a function does not say otherwise.
+class Host {
+ public:
+  /// On the main thread. Null, with `error` set, when the plug-in cannot be loaded.
+  static std::unique_ptr<Host> start(const std::string& pluginBundlePath, OwnerSettings settings,
+                                     platform::Error& error);
+  ~Host();
+  Host(const Host&) = delete;
+  Host& operator=(const Host&) = delete;
+
+  Bookshelf& bookshelf() { return *_bookshelf; }
+  Owner& owner() { return *_owner; }
+  const std::shared_ptr<ZEBPlugin>& plugin() const { return _plugin; }
+
+  /// Begins the search on a thread of its own and returns at once. The receiver hears the end
+  /// whatever happens, except when the process ends before.
+  void startSearch(const std::shared_ptr<ZEBQuery>& query,
+                   std::shared_ptr<SearchReceiver> receiver);
+
+  /// Has the indexes of these books found, or made, now. The plug-in registers books that are
+  /// announced to it at leisure, but those that a search needs at once; so this is a search, for an
+  /// anchor that no page carries. The receiver hears when all are registered; indexes that have to
+  /// be made are made after that, in the background.
+  void registerBooks(const std::vector<std::string>& bookIDs,
+                     std::shared_ptr<SearchReceiver> receiver);
+
+  /// Tells the plug-in that the host has read all its books. They are registered at leisure.
+  void announceBooks();
+
+  /// Has the book's index forgotten, and deleted where it was generated, a little later. On the
+  /// main thread. The owner's handler hears when it is done.
+  void removeIndexOfBook(const std::string& bookID);
+
+  /// Runs the main loop, on the main thread, until `condition` holds or `limit` has passed; returns
+  /// whether it holds. The condition is tested on the main thread, often.
+  static bool runMainLoopUntil(const std::function<bool()>& condition, platform::Seconds limit);
+
+ private:
+  Host(std::shared_ptr<Bookshelf> bookshelf, std::shared_ptr<Owner> owner);
+
+  const std::shared_ptr<Bookshelf> _bookshelf;
+  const std::shared_ptr<Owner> _owner;
+  const std::shared_ptr<platform::DispatchQueue> _searches;
+  std::shared_ptr<ZEBPlugin> _plugin;
+};
+
+}  // namespace zebd
