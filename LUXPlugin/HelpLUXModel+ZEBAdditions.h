@@ -19,3 +19,15 @@ inline float zeb_combiningWeightForHelpbookID(std::string_view helpbookID) {
   return HelpLUXModel::combiningWeightForHelpbookID(
       ZEBHelpBook::unversionedbookIDFromBookID(helpbookID));
 }
+
+/// A dictionary; see HelpLUXModel.
+inline platform::Value zeb_helpbookPropertiesForHelpbookID(std::string_view helpbookID,
+                                                           std::string_view modelGroupName) {
+  return HelpLUXModel::helpbookPropertiesForHelpbookID(
+      ZEBHelpBook::unversionedbookIDFromBookID(helpbookID), modelGroupName);
+}
+
+inline bool zeb_modelExistsForHelpbookID(std::string_view helpbookID, std::string_view language) {
+  return HelpLUXModel::modelExistsForHelpbookID(
+      ZEBHelpBook::unversionedbookIDFromBookID(helpbookID), language);
+}

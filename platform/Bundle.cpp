@@ -7,10 +7,17 @@
 #include <system_error>
 #include <utility>
 
+#include "platform/Environment.h"
 #include "platform/Files.h"
 #include "platform/PropertyList.h"
 
 namespace platform {
+
+namespace {
+
+constexpr const char* resourcesFolder = "Resources";
+
+}  // namespace
 
 Bundle::Bundle(std::string path, Value information)
     : _path(std::move(path)), _information(std::move(information)) {}
@@ -65,6 +72,34 @@ std::optional<std::string> Bundle::executablePath() const {
     return std::nullopt;
   }
   return stringByAppendingPathComponent(_path, *name);
+}
+
+std::optional<std::string> Bundle::pathForResource(
+    const std::string& name, const std::optional<std::string>& ofType,
+    const std::optional<std::string>& inDirectory,
+    const std::optional<std::string>& forLocalization) const {
+  const std::string file = ofType && !ofType->empty() ? name + "." + *ofType : name;
+  const std::string within = inDirectory && !inDirectory->empty()
+                                 ? stringByAppendingPathComponent(*inDirectory, file)
+                                 : file;
+  if (file.empty() || within.find('\0') != std::string::npos) {
+    return std::nullopt;
+  }
+  const std::string resources = stringByAppendingPathComponent(_path, resourcesFolder);
+  const auto existing = [&](const std::string& folder) -> std::optional<std::string> {
+    const std::string path =
+        stringByStandardizingPath(stringByAppendingPathComponent(folder, within));
+    const bool isInside = path.starts_with(stringByStandardizingPath(resources) + "/");
+    return isInside && Environment::current()->files->fileExistsAtPath(path) ? std::optional(path)
+                                                                             : std::nullopt;
+  };
+  if (forLocalization && !forLocalization->empty()) {
+    if (auto path =
+            existing(stringByAppendingPathComponent(resources, *forLocalization + ".lproj"))) {
+      return path;
+    }
+  }
+  return existing(resources);
 }
 
 std::string Bundle::principalClass() const {

@@ -33,6 +33,15 @@ class Bundle {
   /// Path of the code; absent when the list names none, or names one outside the folder.
   std::optional<std::string> executablePath() const;
   std::string principalClass() const;
+
+  /// The file or folder of that name, with `.ofType` behind it where one is given, in the bundle's
+  /// resource folder ("Resources"): in the language folder of `forLocalization` where one is given
+  /// and has it, else outside all language folders. Absent when there is none, and for names that
+  /// lead elsewhere.
+  std::optional<std::string> pathForResource(
+      const std::string& name, const std::optional<std::string>& ofType,
+      const std::optional<std::string>& inDirectory,
+      const std::optional<std::string>& forLocalization) const;
   const Value& infoDictionary() const { return _information; }
 
  private:

@@ -111,8 +111,8 @@ class MainQueue final : public DispatchQueue {
 
 }  // namespace
 
-std::shared_ptr<DispatchQueue> DispatchQueue::serial(std::string label) {
-  return std::make_shared<WorkerQueue>(std::move(label), false, ThreadPriority::normal);
+std::shared_ptr<DispatchQueue> DispatchQueue::serial(std::string label, ThreadPriority priority) {
+  return std::make_shared<WorkerQueue>(std::move(label), false, priority);
 }
 
 std::shared_ptr<DispatchQueue> DispatchQueue::concurrent(std::string label) {

@@ -23,7 +23,8 @@ class DispatchQueue {
  public:
   using Block = std::function<void()>;
 
-  static std::shared_ptr<DispatchQueue> serial(std::string label);
+  static std::shared_ptr<DispatchQueue> serial(std::string label,
+                                               ThreadPriority priority = ThreadPriority::normal);
   static std::shared_ptr<DispatchQueue> concurrent(std::string label);
   /// Runs blocks on RunLoop::main(), in order; they wait until the main thread runs its loop.
   static std::shared_ptr<DispatchQueue> main();

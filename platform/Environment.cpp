@@ -10,6 +10,7 @@
 #include <string_view>
 #include <thread>
 
+#include "platform/Applications.h"
 #include "platform/DistributedNotificationCenter.h"
 #include "platform/Network.h"
 #include "platform/Processes.h"
@@ -110,6 +111,7 @@ Environment Environment::system() {
     std::fwrite(text.data(), 1, text.size(), stdout);
   };
   environment.networkIsReachable = systemNetworkIsReachable;
+  environment.runningApplications = systemRunningApplications;
   environment.processorCount = [] {
     return std::max(1, static_cast<int>(std::thread::hardware_concurrency()));
   };

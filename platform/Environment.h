@@ -37,6 +37,9 @@ struct Environment {
   /// Whether there is a network; may change at any time.
   std::function<bool()> networkIsReachable;
 
+  /// Identifiers of the applications that run in the user's session.
+  std::function<std::vector<std::string>()> runningApplications;
+
   /// Language tags, the user's favourite first; never empty.
   std::vector<std::string> preferredLanguages;
 

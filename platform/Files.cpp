@@ -227,6 +227,16 @@ std::optional<Error> FileManager::createDirectoryWithParents(const std::string& 
   return std::nullopt;
 }
 
+std::optional<Error> FileManager::createDirectory(const std::string& path) const {
+  if (nameless(path)) {
+    return posixError(ENOENT, path);
+  }
+  if (::mkdir(path.c_str(), 0777) != 0) {
+    return posixError(errno, path);
+  }
+  return std::nullopt;
+}
+
 std::optional<Error> FileManager::copyItem(const std::string& from, const std::string& to) const {
   if (nameless(from) || nameless(to)) {
     return posixError(ENOENT, nameless(from) ? from : to);
@@ -366,6 +376,11 @@ std::optional<Error> FailingFileManager::writeAtomically(const std::string& path
 std::optional<Error> FailingFileManager::createDirectoryWithParents(const std::string& path) const {
   const auto failure = _failure(Operation::createDirectory, path);
   return failure ? failure : FileManager::createDirectoryWithParents(path);
+}
+
+std::optional<Error> FailingFileManager::createDirectory(const std::string& path) const {
+  const auto failure = _failure(Operation::createDirectory, path);
+  return failure ? failure : FileManager::createDirectory(path);
 }
 
 std::optional<Error> FailingFileManager::copyItem(const std::string& from,

@@ -44,6 +44,9 @@ class FileManager {
   /// Creates the folder and every missing folder above it; fine when it is there already.
   virtual std::optional<Error> createDirectoryWithParents(const std::string& path) const;
 
+  /// Creates the folder; fails when something is there already or the folder above it is missing.
+  virtual std::optional<Error> createDirectory(const std::string& path) const;
+
   /// Copies one regular file, or fails when the target exists.
   virtual std::optional<Error> copyItem(const std::string& from, const std::string& to) const;
 
@@ -74,6 +77,7 @@ class FailingFileManager : public FileManager {
   std::optional<Data> contentsMappedAtPath(const std::string& path, Error* error) const override;
   std::optional<Data> contentsAtPath(const std::string& path, Error* error) const override;
   std::optional<Error> writeAtomically(const std::string& path, const Data& data) const override;
+  std::optional<Error> createDirectory(const std::string& path) const override;
   std::optional<Error> createDirectoryWithParents(const std::string& path) const override;
   std::optional<Error> copyItem(const std::string& from, const std::string& to) const override;
   std::optional<Error> removeItem(const std::string& path) const override;

@@ -101,8 +101,10 @@ class BlockOperation : public Operation {
   static std::shared_ptr<BlockOperation> blockOperationWithBlock(std::function<void()> block);
   void main() override;
 
- private:
+ protected:
   explicit BlockOperation(std::function<void()> block);
+
+ private:
   std::function<void()> _block;
 };
 

@@ -65,6 +65,9 @@ class WorkerPool {
         lock.unlock();
         runLoggingExceptions(task);
         task = nullptr;
+        if (!currentThreadName().empty()) {
+          setCurrentThreadName({});
+        }
         lock.lock();
       }
       ++_idle;
@@ -102,11 +105,15 @@ void runOnWorkerThread(std::function<void()> task, ThreadPriority priority) {
 
 void startNamedThread(const std::string& name, std::function<void()> body) {
   std::thread([name, body = std::move(body)]() mutable {
-    threadName() = name;
-    ::pthread_setname_np(::pthread_self(), name.substr(0, 15).c_str());
+    setCurrentThreadName(name);
     runLoggingExceptions(body);
     body = nullptr;
   }).detach();
+}
+
+void setCurrentThreadName(const std::string& name) {
+  threadName() = name;
+  ::pthread_setname_np(::pthread_self(), name.substr(0, 15).c_str());
 }
 
 const std::string& currentThreadName() { return threadName(); }

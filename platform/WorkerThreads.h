@@ -19,6 +19,9 @@ void runOnWorkerThread(std::function<void()> task,
 /// exception that leaves `body` is logged at level 0 and ends the thread, not the process.
 void startNamedThread(const std::string& name, std::function<void()> body);
 
+/// Names the calling thread; a worker thread bears the name until its task ends.
+void setCurrentThreadName(const std::string& name);
+
 /// Name of the calling thread as given to startNamedThread(), whole; empty for other threads.
 const std::string& currentThreadName();
 

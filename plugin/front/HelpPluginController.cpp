@@ -44,8 +44,8 @@ void HelpPluginController::_setUp() {
   }
   _helpindexSearchController = ZEBHelpindexSearchController::init();
   _helpindexSearchController->setPluginOwner(_owner);
-  // Asked a third time for the semantic search controller, which is null as long as there is none.
-  if (_owner && _owner->userLoggedIn() && _luxSearchController) {
+  if (_owner && _owner->userLoggedIn()) {
+    _luxSearchController = LUXSearchController::initWithOwner(_owner);
     _luxSearchController->setIndexshelf(_indexshelf);
   }
 }

@@ -27,12 +27,14 @@ class ScriptedSemantics : public LUXSearchController {
     bool passesBackSearchedBooks;
   };
 
+  ScriptedSemantics() : LUXSearchController(nullptr) {}
+
   void setIndexshelf(std::shared_ptr<ZEBIndexshelf>) override {}
   void useShorterTimeouts(bool useShorterTimeouts) override {
     steps.emplace_back(useShorterTimeouts ? "shorter" : "not shorter");
   }
 
-  std::optional<Results> doSearchForQuery(
+  Results doSearchForQuery(
       const std::shared_ptr<ZEBQuery>& query, const std::string& requestedResultType,
       const std::vector<std::shared_ptr<ZEBIndex>>& inIndices,
       const std::vector<std::string>& ignoringItems,
@@ -47,7 +49,7 @@ class ScriptedSemantics : public LUXSearchController {
       onSearch(query);
     }
     const auto answer = answers.find(requestedResultType);
-    return answer == answers.end() ? std::nullopt : answer->second;
+    return answer == answers.end() ? Results() : answer->second.value_or(Results());
   }
 
   void completeSearchQuery(const std::shared_ptr<ZEBQuery>& query) override {
