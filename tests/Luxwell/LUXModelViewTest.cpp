@@ -51,8 +51,8 @@ class NaiveModel {
   }
 
   std::map<std::string, std::map<size_t, Posting>> terms(LUXTokenKind kind) const {
-    const auto relative = [](double share, double length, double average) {
-      return average > 0 ? 1 - share + share * length / average : 1;
+    const auto relative = [](double share, double exponent, double length, double average) {
+      return average > 0 ? 1 - share + share * std::pow(length / average, exponent) : 1;
     };
     const double titleAverage = averageLength(kind, true);
     const double bodyAverage = averageLength(kind, false);
@@ -68,10 +68,10 @@ class NaiveModel {
         Posting& posting = result[std::string(count.token)][page];
         posting.count = count.titleCount + count.bodyCount;
         posting.tf = kind == LUXTokenKind::bigram
-                         ? posting.count /
-                               relative(.75, titleLength + bodyLength, titleAverage + bodyAverage)
-                         : 4 * count.titleCount / relative(.5, titleLength, titleAverage) +
-                               count.bodyCount / relative(.75, bodyLength, bodyAverage);
+                         ? posting.count / relative(.9, .6, titleLength + bodyLength,
+                                                    titleAverage + bodyAverage)
+                         : 5 * count.titleCount / relative(.5, 1, titleLength, titleAverage) +
+                               count.bodyCount / relative(.9, .6, bodyLength, bodyAverage);
       }
     }
     return result;
@@ -136,7 +136,7 @@ TEST(LUXModelView, PostingsAreThoseOfEachPageAlone) {
         for (const uint32_t posting : view->postings(kind, *number)) {
           found.push_back(luxposting::page(posting));
           const double tf = expected.at(found.back());
-          const double impact = kind == LUXTokenKind::title ? 1023 : 1023 * tf / (1.2 + tf);
+          const double impact = kind == LUXTokenKind::title ? 1023 : 1023 * tf / (2.5 + tf);
           EXPECT_NEAR(luxposting::impact(posting), impact, .51) << token;
         }
         std::vector<uint32_t> expectedPages;
@@ -350,11 +350,66 @@ TEST(LUXModelView, MeaningIsThatOfADenseDecomposition) {
   }
 }
 
+TEST(LUXModelView, EveryPageIsInTheNeighbourhoodOfItsNearestCentre) {
+  EXPECT_EQ(tests::viewOfPages(tests::samplePages())->neighbourhoodCount(), 0U);
+  LUXModelTrainer trainer("English");
+  const std::vector<ModelPage> some = tests::randomModelPages(200, 20, 7);
+  const std::vector<LUXTokenCounts> counts = tests::countsOfPages(some);
+  constexpr size_t pageCount = luxmodel::neighbourhoodPageCount;
+  for (size_t i = 0; i < pageCount; ++i) {
+    // One page has nothing to mean.
+    trainer.addPage(i == 77 ? LUXTokenCounts() : counts[i % counts.size()], std::to_string(i),
+                    std::nullopt, "book");
+  }
+  const auto view = LUXModelView::viewWithData(trainer.finish({}, 2));
+  ASSERT_EQ(view->neighbourhoodCount(), 64U);
+  const auto nearness = [&](uint32_t a, uint32_t b) {
+    double product = 0;
+    for (size_t i = 0; i < view->stride(); ++i) {
+      product += view->pageVector(a)[i] * view->pageVector(b)[i];
+    }
+    return product * view->pageScale(a) * view->pageScale(b);
+  };
+  std::vector<uint32_t> all;
+  for (size_t n = 0; n < view->neighbourhoodCount(); ++n) {
+    EXPECT_EQ(view->neighbourhoodCentre(n), n * pageCount / 64);
+    const auto pages = view->pagesOfNeighbourhood(n);
+    EXPECT_TRUE(std::is_sorted(pages.begin(), pages.end()));
+    all.insert(all.end(), pages.begin(), pages.end());
+    for (size_t i = 0; i < pages.size(); i += 16) {
+      for (size_t other = 0; other < view->neighbourhoodCount(); ++other) {
+        EXPECT_GE(nearness(pages[i], view->neighbourhoodCentre(n)) + 1e-6,
+                  nearness(pages[i], view->neighbourhoodCentre(other)));
+      }
+    }
+  }
+  EXPECT_EQ(all.size(), pageCount - 1);
+  std::sort(all.begin(), all.end());
+  EXPECT_EQ(std::adjacent_find(all.begin(), all.end()), all.end());
+  EXPECT_FALSE(std::binary_search(all.begin(), all.end(), 77U));
+  EXPECT_TRUE(view->pagesOfNeighbourhood(64).empty());
+  EXPECT_EQ(view->neighbourhoodCentre(64), 0U);
+}
+
+TEST(LUXModelView, PagesThatAreAllAlikeHaveNoMeaning) {
+  std::vector<ModelPage> pages;
+  for (int i = 0; i < 5; ++i) {
+    pages.push_back({"book", std::to_string(i), "Same title", "The same words."});
+  }
+  const auto view = tests::viewOfPages(pages);
+  ASSERT_NE(view, nullptr);
+  EXPECT_EQ(view->pageCount(), 5U);
+  EXPECT_EQ(view->rank(), 0U);
+}
+
 TEST(LUXModelView, VectorsAreFilledUpWithZeros) {
   const auto view = tests::viewOfPages(tests::samplePages());
   ASSERT_GT(view->rank(), 0U);
   EXPECT_EQ(view->stride() % 32, 0U);
+  ASSERT_EQ(view->pageScales().size(), view->pageCount());
   for (uint32_t page = 0; page < view->pageCount(); ++page) {
+    EXPECT_EQ(view->pageVectors() + page * view->stride(), view->pageVector(page));
+    EXPECT_EQ(view->pageScales()[page], view->pageScale(page));
     for (size_t i = view->rank(); i < view->stride(); ++i) {
       EXPECT_EQ(view->pageVector(page)[i], 0);
     }
