@@ -43,16 +43,24 @@ __attribute__((target("avx2"))) void wideAddRow(float* sum, float factor, const 
   }
 }
 
-using AddRow = void (*)(float*, float, const float*, size_t) noexcept;
-const AddRow addRow = __builtin_cpu_supports("avx2") != 0 ? wideAddRow : plainAddRow;
-#else
-constexpr auto addRow = plainAddRow;
 #endif
+
+using AddRow = void (*)(float*, float, const float*, size_t) noexcept;
+
+AddRow bestAddRow() noexcept {
+#if defined(__x86_64__)
+  if (__builtin_cpu_supports("avx2") != 0) {
+    return wideAddRow;
+  }
+#endif
+  return plainAddRow;
+}
 
 // matrix * dense.
 LUXDenseMatrix product(const LUXSparseMatrix& matrix, const LUXDenseMatrix& dense,
                        size_t threadCount) {
   LUXDenseMatrix result = zeros(matrix.rowCount, dense.columnCount);
+  const AddRow addRow = bestAddRow();
   LUXInParallel(matrix.rowCount, blockLength, threadCount, [&](size_t from, size_t to) {
     for (size_t row = from; row < to; ++row) {
       float* sum = result.row(row);
@@ -114,7 +122,7 @@ Spectrum spectrumOf(const Eigen::MatrixXd& symmetric) {
   const Eigen::SelfAdjointEigenSolver<Eigen::MatrixXd> solver(symmetric);
   const Eigen::VectorXd& rising = solver.eigenvalues();
   const Eigen::Index size = rising.size();
-  const double floor = size == 0 ? 0 : noise * rising[size - 1];
+  const double floor = noise * rising[size - 1];
   Eigen::Index count = 0;
   while (count < size && rising[size - 1 - count] > floor) {
     ++count;
@@ -125,10 +133,13 @@ Spectrum spectrumOf(const Eigen::MatrixXd& symmetric) {
 // Columns at right angles and of length 1 that span the same; fewer where the columns depend on one
 // another.
 LUXDenseMatrix orthogonal(const LUXDenseMatrix& dense, size_t threadCount) {
+  if (dense.columnCount == 0) {
+    return dense;
+  }
   const Eigen::MatrixXd products = gram(dense, threadCount);
   const Eigen::LLT<Eigen::MatrixXd> factor(products);
   const Eigen::MatrixXd lower = factor.matrixL();
-  if (factor.info() == Eigen::Success && products.size() != 0 &&
+  if (factor.info() == Eigen::Success &&
       lower.diagonal().minCoeff() > smallestPivot * lower.diagonal().maxCoeff()) {
     const Eigen::MatrixXd identity = Eigen::MatrixXd::Identity(lower.rows(), lower.cols());
     return product(dense, lower.transpose().triangularView<Eigen::Upper>().solve(identity),
@@ -148,17 +159,14 @@ uint64_t nextRandom(uint64_t& state) noexcept {
   return value ^ (value >> 31U);
 }
 
-// Signs serve as well as numbers from a bell curve, and need no function of the C library that
-// rounds differently elsewhere.
-LUXDenseMatrix randomSigns(size_t rowCount, size_t columnCount) {
+// Between -1 and 1. Even numbers serve as well as those of a bell curve, and need no function of
+// the C library that rounds differently elsewhere; plain signs would often depend on one another in
+// small matrices.
+LUXDenseMatrix randomNumbers(size_t rowCount, size_t columnCount) {
   LUXDenseMatrix result = zeros(rowCount, columnCount);
   uint64_t state = luxlatent::seed;
-  uint64_t bits = 0;
-  for (size_t i = 0; i < result.values.size(); ++i) {
-    if (i % 64 == 0) {
-      bits = nextRandom(state);
-    }
-    result.values[i] = (bits >> (i % 64) & 1U) != 0 ? 1.0F : -1.0F;
+  for (float& value : result.values) {
+    value = static_cast<float>(nextRandom(state) >> 40U) / 8388608.0F - 1.0F;
   }
   return result;
 }
@@ -201,11 +209,14 @@ LUXFactorisation LUXFactorise(const LUXSparseMatrix& matrix, size_t rank, size_t
     return {};
   }
   const LUXSparseMatrix transpose = LUXTranspose(matrix);
-  LUXDenseMatrix basis =
-      orthogonal(product(matrix, randomSigns(matrix.columnCount, width), threadCount), threadCount);
+  LUXDenseMatrix basis = orthogonal(
+      product(matrix, randomNumbers(matrix.columnCount, width), threadCount), threadCount);
   for (size_t i = 0; i < luxlatent::iterations; ++i) {
     const LUXDenseMatrix back = orthogonal(product(transpose, basis, threadCount), threadCount);
     basis = orthogonal(product(matrix, back, threadCount), threadCount);
+  }
+  if (basis.columnCount == 0) {
+    return {};
   }
   // A^T Q is what is left: its Gram matrix has the squares of the singular values.
   const LUXDenseMatrix projected = product(transpose, basis, threadCount);

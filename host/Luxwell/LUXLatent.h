@@ -49,7 +49,7 @@ inline constexpr uint64_t seed = 0x5EED0FA11A6E5ULL;
 }  // namespace luxlatent
 
 /// Factorises by randomised subspace iteration (N. Halko, P. Martinsson, J. Tropp, "Finding
-/// structure with randomness", 2011, algorithms 4.4 and 5.1): a product with random signs, made
+/// structure with randomness", 2011, algorithms 4.4 and 5.1): a product with random numbers, made
 /// orthogonal after every product with A and its transpose, then the small problem that is left.
 /// The sums are in a fixed order, so that the same matrix gives the same bits whatever the number
 /// of threads. Gives fewer than `rank` dimensions for a matrix that does not have as many.

@@ -13,6 +13,7 @@
 #include "host/Luxwell/LUXModelSections.h"
 #include "host/Luxwell/LUXModelView.h"
 #include "host/Luxwell/LUXParallel.h"
+#include "host/Luxwell/LUXScoringProduct.h"
 #include "platform/Exception.h"
 #include "platform/PropertyList.h"
 
@@ -29,8 +30,16 @@ constexpr std::array termKinds{stem, bigram, form, title};
 }
 
 // By how much more a page of this length has of everything.
-double relativeLength(double share, double length, double average) noexcept {
-  return average > 0 ? 1 - share + share * length / average : 1;
+double relativeLength(double length, double average, double share, double exponent) noexcept {
+  return average > 0 ? 1 - share + share * std::pow(length / average, exponent) : 1;
+}
+
+double titleLengthFactor(double length, double average) noexcept {
+  return relativeLength(length, average, luxmodel::titleLengthShare, luxmodel::titleLengthExponent);
+}
+
+double bodyLengthFactor(double length, double average) noexcept {
+  return relativeLength(length, average, luxmodel::bodyLengthShare, luxmodel::bodyLengthExponent);
 }
 
 uint32_t impactOf(double count) noexcept {
@@ -260,12 +269,10 @@ void LUXModelAssembler::_addPostings(LUXTokenKind kind) {
     const LUXTrainingPage& page = _data.pages[_pages[i]];
     const double titles = page.titleLengths[static_cast<size_t>(kind)];
     const double bodies = page.bodyLengths[static_cast<size_t>(kind)];
-    double titleFactor =
-        luxmodel::titleWeight / relativeLength(luxmodel::titleLengthShare, titles, averageTitle);
-    double bodyFactor = 1 / relativeLength(luxmodel::bodyLengthShare, bodies, averageBody);
+    double titleFactor = luxmodel::titleWeight / titleLengthFactor(titles, averageTitle);
+    double bodyFactor = 1 / bodyLengthFactor(bodies, averageBody);
     if (kind == bigram) {
-      bodyFactor = 1 / relativeLength(luxmodel::bodyLengthShare, titles + bodies,
-                                      averageTitle + averageBody);
+      bodyFactor = 1 / bodyLengthFactor(titles + bodies, averageTitle + averageBody);
       titleFactor = bodyFactor;
     }
     for (const LUXOccurrence& occurrence : occurrences.ofPage(_pages[i])) {
@@ -374,6 +381,7 @@ void LUXModelAssembler::_addMeaning() {
     const float step = quantise(row, _rank, &pageVectors[page * _stride]);
     pageScales[page] = squares > 0 ? static_cast<float>(step / std::sqrt(squares)) : 0;
   }
+  _addNeighbourhoods(pageVectors, pageScales);
   std::vector<int8_t> termVectors(size_t{columnCount} * _stride);
   std::vector<float> termScales(columnCount);
   for (size_t column = 0; column < columnCount; ++column) {
@@ -386,4 +394,56 @@ void LUXModelAssembler::_addMeaning() {
   _writer.addItems(termVectorNumbersSection, std::move(columns));
   _writer.addItems(termVectorsSection, std::move(termVectors));
   _writer.addItems(termScalesSection, std::move(termScales));
+}
+
+void LUXModelAssembler::_addNeighbourhoods(const std::vector<int8_t>& vectors,
+                                           const std::vector<float>& scales) {
+  if (_shownCount < luxmodel::neighbourhoodPageCount) {
+    return;
+  }
+  const auto count = static_cast<size_t>(std::lround(std::sqrt(static_cast<double>(_shownCount))));
+  std::vector<uint32_t> centres;
+  for (size_t i = 0; i < count; ++i) {
+    const auto page = static_cast<uint32_t>(i * _shownCount / count);
+    if (scales[page] > 0) {
+      centres.push_back(page);
+    }
+  }
+  if (centres.empty()) {
+    return;
+  }
+  constexpr uint32_t nowhere = 0xFFFFFFFF;
+  std::vector<uint32_t> places(_shownCount, nowhere);
+  constexpr size_t pagesAtOnce = 256;
+  LUXInParallel(_shownCount, pagesAtOnce, _threadCount, [&](size_t from, size_t to) {
+    for (size_t page = from; page < to; ++page) {
+      float best = -1;
+      for (uint32_t i = 0; scales[page] > 0 && i < centres.size(); ++i) {
+        const int32_t product = LUXInnerProduct(&vectors[page * _stride],
+                                                &vectors[size_t{centres[i]} * _stride], _stride);
+        const float cosine = static_cast<float>(product) * scales[centres[i]] * scales[page];
+        if (places[page] == nowhere || cosine > best) {
+          best = cosine;
+          places[page] = i;
+        }
+      }
+    }
+  });
+  std::vector<uint32_t> starts(centres.size() + 1);
+  for (const uint32_t place : places) {
+    if (place != nowhere) {
+      ++starts[place + 1];
+    }
+  }
+  addUp(starts);
+  std::vector<uint32_t> pages(starts.back());
+  std::vector<uint32_t> next(starts.begin(), starts.end() - 1);
+  for (uint32_t page = 0; page < places.size(); ++page) {
+    if (places[page] != nowhere) {
+      pages[next[places[page]]++] = page;
+    }
+  }
+  _writer.addItems(luxmodel::neighbourhoodCentresSection, std::move(centres));
+  _writer.addItems(luxmodel::neighbourhoodStartsSection, std::move(starts));
+  _writer.addItems(luxmodel::pagesOfNeighbourhoodsSection, std::move(pages));
 }

@@ -28,6 +28,7 @@ class LUXModelAssembler {
   void _orderPairs();
   void _addPostings(LUXTokenKind kind);
   void _addMeaning();
+  void _addNeighbourhoods(const std::vector<int8_t>& vectors, const std::vector<float>& scales);
 
   LUXTrainingData _data;
   const size_t _threadCount;

@@ -32,6 +32,10 @@ enum Section : uint32_t {
   termVectorsSection = 14,
   termScalesSection = 15,
 
+  neighbourhoodCentresSection = 72,
+  neighbourhoodStartsSection = 73,
+  pagesOfNeighbourhoodsSection = 74,
+
   phraseFoldedOffsetsSection = 16,
   phraseFoldedHeadsSection = 17,
   phraseFoldedTextSection = 18,

@@ -196,6 +196,11 @@ bool LUXModelView::_open() {
   const uint64_t vectors = _numbers.rank == 0 ? 0 : pages;
   _pageVectors = opener.items<int8_t>(pageVectorsSection, vectors * _numbers.stride);
   _pageScales = opener.items<float>(pageScalesSection, vectors);
+  _neighbourhoodCentres = opener.items<uint32_t>(neighbourhoodCentresSection);
+  _neighbourhoodStarts =
+      opener.items<uint32_t>(neighbourhoodStartsSection,
+                             _neighbourhoodCentres.empty() ? 0 : _neighbourhoodCentres.size() + 1);
+  _pagesOfNeighbourhoods = opener.items<uint32_t>(pagesOfNeighbourhoodsSection);
   _termVectorNumbers =
       opener.items<uint32_t>(termVectorNumbersSection, _numbers.rank == 0 ? 0 : stems);
   _termVectors = opener.items<int8_t>(termVectorsSection,
@@ -356,6 +361,15 @@ const int8_t* LUXModelView::pageVector(uint32_t page) const noexcept {
 
 float LUXModelView::pageScale(uint32_t page) const noexcept {
   return page < _pageScales.size() ? _pageScales[page] : 0;
+}
+
+uint32_t LUXModelView::neighbourhoodCentre(size_t neighbourhood) const noexcept {
+  return neighbourhood < _neighbourhoodCentres.size() ? _neighbourhoodCentres[neighbourhood] : 0;
+}
+
+std::span<const uint32_t> LUXModelView::pagesOfNeighbourhood(size_t neighbourhood) const noexcept {
+  const auto found = itemsBetween(_neighbourhoodStarts, neighbourhood, _pagesOfNeighbourhoods);
+  return found.first(std::min<size_t>(found.size(), _numbers.pageCount));
 }
 
 const int8_t* LUXModelView::termVector(uint32_t stem) const noexcept {

@@ -40,12 +40,19 @@ inline constexpr uint32_t posting(uint32_t page, uint32_t impact) noexcept {
 /// The constants that are built into a model. docs/quality.md tells what else was tried.
 namespace luxmodel {
 
-/// Saturation of counts, weight of one occurrence in a title, and how far the length of each field
-/// counts. Pairs of stems have one field that is as long as both.
-inline constexpr double saturation = 1.2;
-inline constexpr double titleWeight = 4;
+/// How fast repetitions stop counting, and how much more one occurrence in a title counts.
+inline constexpr double saturation = 2.5;
+inline constexpr double titleWeight = 5;
+/// A field that is longer than the average has more of everything by chance: counts are divided by
+/// 1 - share + share * (length / average)^exponent. Long bodies are not that much less about their
+/// subject than their length says. Pairs of stems have one field that is as long as both.
 inline constexpr double titleLengthShare = 0.5;
-inline constexpr double bodyLengthShare = 0.75;
+inline constexpr double titleLengthExponent = 1;
+inline constexpr double bodyLengthShare = 0.9;
+inline constexpr double bodyLengthExponent = 0.6;
+
+/// Pages from which on there are neighbourhoods.
+inline constexpr size_t neighbourhoodPageCount = 4096;
 
 /// Vectors are filled up with zeros to a multiple of this, and no longer than that.
 inline constexpr uint32_t vectorBlock = 32;
@@ -138,10 +145,25 @@ class LUXModelView {
   /// models without that space.
   const int8_t* pageVector(uint32_t page) const noexcept;
   float pageScale(uint32_t page) const noexcept;
+  /// All of them: pageCount() scales and as many vectors; nothing where there is no such space.
+  std::span<const float> pageScales() const noexcept { return _pageScales; }
+  const int8_t* pageVectors() const noexcept {
+    return _pageScales.empty() ? nullptr : _pageVectors.data();
+  }
   /// The direction of a stem; the scale holds its global weight too, so that a query is the sum of
   /// log2(1 + count) * termScale() * termVector(). Null for stems that have none.
   const int8_t* termVector(uint32_t stem) const noexcept;
   float termScale(uint32_t stem) const noexcept;
+
+  // Neighbourhoods: pages of similar meaning, so that those near a query are found without looking
+  // at all. Each page that has a vector is in the one whose centre it is nearest to. There are none
+  // in small models.
+
+  size_t neighbourhoodCount() const noexcept { return _neighbourhoodCentres.size(); }
+  /// A page; 0 for a number that is too high.
+  uint32_t neighbourhoodCentre(size_t neighbourhood) const noexcept;
+  /// Rising.
+  std::span<const uint32_t> pagesOfNeighbourhood(size_t neighbourhood) const noexcept;
 
   // Phrases for suggestions.
 
@@ -228,6 +250,9 @@ class LUXModelView {
   std::span<const uint32_t> _pairSeconds;
   std::span<const int8_t> _pageVectors;
   std::span<const float> _pageScales;
+  std::span<const uint32_t> _neighbourhoodCentres;
+  std::span<const uint32_t> _neighbourhoodStarts;
+  std::span<const uint32_t> _pagesOfNeighbourhoods;
   std::span<const uint32_t> _termVectorNumbers;
   std::span<const int8_t> _termVectors;
   std::span<const float> _termScales;

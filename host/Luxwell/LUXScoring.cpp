@@ -1,12 +1,15 @@
 #include "host/Luxwell/LUXScoring.h"
 
 #include <algorithm>
+#include <bit>
+#include <functional>
 #include <limits>
 #include <span>
 #include <utility>
 
 #include "host/Luxwell/LUXModelView.h"
 #include "host/Luxwell/LUXScoringBest.h"
+#include "host/Luxwell/LUXScoringGroups.h"
 #include "host/Luxwell/LUXScoringPlan.h"
 #include "host/Luxwell/LUXScoringProduct.h"
 
@@ -15,20 +18,13 @@ namespace {
 // How many postings or pages are worked on between two questions whether to give up.
 constexpr size_t stepLength = 16384;
 
-struct BestFirst {
-  const LUXPageScope& scope;
+// Pages in the order in which they win ties: those of the focused book, then the others.
+uint32_t rankOfPage(uint32_t page, const LUXPageScope& scope) {
+  const bool isFocused = page >= scope.focusFirst && page < scope.focusEnd;
+  return isFocused ? page : page | luxposting::maximumPageCount;
+}
 
-  bool isFocused(uint32_t page) const { return page >= scope.focusFirst && page < scope.focusEnd; }
-  bool operator()(const LUXScoredPage& a, const LUXScoredPage& b) const {
-    if (a.score != b.score) {
-      return a.score > b.score;
-    }
-    const bool aIsFocused = isFocused(a.page);
-    return aIsFocused != isFocused(b.page) ? aIsFocused : a.page < b.page;
-  }
-};
-
-using BestPages = LUXBest<LUXScoredPage, BestFirst>;
+uint32_t pageOfRank(uint32_t rank) { return rank & (luxposting::maximumPageCount - 1); }
 
 // One search: `_lexical` has a number for each page of the scope.
 class Search {
@@ -40,23 +36,42 @@ class Search {
         _scope(scope),
         _isCancelled(isCancelled),
         _count(std::min<size_t>(count, scope.end - scope.first)),
-        _best(_count, BestFirst{scope}),
-        _lexical(_paddedLength(scope.end - scope.first)) {
-    std::fill(_lexical.begin() + (scope.end - scope.first), _lexical.end(), notOfInterest);
+        _meaning(plan.latent.empty() ? 0 : plan.latentWeight),
+        _wordShare(1 - plan.latentWeight),
+        _best(_count),
+        _lexical(_roundedUp(scope.end - scope.first)) {
+    std::fill(_lexical.begin() + (scope.end - scope.first), _lexical.end(), filling);
   }
 
   // Best first, with the scores of the formula without `known`; empty when cancelled.
   std::vector<LUXScoredPage> run() {
-    if (!_addLists() || !_takeLexicallyBest() || !_takeOthersWithinReach() ||
-        !_takeThoseWithoutWords()) {
+    if (!_addLists()) {
       return {};
     }
-    return _best.sorted();
+    _findMaxima();
+    const float lexicallyBest = _lowerBoundOfBest();
+    if (!_takeBetween(lexicallyBest, everything)) {
+      return {};
+    }
+    _best.settle();
+    if (!_plan.latent.empty() &&
+        !(lexicallyBest > leastScore ? _takeBetween(_leastWithinReach(), lexicallyBest)
+          : _best.threshold() > 0    ? true
+                                     : _takeThoseWithoutWords())) {
+      return {};
+    }
+    std::vector<LUXScoredPage> pages;
+    for (const LUXBest::Item& item : _best.sorted()) {
+      pages.push_back({pageOfRank(item.number), item.score});
+    }
+    return pages;
   }
 
  private:
-  static size_t _paddedLength(size_t length) {
-    return (length + groupLength - 1) / groupLength * groupLength;
+  // Groups are looked at four at a time.
+  static size_t _roundedUp(size_t length) {
+    constexpr size_t unit = 4 * luxscoring::groupLength;
+    return (length + unit - 1) / unit * unit;
   }
 
   bool _cancelled() const { return _isCancelled && _isCancelled(); }
@@ -95,6 +110,32 @@ class Search {
     return true;
   }
 
+  void _findMaxima() {
+    _maxima.resize(_lexical.size() / luxscoring::groupLength);
+    luxscoring::findGroupMaxima(_lexical.data(), _maxima.size(), _maxima.data());
+  }
+
+  // A score that at least `_count` pages reach, and not many more; the least score that a page with
+  // a word of the query has where there may be fewer. If so many groups have a page that reaches
+  // it, so many pages do; and the best pages seldom share a group.
+  float _lowerBoundOfBest() const {
+    // Groups of groups, as long as they are enough to tell well.
+    size_t stride = 1;
+    while (_maxima.size() / (2 * stride) >= 4 * _count) {
+      stride *= 2;
+    }
+    std::vector<float> highest((_maxima.size() + stride - 1) / stride);
+    if (highest.size() < _count) {
+      return leastScore;
+    }
+    for (size_t i = 0; i < _maxima.size(); ++i) {
+      highest[i / stride] = std::max(highest[i / stride], _maxima[i]);
+    }
+    const auto last = highest.begin() + static_cast<ptrdiff_t>(_count) - 1;
+    std::nth_element(highest.begin(), last, highest.end(), std::greater<>());
+    return std::max(*last, leastScore);
+  }
+
   float _cosine(uint32_t page) const {
     const int8_t* const vector = _plan.latent.empty() ? nullptr : _view.pageVector(page);
     if (vector == nullptr) {
@@ -106,95 +147,62 @@ class Search {
     return cosine > 0 ? std::min(cosine, 1.0F) : 0;
   }
 
-  float _score(uint32_t page, float lexical) const {
-    return (1 - _plan.latentWeight) * lexical + _plan.latentWeight * _cosine(page);
+  void _take(size_t place, float lexical) {
+    const uint32_t page = _scope.first + static_cast<uint32_t>(place);
+    const float score = _wordShare * lexical + _meaning * _cosine(page);
+    if (score > 0) {
+      _best.add(rankOfPage(page, _scope), score);
+    }
   }
 
-  // Calls visit(place, its lexical score), which gives the least score that is still of interest,
-  // for those that reach it, `least` at first. False when cancelled.
-  template <typename Visit>
-  bool _forEachPlace(float least, Visit visit) {
-    for (size_t from = 0; from < _lexical.size(); from += stepLength) {
-      if (_cancelled()) {
+  // Takes the pages with a lexical score from `least` to below `end`; `least` rises as better pages
+  // are found. False when cancelled.
+  bool _takeBetween(float least, float end) {
+    using luxscoring::groupLength;
+    float threshold = _best.threshold();
+    for (size_t group = 0; group < _maxima.size(); ++group) {
+      if (group % (stepLength / groupLength) == 0 && _cancelled()) {
         return false;
       }
-      // Most scores do not reach it: whole groups are passed over by comparisons without a branch.
-      for (size_t group = from; group < std::min(_lexical.size(), from + stepLength);
-           group += groupLength) {
-        const float* const scores = _lexical.data() + group;
-        int reached = 0;
-        for (size_t i = 0; i < groupLength; ++i) {
-          reached |= scores[i] >= least ? 1 : 0;
-        }
-        if (reached == 0) {
-          continue;
-        }
-        for (size_t i = 0; i < groupLength; ++i) {
-          if (scores[i] >= least) {
-            least = visit(group + i, scores[i]);
-          }
-        }
+      if (_maxima[group] < least) {
+        continue;
+      }
+      const size_t first = group * groupLength;
+      for (uint32_t bits = luxscoring::scoresWithin(_lexical.data() + first, least, end); bits != 0;
+           bits &= bits - 1) {
+        const size_t place = first + static_cast<size_t>(std::countr_zero(bits));
+        _take(place, _lexical[place]);
+      }
+      if (_best.threshold() != threshold) {
+        threshold = _best.threshold();
+        least = std::max(least, _leastWithinReach());
       }
     }
     return true;
   }
 
-  uint32_t _page(size_t place) const { return _scope.first + static_cast<uint32_t>(place); }
-
-  // The pages that the words alone would choose: they are looked at first, so that few others can
-  // still reach them.
-  bool _takeLexicallyBest() {
-    BestPages chosen(_count, BestFirst{_scope});
-    if (!_forEachPlace(leastScore, [&](size_t place, float lexical) {
-          chosen.add({_page(place), lexical});
-          return std::max(chosen.threshold(), leastScore);
-        })) {
-      return false;
+  bool _takeThoseWithoutWords() {
+    for (size_t place = 0; place < _lexical.size(); ++place) {
+      if (place % stepLength == 0 && _cancelled()) {
+        return false;
+      }
+      if (_lexical[place] == 0) {
+        _take(place, 0);
+      }
     }
-    for (const LUXScoredPage& page : chosen.items()) {
-      _best.add({page.page, _score(page.page, page.score)});
-      _lexical[page.page - _scope.first] = notOfInterest;
-    }
-    _isShort = chosen.items().size() < _count;
-    _best.settle();
     return true;
   }
 
   // What the words must make of a page that comes among the best if its meaning is the query's.
   float _leastWithinReach() const {
-    const float weight = _plan.latentWeight;
-    return std::max((_best.threshold() - weight) / (1 - weight) - roundingReserve, leastScore);
+    return std::max((_best.threshold() - _meaning) / _wordShare - roundingReserve, leastScore);
   }
 
-  bool _takeOthersWithinReach() {
-    if (_isShort || _plan.latent.empty()) {
-      return true;
-    }
-    return _forEachPlace(_leastWithinReach(), [&](size_t place, float lexical) {
-      const uint32_t page = _page(place);
-      _best.add({page, _score(page, lexical)});
-      return _leastWithinReach();
-    });
-  }
-
-  bool _takeThoseWithoutWords() {
-    if (!_isShort || _plan.latent.empty()) {
-      return true;
-    }
-    return _forEachPlace(0, [&](size_t place, float) {
-      const uint32_t page = _page(place);
-      if (const float score = _score(page, 0); score > 0) {
-        _best.add({page, score});
-      }
-      return 0.0F;
-    });
-  }
-
-  static constexpr size_t groupLength = 16;
+  static constexpr float everything = std::numeric_limits<float>::infinity();
   // Of a page that has any word of the query.
   static constexpr float leastScore = std::numeric_limits<float>::min();
-  // Of pages that were looked at, and of those that fill up the last group.
-  static constexpr float notOfInterest = -1;
+  // Of those places that fill up the last group.
+  static constexpr float filling = -1;
   static constexpr float roundingReserve = 1e-6F;
 
   const LUXModelView& _view;
@@ -202,10 +210,12 @@ class Search {
   const LUXPageScope& _scope;
   const LUXIsCancelled& _isCancelled;
   const size_t _count;
-  BestPages _best;
+  // What the cosine and the words count for.
+  const float _meaning;
+  const float _wordShare;
+  LUXBest _best;
   std::vector<float> _lexical;
-  // Fewer pages than wanted share a word with the query.
-  bool _isShort = false;
+  std::vector<float> _maxima;
 };
 
 float stretched(float score, size_t termCount) {
@@ -241,7 +251,9 @@ std::vector<LUXScoredPage> withTitlesFirst(std::span<const uint32_t> titles,
   std::erase_if(pages, [&](const LUXScoredPage& page) {
     return std::binary_search(named.begin(), named.end(), page, before);
   });
-  std::sort(named.begin(), named.end(), BestFirst{scope});
+  std::sort(named.begin(), named.end(), [&](const LUXScoredPage& a, const LUXScoredPage& b) {
+    return rankOfPage(a.page, scope) < rankOfPage(b.page, scope);
+  });
   named.insert(named.end(), pages.begin(), pages.end());
   named.resize(std::min(named.size(), count));
   return named;

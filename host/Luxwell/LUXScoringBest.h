@@ -2,62 +2,75 @@
 #pragma once
 
 #include <algorithm>
+#include <bit>
 #include <cstddef>
-#include <utility>
+#include <cstdint>
+#include <functional>
 #include <vector>
 
-/// Keeps the best `count` of the items that are added, in the order of `Better`, a strict order in
-/// which a higher `score` comes first. It holds up to twice as many and halves them when full, so
-/// that adding one costs the same on average however many are kept.
+/// Keeps the best `count` of the items that are added: those of the highest score, and among equal
+/// scores those of the lowest number. Scores are 0 or above, and numbers. It holds up to twice as
+/// many and halves them when full, so that adding one costs the same on average however many are
+/// kept.
+///
+/// An item is one integer, the score's bits before the number's complement: the bits of floats that
+/// are not negative are in the order of the floats, so that one comparison does for both.
 /// Thread-safety: confined to one thread.
-template <typename Item, typename Better>
 class LUXBest {
  public:
-  LUXBest(size_t count, Better better) : _count(count), _better(std::move(better)) {}
+  struct Item {
+    uint32_t number = 0;
+    float score = 0;
+  };
 
-  void add(const Item& item) {
-    if (item.score < _threshold || _count == 0) {
+  explicit LUXBest(size_t count) : _count(count) {}
+
+  void add(uint32_t number, float score) {
+    if (score < _threshold || _count == 0) {
       return;
     }
-    _items.push_back(item);
-    if (_items.size() >= 2 * _count + reserve) {
-      _cut();
+    // Adding zero makes a positive zero of a negative one.
+    const auto bits = std::bit_cast<uint32_t>(score + 0.0F);
+    _keys.push_back(static_cast<uint64_t>(bits) << 32 | ~number);
+    if (_keys.size() >= 2 * _count + reserve) {
+      settle();
     }
   }
 
   /// What an item must reach to be among the best, 0 while there are fewer than wanted. It may be
   /// out of date, which means too low, until settle().
   float threshold() const noexcept { return _threshold; }
-  void settle() { _cut(); }
 
-  /// The best, in no particular order.
-  const std::vector<Item>& items() {
-    _cut();
-    return _items;
+  void settle() {
+    if (_keys.size() < _count || _count == 0) {
+      return;
+    }
+    const auto last = _keys.begin() + static_cast<std::ptrdiff_t>(_count) - 1;
+    std::nth_element(_keys.begin(), last, _keys.end(), std::greater<>());
+    _threshold = _item(*last).score;
+    _keys.resize(_count);
   }
 
-  /// The best, best first. Nothing is left here.
+  /// The best, best first.
   std::vector<Item> sorted() {
-    _cut();
-    std::sort(_items.begin(), _items.end(), _better);
-    return std::move(_items);
+    settle();
+    std::sort(_keys.begin(), _keys.end(), std::greater<>());
+    std::vector<Item> items;
+    items.reserve(_keys.size());
+    for (const uint64_t key : _keys) {
+      items.push_back(_item(key));
+    }
+    return items;
   }
 
  private:
   static constexpr size_t reserve = 64;
 
-  void _cut() {
-    if (_items.size() < _count || _count == 0) {
-      return;
-    }
-    const auto last = _items.begin() + static_cast<std::ptrdiff_t>(_count) - 1;
-    std::nth_element(_items.begin(), last, _items.end(), _better);
-    _threshold = last->score;
-    _items.erase(last + 1, _items.end());
+  static Item _item(uint64_t key) noexcept {
+    return {~static_cast<uint32_t>(key), std::bit_cast<float>(static_cast<uint32_t>(key >> 32))};
   }
 
   const size_t _count;
-  const Better _better;
   float _threshold = 0;
-  std::vector<Item> _items;
+  std::vector<uint64_t> _keys;
 };
