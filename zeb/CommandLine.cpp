@@ -20,7 +20,8 @@ namespace {
 constexpr char wordMark = '\xFF';
 
 bool isCommand(std::string_view argument) {
-  static constexpr std::string_view commands[] = {"search", "anchor", "books", "index", "scan"};
+  static constexpr std::string_view commands[] = {"search", "suggest", "similar", "anchor",
+                                                  "books",  "models",  "index",   "scan"};
   return std::find(std::begin(commands), std::end(commands), argument) != std::end(commands);
 }
 
@@ -55,7 +56,10 @@ struct Parser {
 
   CLI::App app{"Finds pages in the help books on this computer.", "zeb"};
   CLI::App* search = nullptr;
+  CLI::App* suggest = nullptr;
+  CLI::App* similar = nullptr;
   CLI::App* anchor = nullptr;
+  CLI::App* models = nullptr;
   CLI::App* books = nullptr;
   CLI::App* index = nullptr;
   CLI::App* scan = nullptr;
@@ -63,7 +67,9 @@ struct Parser {
   CommandLine common;
   std::string cacheFolder;
   SearchCommand searchCommand;
+  SuggestCommand suggestCommand;
   AnchorCommand anchorCommand;
+  ModelsCommand modelsCommand;
   BooksCommand booksCommand;
   IndexCommand indexCommand;
   ScanCommand scanCommand;
@@ -72,12 +78,28 @@ struct Parser {
 
  private:
   CLI::App* _addCommand(const std::string& name, const std::string& description);
+  CLI::App* _addSuggestCommand(const std::string& name, const std::string& description);
 };
 
 CLI::App* Parser::_addCommand(const std::string& name, const std::string& description) {
   CLI::App* command = app.add_subcommand(name, description);
   command->fallthrough();
   command->set_help_flag("--help", "Print this and exit");
+  return command;
+}
+
+CLI::App* Parser::_addSuggestCommand(const std::string& name, const std::string& description) {
+  CLI::App* command = _addCommand(name, description);
+  command->add_option("words", suggestCommand.words, "The words")
+      ->required()
+      ->option_text("WORDS...");
+  command->add_option("--book", suggestCommand.books, "Only of this book; may be repeated")
+      ->allow_extra_args(false)
+      ->option_text("ID");
+  command->add_option("--limit", suggestCommand.limit, "Show at most this many (10)")
+      ->check(CLI::Range(size_t{1}, size_t{1'000'000}).description(""))
+      ->option_text("N");
+  command->add_flag("--json", suggestCommand.json, "Write one JSON object");
   return command;
 }
 
@@ -115,7 +137,11 @@ Parser::Parser() {
   search->add_option("--limit", searchCommand.limit, "Show at most this many pages (10)")
       ->check(CLI::Range(size_t{1}, size_t{1'000'000}).description(""))
       ->option_text("N");
+  search->add_flag("--actions", searchCommand.actions, "Pages by meaning alone: things to do");
   search->add_flag("--json", searchCommand.json, "Write one JSON object");
+
+  suggest = _addSuggestCommand("suggest", "Complete what is half typed");
+  similar = _addSuggestCommand("similar", "Find other searches that lead to such pages");
 
   anchor = _addCommand("anchor", "Find the pages that carry an anchor");
   anchor->add_option("name", anchorCommand.name, "The anchor, exactly as written")
@@ -128,6 +154,9 @@ Parser::Parser() {
 
   books = _addCommand("books", "List the books that can be searched");
   books->add_flag("--json", booksCommand.json, "Write one JSON object");
+
+  models = _addCommand("models", "List the language models behind search by meaning");
+  models->add_flag("--json", modelsCommand.json, "Write one JSON object");
 
   index = _addCommand("index", "Index folders and make them books");
   index->add_option("folders", indexCommand.folders, "Folders of help pages")
@@ -187,6 +216,14 @@ std::optional<CommandLine> parseCommandLine(const std::vector<std::string>& argu
     unmark(parser.searchCommand.words);
     unmark(parser.searchCommand.books);
     line.command = parser.searchCommand;
+  } else if (parser.suggest->parsed() || parser.similar->parsed()) {
+    using Kind = SuggestCommand::Kind;
+    parser.suggestCommand.kind = parser.suggest->parsed() ? Kind::completions : Kind::similar;
+    unmark(parser.suggestCommand.words);
+    unmark(parser.suggestCommand.books);
+    line.command = parser.suggestCommand;
+  } else if (parser.models->parsed()) {
+    line.command = parser.modelsCommand;
   } else if (parser.anchor->parsed()) {
     parser.anchorCommand.name = unmarked(parser.anchorCommand.name);
     unmark(parser.anchorCommand.books);

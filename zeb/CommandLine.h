@@ -34,6 +34,22 @@ struct SearchCommand {
   std::vector<std::string> books;
   size_t limit = 10;
   bool json = false;
+  /// Pages by meaning alone, as for things to do.
+  bool actions = false;
+};
+
+/// Completions of a text, or searches like the words.
+struct SuggestCommand {
+  enum class Kind { completions, similar };
+  Kind kind = Kind::completions;
+  std::vector<std::string> words;
+  std::vector<std::string> books;
+  size_t limit = 10;
+  bool json = false;
+};
+
+struct ModelsCommand {
+  bool json = false;
 };
 
 struct AnchorCommand {
@@ -63,7 +79,9 @@ struct ScanCommand {
 };
 
 struct CommandLine {
-  std::variant<SearchCommand, AnchorCommand, BooksCommand, IndexCommand, ScanCommand> command;
+  std::variant<SearchCommand, SuggestCommand, AnchorCommand, BooksCommand, ModelsCommand,
+               IndexCommand, ScanCommand>
+      command;
   ColorMode color = ColorMode::automatic;
   /// The caches folder, for indexes and the catalogue, when the user names one.
   std::optional<std::string> cacheFolder;

@@ -19,6 +19,7 @@
 #include "zeb/Catalogue.h"
 #include "zeb/HelpSearch.h"
 #include "zeb/Indexing.h"
+#include "zeb/Models.h"
 #include "zeb/Output.h"
 #include "zeb/Paths.h"
 #include "zeb/Scan.h"
@@ -44,7 +45,9 @@ class Session {
         _verbosity(line.verbosity) {}
 
   ExitCode operator()(const SearchCommand& command);
+  ExitCode operator()(const SuggestCommand& command);
   ExitCode operator()(const AnchorCommand& command);
+  ExitCode operator()(const ModelsCommand& command);
   ExitCode operator()(const BooksCommand& command);
   ExitCode operator()(const IndexCommand& command);
   ExitCode operator()(const ScanCommand& command) {
@@ -52,14 +55,16 @@ class Session {
   }
 
  private:
-  using Question = std::function<std::optional<Answer>(HelpSearch& search)>;
+  /// Asks the search and shows what it says; absent when the search broke off, else whether
+  /// anything was found.
+  using Question = std::function<std::optional<bool>(HelpSearch& search)>;
 
-  ExitCode _answer(const std::string& asked, const std::vector<std::string>& bookIDs, bool json,
-                   const Question& question);
+  ExitCode _ask(const std::vector<std::string>& bookIDs, const Question& question);
   bool _knowsBooks(const std::vector<CatalogueEntry>& entries,
                    const std::vector<std::string>& bookIDs);
   void _makeMissingIndexes(HelpSearch& search, const std::vector<std::string>& bookIDs);
-  void _show(const std::string& asked, const Answer& answer, bool json);
+  std::optional<bool> _show(const std::string& asked, const std::optional<Answer>& answer,
+                            bool json);
 
   Console& _console;
   const Catalogue _catalogue;
@@ -117,18 +122,22 @@ void Session::_makeMissingIndexes(HelpSearch& search, const std::vector<std::str
   }
 }
 
-void Session::_show(const std::string& asked, const Answer& answer, bool json) {
+std::optional<bool> Session::_show(const std::string& asked, const std::optional<Answer>& answer,
+                                   bool json) {
+  if (!answer) {
+    return std::nullopt;
+  }
   if (json) {
-    printAnswerAsJSON(asked, answer, _console);
-  } else if (answer.pages.empty()) {
+    printAnswerAsJSON(asked, *answer, _console);
+  } else if (answer->pages.empty()) {
     _console.note(fmt::format("nothing found for {}", asked));
   } else {
-    printAnswer(answer, _console);
+    printAnswer(*answer, _console);
   }
+  return !answer->pages.empty();
 }
 
-ExitCode Session::_answer(const std::string& asked, const std::vector<std::string>& bookIDs,
-                          bool json, const Question& question) {
+ExitCode Session::_ask(const std::vector<std::string>& bookIDs, const Question& question) {
   const std::vector<CatalogueEntry> entries = _catalogue.entries();
   if (!_knowsBooks(entries, bookIDs)) {
     return ExitCode::failure;
@@ -140,33 +149,72 @@ ExitCode Session::_answer(const std::string& asked, const std::vector<std::strin
     return ExitCode::failure;
   }
   _makeMissingIndexes(*search, bookIDs);
-  const std::optional<Answer> answer = question(*search);
-  if (!answer) {
+  const std::optional<bool> found = question(*search);
+  if (!found) {
     _console.error("the search broke off; --verbose says more");
     return ExitCode::failure;
   }
-  _show(asked, *answer, json);
   if (_waiting.waits && _console.flush()) {
     search->settle(lingering);
   }
-  return answer->pages.empty() ? ExitCode::nothingFound : ExitCode::success;
+  return *found ? ExitCode::success : ExitCode::nothingFound;
+}
+
+std::string joined(const std::vector<std::string>& words) {
+  std::string text;
+  for (const std::string& word : words) {
+    text += text.empty() ? "" : " ";
+    text += platform::stringByRepairingUTF8(word);
+  }
+  return text;
 }
 
 ExitCode Session::operator()(const SearchCommand& command) {
-  std::string words;
-  for (const std::string& word : command.words) {
-    words += words.empty() ? "" : " ";
-    words += platform::stringByRepairingUTF8(word);
-  }
-  return _answer(words, command.books, command.json, [&](HelpSearch& search) {
-    return search.search(words, command.books, command.limit);
+  const std::string words = joined(command.words);
+  return _ask(command.books, [&](HelpSearch& search) {
+    return _show(words,
+                 command.actions ? search.searchActions(words, command.books, command.limit)
+                                 : search.search(words, command.books, command.limit),
+                 command.json);
+  });
+}
+
+ExitCode Session::operator()(const SuggestCommand& command) {
+  const std::string words = joined(command.words);
+  return _ask(command.books, [&](HelpSearch& search) -> std::optional<bool> {
+    const auto suggestions = command.kind == SuggestCommand::Kind::similar
+                                 ? search.similarSearches(words, command.books, command.limit)
+                                 : search.suggestions(words, command.books, command.limit);
+    if (!suggestions) {
+      return std::nullopt;
+    }
+    if (command.json) {
+      printSuggestionsAsJSON(words, *suggestions, _console);
+    } else if (suggestions->empty()) {
+      _console.note(fmt::format("nothing found for {}", words));
+    } else {
+      printSuggestions(*suggestions, _console);
+    }
+    return !suggestions->empty();
   });
 }
 
 ExitCode Session::operator()(const AnchorCommand& command) {
-  return _answer(command.name, command.books, command.json, [&](HelpSearch& search) {
-    return search.lookUpAnchor(command.name, command.books);
+  return _ask(command.books, [&](HelpSearch& search) {
+    return _show(command.name, search.lookUpAnchor(command.name, command.books), command.json);
   });
+}
+
+ExitCode Session::operator()(const ModelsCommand& command) {
+  const std::vector<ListedModel> models = savedModels();
+  if (command.json) {
+    printModelsAsJSON(models, _console);
+  } else if (models.empty()) {
+    _console.note("no model has been built yet; 'zeb scan' has them built");
+  } else {
+    printModels(models, _console);
+  }
+  return models.empty() ? ExitCode::nothingFound : ExitCode::success;
 }
 
 ExitCode Session::operator()(const BooksCommand& command) {

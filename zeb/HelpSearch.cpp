@@ -12,6 +12,7 @@
 #include "platform/Files.h"
 #include "platform/Processes.h"
 #include "platform/RunLoop.h"
+#include "platform/Strings.h"
 #include "platform/ThreadSafety.h"
 #include "platform/URL.h"
 #include "zeb/BookFolder.h"
@@ -23,8 +24,9 @@ namespace {
 
 using zebd::Host;
 
-/// Work that follows from work does so within a few milliseconds; this is ample.
-constexpr platform::Seconds quietSpan{0.2};
+/// Language models follow a change of indexes after a second of quiet; all other work that follows
+/// from work does so within milliseconds.
+constexpr platform::Seconds quietSpan{1.3};
 constexpr platform::Seconds removalLimit{10};
 /// Searches bound their own waits.
 constexpr platform::Seconds forever = platform::Seconds::max();
@@ -43,15 +45,23 @@ bool anIndexingToolIsRunning() {
                      [](const auto& process) { return process.commandName == "bvmake"; });
 }
 
-/// Keeps the records of one search, and wakes the main loop at its end.
+using Records = std::vector<std::shared_ptr<ZEBResult>>;
+
+/// What one search delivered.
+struct Delivery {
+  Records records;
+  std::vector<std::string> texts;
+};
+
+/// Keeps what one search delivers, and wakes the main loop at its end.
 class Collector : public zebd::SearchReceiver {
  public:
-  using Records = std::vector<std::shared_ptr<ZEBResult>>;
-
   void foundResults(const ZEBResultBatch& batch) override {
+    const platform::MutexLock lock(_mutex);
     if (const auto* records = std::get_if<Records>(&batch)) {
-      const platform::MutexLock lock(_mutex);
-      _records.insert(_records.end(), records->begin(), records->end());
+      _delivery.records.insert(_delivery.records.end(), records->begin(), records->end());
+    } else if (const auto* texts = std::get_if<std::vector<std::string>>(&batch)) {
+      _delivery.texts.insert(_delivery.texts.end(), texts->begin(), texts->end());
     }
   }
   void searchEnded(bool finished) override {
@@ -68,17 +78,26 @@ class Collector : public zebd::SearchReceiver {
     return _ended;
   }
   /// Absent when the search broke off.
-  std::optional<Records> records() const {
+  std::optional<Delivery> delivery() const {
     const platform::MutexLock lock(_mutex);
-    return _finished ? std::optional(_records) : std::nullopt;
+    return _finished ? std::optional(_delivery) : std::nullopt;
   }
 
  private:
   mutable platform::Mutex _mutex;
-  Records _records GUARDED_BY(_mutex);
+  Delivery _delivery GUARDED_BY(_mutex);
   bool _ended GUARDED_BY(_mutex) = false;
   bool _finished GUARDED_BY(_mutex) = false;
 };
+
+std::shared_ptr<ZEBQuery> makeQuery(std::string_view text, const std::vector<std::string>& bookIDs,
+                                    std::vector<std::string> kinds, size_t limit) {
+  auto query = ZEBQuery::initWithQueryString(std::string(text));
+  query->setScope(bookIDs);
+  query->setResultTypes(std::move(kinds));
+  query->setLimit(limit);
+  return query;
+}
 
 /// Which books the plug-in has reported since it was last asked.
 class Reports {
@@ -123,17 +142,22 @@ struct HelpSearch::Implementation {
     return page;
   }
 
-  std::optional<Answer> answer(const std::shared_ptr<ZEBQuery>& query, size_t limit) {
+  /// Absent when the search broke off.
+  std::optional<Delivery> deliveryOfQuery(const std::shared_ptr<ZEBQuery>& query) {
     const auto collector = std::make_shared<Collector>();
     host->startSearch(query, collector);
     Host::runMainLoopUntil([&] { return collector->ended(); }, forever);
-    const auto records = collector->records();
-    if (!records) {
+    return collector->delivery();
+  }
+
+  std::optional<Answer> answer(const std::shared_ptr<ZEBQuery>& query, size_t limit) {
+    const std::optional<Delivery> delivery = deliveryOfQuery(query);
+    if (!delivery) {
       return std::nullopt;
     }
     Answer answer;
     std::set<std::string> shown;
-    for (const auto& record : *records) {
+    for (const auto& record : delivery->records) {
       FoundPage page = pageOfResult(*record);
       // A book may name one page for the words in several of its lists.
       if (shown.insert(page.url).second && ++answer.count <= limit) {
@@ -141,6 +165,30 @@ struct HelpSearch::Implementation {
       }
     }
     return answer;
+  }
+
+  std::optional<std::vector<Suggestion>> suggestionsOfQuery(const std::shared_ptr<ZEBQuery>& query,
+                                                            const std::string& kind, size_t limit) {
+    const std::optional<Delivery> delivery = deliveryOfQuery(query);
+    if (!delivery) {
+      return std::nullopt;
+    }
+    std::vector<Suggestion> suggestions;
+    std::set<std::string> shown;
+    const auto add = [&](const std::string& text, double relevance) {
+      if (suggestions.size() < limit && shown.insert(platform::lowercaseString(text)).second) {
+        suggestions.push_back({text, relevance});
+      }
+    };
+    for (const std::string& text : delivery->texts) {
+      add(text, 0);
+    }
+    for (const auto& record : delivery->records) {
+      if (record->type() == kind) {
+        add(record->title().value_or(std::string()), record->relevance().doubleValue());
+      }
+    }
+    return suggestions;
   }
 };
 
@@ -251,18 +299,33 @@ bool HelpSearch::removeIndexes(const std::vector<std::string>& bookIDs) {
 
 std::optional<Answer> HelpSearch::search(std::string_view words,
                                          const std::vector<std::string>& bookIDs, size_t limit) {
-  const auto query = ZEBQuery::initWithQueryString(std::string(words));
-  query->setScope(bookIDs);
-  query->setResultTypes({ZEBHelpArticleResult});
-  query->setLimit(limit);
-  return _implementation->answer(query, limit);
+  return _implementation->answer(makeQuery(words, bookIDs, {ZEBHelpArticleResult}, limit), limit);
+}
+
+std::optional<Answer> HelpSearch::searchActions(std::string_view words,
+                                                const std::vector<std::string>& bookIDs,
+                                                size_t limit) {
+  return _implementation->answer(
+      makeQuery(words, bookIDs, {ZEBHelpArticleResult, ZEBHelpActionResult}, limit), limit);
+}
+
+std::optional<std::vector<Suggestion>> HelpSearch::suggestions(
+    std::string_view text, const std::vector<std::string>& bookIDs, size_t limit) {
+  return _implementation->suggestionsOfQuery(
+      makeQuery(text, bookIDs, {ZEBHelpSuggestionResult}, limit), ZEBHelpSuggestionResult, limit);
+}
+
+std::optional<std::vector<Suggestion>> HelpSearch::similarSearches(
+    std::string_view words, const std::vector<std::string>& bookIDs, size_t limit) {
+  // With articles, whose titles are then not offered again.
+  return _implementation->suggestionsOfQuery(
+      makeQuery(words, bookIDs, {ZEBHelpArticleResult, ZEBHelpSimilarSuggestionResult}, limit),
+      ZEBHelpSimilarSuggestionResult, limit);
 }
 
 std::optional<Answer> HelpSearch::lookUpAnchor(std::string_view name,
                                                const std::vector<std::string>& bookIDs) {
-  const auto query = ZEBQuery::initWithQueryString(std::string(name));
-  query->setScope(bookIDs);
-  query->setResultTypes({ZEBHelpArticleResult});
+  const auto query = makeQuery(name, bookIDs, {ZEBHelpArticleResult}, 0);
   query->setOptions(platform::Value::Dictionary{{ZEBQueryAnchorSearchOptionKey, true}});
   return _implementation->answer(query, SIZE_MAX);
 }

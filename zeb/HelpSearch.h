@@ -28,6 +28,14 @@ struct FoundPage {
   double relevance = 0;
 };
 
+/// Something to search for.
+struct Suggestion {
+  std::string text;
+  /// Orders the suggestions of one answer, higher first; 0 for those of a book's own list, which
+  /// come first, in the order of the alphabet.
+  double relevance = 0;
+};
+
 struct Answer {
   /// Best first, no more than were asked for.
   std::vector<FoundPage> pages;
@@ -80,6 +88,21 @@ class HelpSearch {
   /// The pages that carry the anchor of exactly this name. Absent when the search broke off.
   std::optional<Answer> lookUpAnchor(std::string_view name,
                                      const std::vector<std::string>& bookIDs);
+
+  /// Pages by meaning alone, many of them: for those who look for things to do.
+  std::optional<Answer> searchActions(std::string_view words,
+                                      const std::vector<std::string>& bookIDs, size_t limit);
+
+  /// What the text, half typed, may become. Absent when the search broke off.
+  std::optional<std::vector<Suggestion>> suggestions(std::string_view text,
+                                                     const std::vector<std::string>& bookIDs,
+                                                     size_t limit);
+
+  /// Other searches that find pages like those that the words find. Absent when the search broke
+  /// off.
+  std::optional<std::vector<Suggestion>> similarSearches(std::string_view words,
+                                                         const std::vector<std::string>& bookIDs,
+                                                         size_t limit);
 
   /// Lets the plug-in come to an end with what it is doing, for `limit` at most.
   void settle(platform::Seconds limit);

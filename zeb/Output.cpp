@@ -1,5 +1,6 @@
 #include "zeb/Output.h"
 
+#include <fmt/chrono.h>
 #include <fmt/format.h>
 
 #include <algorithm>
@@ -67,6 +68,68 @@ void printAnswerAsJSON(std::string_view query, const Answer& answer, Console& co
   object["query"] = text(query);
   object["count"] = answer.count;
   object["results"] = std::move(results);
+  printJSON(object, console);
+}
+
+void printSuggestions(const std::vector<Suggestion>& suggestions, Console& console) {
+  for (const Suggestion& suggestion : suggestions) {
+    console.out() << singleLine(suggestion.text) << '\n';
+  }
+}
+
+void printSuggestionsAsJSON(std::string_view query, const std::vector<Suggestion>& suggestions,
+                            Console& console) {
+  JSON list = JSON::array();
+  for (const Suggestion& suggestion : suggestions) {
+    JSON entry;
+    entry["text"] = text(suggestion.text);
+    entry["relevance"] = suggestion.relevance;
+    list.push_back(std::move(entry));
+  }
+  JSON object;
+  object["query"] = text(query);
+  object["count"] = suggestions.size();
+  object["suggestions"] = std::move(list);
+  printJSON(object, console);
+}
+
+void printModels(const std::vector<ListedModel>& models, Console& console) {
+  for (const ListedModel& model : models) {
+    const std::string built =
+        model.built ? fmt::format("{:%Y-%m-%d %H:%M}", fmt::localtime(*model.built)) : "";
+    console.out() << console.styled(Style::title, singleLine(model.group)) << "  "
+                  << singleLine(model.language)
+                  << fmt::format("  {} books  {} pages  {:.1f} MB  {}", model.books.size(),
+                                 model.pageCount, static_cast<double>(model.bytes) / 1e6, built);
+    if (model.needsBuild) {
+      console.out() << "  " << console.styled(Style::error, "needs to be built");
+    }
+    console.out() << '\n';
+  }
+}
+
+void printModelsAsJSON(const std::vector<ListedModel>& models, Console& console) {
+  JSON list = JSON::array();
+  for (const ListedModel& model : models) {
+    JSON books = JSON::array();
+    for (const std::string& bookID : model.books) {
+      books.push_back(text(bookID));
+    }
+    JSON entry;
+    entry["group"] = text(model.group);
+    entry["language"] = text(model.language);
+    entry["books"] = std::move(books);
+    entry["pages"] = model.pageCount;
+    entry["bytes"] = model.bytes;
+    if (model.built) {
+      entry["built"] = std::chrono::system_clock::to_time_t(*model.built);
+    }
+    entry["needsBuild"] = model.needsBuild;
+    list.push_back(std::move(entry));
+  }
+  JSON object;
+  object["count"] = models.size();
+  object["models"] = std::move(list);
   printJSON(object, console);
 }
 

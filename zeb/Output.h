@@ -10,6 +10,7 @@
 #include "zeb/Catalogue.h"
 #include "zeb/Console.h"
 #include "zeb/HelpSearch.h"
+#include "zeb/Models.h"
 
 namespace zeb {
 
@@ -20,6 +21,20 @@ void printAnswer(const Answer& answer, Console& console);
 /// One JSON object: "query", "count", "results" (each with "title", "book", "bookTitle",
 /// "abstract" where there is one, "url", "relevance").
 void printAnswerAsJSON(std::string_view query, const Answer& answer, Console& console);
+
+/// One suggestion a line.
+void printSuggestions(const std::vector<Suggestion>& suggestions, Console& console);
+
+/// One JSON object: "query", "count", "suggestions" (each with "text", "relevance").
+void printSuggestionsAsJSON(std::string_view query, const std::vector<Suggestion>& suggestions,
+                            Console& console);
+
+/// One line a model: group, language, numbers of books and pages, size, when it was built.
+void printModels(const std::vector<ListedModel>& models, Console& console);
+
+/// One JSON object: "count", "models" (each with "group", "language", "books", "pages", "bytes",
+/// "built" in seconds since 1970, "needsBuild").
+void printModelsAsJSON(const std::vector<ListedModel>& models, Console& console);
 
 /// A book as it is listed.
 struct ListedBook {
