@@ -57,17 +57,19 @@ std::optional<PageAddress> addressOfPage(const ZEBHelpBook& book, const std::str
   if (book.usesExternalViewer()) {
     address.usesExternalViewer = true;
     const auto remoteURL = book.remoteURL();
-    const std::string base = remoteURL ? remoteURL->absoluteString() : std::string();
-    location = ZEBStringWithFormat(base.ends_with('/') ? "%@%@" : "%@/%@",
-                                   remoteURL ? std::optional(base) : std::nullopt, path);
+    if (!remoteURL) {
+      return std::nullopt;
+    }
+    const std::string base = remoteURL->absoluteString();
+    location = base.ends_with('/') ? base + path : base + "/" + path;
   } else {
     const std::vector<std::string> indexPaths = book.indexPaths();
     const std::optional<std::string> file =
         indexPaths.empty() ? book.accessPagePath() : std::optional(indexPaths.front());
-    location = ZEBStringWithFormat(
-        "file://%@/%@",
-        file ? std::optional(platform::stringByDeletingLastPathComponent(*file)) : std::nullopt,
-        path);
+    if (!file) {
+      return std::nullopt;
+    }
+    location = "file://" + platform::stringByDeletingLastPathComponent(*file) + "/" + path;
   }
   const auto url = URLByEscapingString(location);
   if (!url) {
@@ -215,9 +217,11 @@ void LUXSearchController::_beginQuery(const std::string& queryID) {
   _currentQueryID = queryID;
 }
 
-std::map<std::string, Results> LUXSearchController::_answers() const {
+std::map<std::string, Results> LUXSearchController::_answersOfQuery(
+    const std::string& queryID) const {
   const platform::MonitorLock lock(_monitor);
-  return _searchResults;
+  // The answers to another query are no answers to this one, and its records are not to be touched.
+  return _currentQueryID == queryID ? _searchResults : std::map<std::string, Results>();
 }
 
 size_t LUXSearchController::_answerCount() const {

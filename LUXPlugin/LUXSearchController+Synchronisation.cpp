@@ -58,7 +58,7 @@ void LUXSearchController::indexDidChange(const std::shared_ptr<ZEBIndex>& index,
   }
   const platform::MonitorLock lock(_pendingMonitor);
   const auto stored = _pendingIndexEventsTable.find(*bookID);
-  if (stored != _pendingIndexEventsTable.end() && didChange <= stored->second) {
+  if (didChange <= (stored == _pendingIndexEventsTable.end() ? 0 : stored->second)) {
     return;
   }
   _pendingIndexEventsTable[*bookID] = didChange;

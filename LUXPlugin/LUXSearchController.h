@@ -39,10 +39,10 @@ class OperationQueue;
 /// The controller observes the shelf, and the shelf keeps its observers: the two keep each other
 /// alive for the life of the process, as a plug-in is never unloaded.
 ///
-/// Lock order: _syncModelsLock, the pending table's monitor, the monitor of the semantic indexes.
-/// The controller's monitor, the registry's monitor and the shelf's monitor are never held with one
-/// of these, nor with each other.
-/// Thread-safety: internally synchronised.
+/// Lock order: _syncModelsLock or the shelf's monitor (a removal is told under it), the pending
+/// table's monitor, the monitor of the semantic indexes. The shelf is never asked under one of
+/// these but _syncModelsLock. The controller's monitor and the registry's are never held with
+/// another. Thread-safety: internally synchronised.
 class LUXSearchController : public ZEBIndexshelfObserver,
                             public LUXQueryDelegate,
                             public std::enable_shared_from_this<LUXSearchController> {
@@ -172,7 +172,8 @@ class LUXSearchController : public ZEBIndexshelfObserver,
   friend class LUXSearchRun;
 
   void _beginQuery(const std::string& queryID);
-  std::map<std::string, Results> _answers() const;
+  /// None once another query has begun.
+  std::map<std::string, Results> _answersOfQuery(const std::string& queryID) const;
   size_t _answerCount() const;
 
   Results _resultsOfHits(const LUXQuery& query, const std::vector<std::shared_ptr<LUXHit>>& hits);

@@ -250,7 +250,7 @@ void LUXSearchRun::_finish() {
 LUXSearchRun::Results LUXSearchRun::_mergedAnswers(
     const std::vector<std::string>& ignoringItems,
     std::set<std::string>* passingBackSearchedHelpbookIDs) const {
-  std::map<std::string, Results> answers = _controller->_answers();
+  std::map<std::string, Results> answers = _controller->_answersOfQuery(_query->queryID());
   if (passingBackSearchedHelpbookIDs != nullptr) {
     for (const auto& group : _bookIDsOfGroups) {
       passingBackSearchedHelpbookIDs->insert(group.second.begin(), group.second.end());

@@ -12,8 +12,9 @@
 #include "LUXPlugin/LUXSearchController.h"
 
 /// Finds the groups and the language of a query, gets hold of their models, starts a query in each
-/// on a thread of its own, waits for the answers and merges them. What it holds and has started is
-/// given back and cancelled by finish(). Thread-safety: confined to one thread.
+/// on a thread of its own, waits for the answers and merges them. At the end, models are handed
+/// back and builds that were started and have not finished are cancelled. Thread-safety: confined
+/// to one thread.
 class LUXSearchRun {
  public:
   using Results = LUXSearchController::Results;
