@@ -114,6 +114,41 @@ std::string lowercaseString(std::string_view string) {
   return lowered;
 }
 
+namespace {
+
+size_t columnsOfCharacter(UChar32 character) {
+  const int category = u_charType(character);
+  if (category == U_NON_SPACING_MARK || category == U_ENCLOSING_MARK || category == U_FORMAT_CHAR) {
+    return 0;
+  }
+  const int width = u_getIntPropertyValue(character, UCHAR_EAST_ASIAN_WIDTH);
+  return width == U_EA_FULLWIDTH || width == U_EA_WIDE ? 2 : 1;
+}
+
+}  // namespace
+
+std::string stringByTruncatingToColumns(std::string_view string, size_t columns) {
+  const icu::UnicodeString text = fromUTF8(string);
+  size_t used = 0;
+  // Where the text would be cut if it turns out not to fit: one column is the ellipsis's.
+  int32_t cut = 0;
+  for (int32_t at = 0; at < text.length(); at = text.moveIndex32(at, 1)) {
+    const size_t width = columnsOfCharacter(text.char32At(at));
+    if (used + width <= columns - std::min<size_t>(columns, 1)) {
+      cut = text.moveIndex32(at, 1);
+    }
+    used += width;
+  }
+  std::string result;
+  if (used <= columns) {
+    text.toUTF8String(result);
+  } else if (columns > 0) {
+    text.tempSubString(0, cut).toUTF8String(result);
+    result += "\u2026";
+  }
+  return result;
+}
+
 int caseInsensitiveCompare(std::string_view a, std::string_view b) {
   return fromUTF8(a).caseCompare(fromUTF8(b), U_FOLD_CASE_DEFAULT);
 }

@@ -32,6 +32,11 @@ int localizedCaseInsensitiveCompare(std::string_view a, std::string_view b,
 /// "1.2"), all else by bytes.
 int numericCompare(std::string_view a, std::string_view b);
 
+/// As much of the beginning of the string as a terminal shows in `columns`: wide characters take
+/// two columns, marks that sit on others none. A string that does not fit ends in "…". Meant for
+/// single lines without control characters.
+std::string stringByTruncatingToColumns(std::string_view string, size_t columns);
+
 /// Whether the bytes are well-formed UTF-8.
 bool isValidUTF8(std::string_view bytes) noexcept;
 

@@ -128,8 +128,7 @@ Parser::Parser() {
       "3 failure.");
 
   search = _addCommand("search", "Find pages by words or the beginnings of words");
-  search->add_option("words", searchCommand.words, "What to look for")
-      ->required()
+  search->add_option("words", searchCommand.words, "What to look for; asked for without any")
       ->option_text("WORDS...");
   search->add_option("--book", searchCommand.books, "Only in this book; may be repeated")
       ->allow_extra_args(false)

@@ -29,6 +29,7 @@ struct Waiting {
 };
 
 struct SearchCommand {
+  /// None: the user is asked, on a terminal.
   std::vector<std::string> words;
   /// Only these books; all where there is none.
   std::vector<std::string> books;

@@ -1,6 +1,7 @@
 #include "zeb/Commands.h"
 
 #include <fmt/format.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <exception>
@@ -15,10 +16,12 @@
 #include "platform/Log.h"
 #include "platform/Processes.h"
 #include "platform/Strings.h"
+#include "platform/WorkerThreads.h"
 #include "zeb/BookFolder.h"
 #include "zeb/Catalogue.h"
 #include "zeb/HelpSearch.h"
 #include "zeb/Indexing.h"
+#include "zeb/Interactive.h"
 #include "zeb/Models.h"
 #include "zeb/Output.h"
 #include "zeb/Paths.h"
@@ -59,6 +62,7 @@ class Session {
   /// anything was found.
   using Question = std::function<std::optional<bool>(HelpSearch& search)>;
 
+  ExitCode _searchInteractively(const SearchCommand& command);
   ExitCode _ask(const std::vector<std::string>& bookIDs, const Question& question);
   bool _knowsBooks(const std::vector<CatalogueEntry>& entries,
                    const std::vector<std::string>& bookIDs);
@@ -169,7 +173,28 @@ std::string joined(const std::vector<std::string>& words) {
   return text;
 }
 
+ExitCode Session::_searchInteractively(const SearchCommand& command) {
+  if (!_console.isInteractive()) {
+    _console.error("search: words are needed where there is no terminal to type them");
+    return ExitCode::usage;
+  }
+  return _ask(command.books, [&](HelpSearch& search) -> std::optional<bool> {
+    Terminal terminal(STDIN_FILENO, STDOUT_FILENO);
+    searchInteractively(search, command.books, terminal, [](const std::string& url) {
+      // The handler may take its time, or not be there; neither is to stop the typing.
+      platform::startNamedThread("open-page", [url] {
+        platform::Environment::current()->processLauncher->launchAndWait("/usr/bin/xdg-open",
+                                                                         {url});
+      });
+    });
+    return true;
+  });
+}
+
 ExitCode Session::operator()(const SearchCommand& command) {
+  if (command.words.empty()) {
+    return _searchInteractively(command);
+  }
   const std::string words = joined(command.words);
   return _ask(command.books, [&](HelpSearch& search) {
     return _show(words,

@@ -28,9 +28,13 @@ class Console {
   Console(std::ostream& out, std::ostream& err) : _out(out), _err(err) {}
 
   void setOutIsTerminal(bool isTerminal) { _outIsTerminal = isTerminal; }
+  void setInIsTerminal(bool isTerminal) { _inIsTerminal = isTerminal; }
   void setErrIsTerminal(bool isTerminal) { _errIsTerminal = isTerminal; }
   void setColorsUnwanted(bool unwanted) { _colorsUnwanted = unwanted; }
   void setColorMode(ColorMode mode) { _colorMode = mode; }
+
+  /// Whether somebody can type and see what is answered.
+  bool isInteractive() const { return _inIsTerminal && _outIsTerminal; }
 
   std::ostream& out() { return _out; }
   std::ostream& err() { return _err; }
@@ -58,6 +62,7 @@ class Console {
 
   std::ostream& _out;
   std::ostream& _err;
+  bool _inIsTerminal = false;
   bool _outIsTerminal = false;
   bool _errIsTerminal = false;
   bool _colorsUnwanted = false;

@@ -24,12 +24,17 @@ namespace {
 
 using zebd::Host;
 
-/// Language models follow a change of indexes after a second of quiet; all other work that follows
-/// from work does so within milliseconds.
-constexpr platform::Seconds quietSpan{1.3};
+/// Work that follows from work does so within a few milliseconds; this is ample.
+constexpr platform::Seconds quietSpan{0.2};
+/// But language models follow a change of indexes after a second in which nothing else changes.
+constexpr platform::Seconds modelSpan{1.2};
 constexpr platform::Seconds removalLimit{10};
 /// Searches bound their own waits.
 constexpr platform::Seconds forever = platform::Seconds::max();
+
+platform::Clock::Instant elapsedNow() {
+  return platform::Environment::current()->clock->elapsed();
+}
 
 std::string nameOfPage(const std::string& url) {
   const std::optional<platform::URL> parsed = platform::URL::URLWithString(url);
@@ -77,6 +82,10 @@ class Collector : public zebd::SearchReceiver {
     const platform::MutexLock lock(_mutex);
     return _ended;
   }
+  Delivery deliverySoFar() const {
+    const platform::MutexLock lock(_mutex);
+    return _delivery;
+  }
   /// Absent when the search broke off.
   std::optional<Delivery> delivery() const {
     const platform::MutexLock lock(_mutex);
@@ -103,8 +112,16 @@ std::shared_ptr<ZEBQuery> makeQuery(std::string_view text, const std::vector<std
 class Reports {
  public:
   void add(const std::string& bookID) {
+    const platform::Clock::Instant now = elapsedNow();
     const platform::MutexLock lock(_mutex);
     _bookIDs.insert(bookID);
+    _last = now;
+  }
+  /// Whether no report has come for `span`.
+  bool areQuietFor(platform::Seconds span) const {
+    const platform::Clock::Instant now = elapsedNow();
+    const platform::MutexLock lock(_mutex);
+    return !_last || now - *_last >= span;
   }
   std::set<std::string> take() {
     const platform::MutexLock lock(_mutex);
@@ -112,8 +129,9 @@ class Reports {
   }
 
  private:
-  platform::Mutex _mutex;
+  mutable platform::Mutex _mutex;
   std::set<std::string> _bookIDs GUARDED_BY(_mutex);
+  std::optional<platform::Clock::Instant> _last GUARDED_BY(_mutex);
 };
 
 }  // namespace
@@ -156,41 +174,91 @@ struct HelpSearch::Implementation {
       return std::nullopt;
     }
     Answer answer;
-    std::set<std::string> shown;
-    for (const auto& record : delivery->records) {
-      FoundPage page = pageOfResult(*record);
-      // A book may name one page for the words in several of its lists.
-      if (shown.insert(page.url).second && ++answer.count <= limit) {
-        answer.pages.push_back(std::move(page));
-      }
+    answer.pages = pagesOfRecords(delivery->records);
+    answer.count = answer.pages.size();
+    if (answer.pages.size() > limit) {
+      answer.pages.resize(limit);
     }
     return answer;
   }
 
-  std::optional<std::vector<Suggestion>> suggestionsOfQuery(const std::shared_ptr<ZEBQuery>& query,
-                                                            const std::string& kind, size_t limit) {
-    const std::optional<Delivery> delivery = deliveryOfQuery(query);
-    if (!delivery) {
-      return std::nullopt;
-    }
-    std::vector<Suggestion> suggestions;
-    std::set<std::string> shown;
-    const auto add = [&](const std::string& text, double relevance) {
-      if (suggestions.size() < limit && shown.insert(platform::lowercaseString(text)).second) {
-        suggestions.push_back({text, relevance});
-      }
-    };
-    for (const std::string& text : delivery->texts) {
-      add(text, 0);
-    }
-    for (const auto& record : delivery->records) {
-      if (record->type() == kind) {
-        add(record->title().value_or(std::string()), record->relevance().doubleValue());
-      }
-    }
-    return suggestions;
-  }
+  std::vector<FoundPage> pagesOfRecords(const Records& records) const;
 };
+
+std::vector<FoundPage> HelpSearch::Implementation::pagesOfRecords(const Records& records) const {
+  std::vector<FoundPage> pages;
+  std::set<std::string> shown;
+  for (const auto& record : records) {
+    if (record->type() != ZEBHelpArticleResult) {
+      continue;
+    }
+    FoundPage page = pageOfResult(*record);
+    // A book may name one page for the words in several of its lists.
+    if (shown.insert(page.url).second) {
+      pages.push_back(std::move(page));
+    }
+  }
+  return pages;
+}
+
+namespace {
+
+std::vector<Suggestion> suggestionsOfDelivery(const Delivery& delivery, const std::string& kind,
+                                              size_t limit) {
+  std::vector<Suggestion> suggestions;
+  std::set<std::string> shown;
+  const auto add = [&](const std::string& text, double relevance) {
+    if (suggestions.size() < limit && shown.insert(platform::lowercaseString(text)).second) {
+      suggestions.push_back({text, relevance});
+    }
+  };
+  for (const std::string& text : delivery.texts) {
+    add(text, 0);
+  }
+  for (const auto& record : delivery.records) {
+    if (record->type() == kind) {
+      add(record->title().value_or(std::string()), record->relevance().doubleValue());
+    }
+  }
+  return suggestions;
+}
+
+}  // namespace
+
+class HelpSearch::Live : public LiveSearch {
+ public:
+  Live(const Implementation& implementation, std::shared_ptr<ZEBQuery> query)
+      : _implementation(implementation),
+        _query(std::move(query)),
+        _collector(std::make_shared<Collector>()) {
+    _implementation.host->startSearch(_query, _collector);
+  }
+
+  void cancel() override { _query->cancel(); }
+  bool ended() const override { return _collector->ended(); }
+  LiveAnswer answer(size_t limit) const override {
+    const Delivery delivery = _collector->deliverySoFar();
+    LiveAnswer answer;
+    answer.completions = suggestionsOfDelivery(delivery, ZEBHelpSuggestionResult, limit);
+    answer.pages = _implementation.pagesOfRecords(delivery.records);
+    if (answer.pages.size() > limit) {
+      answer.pages.resize(limit);
+    }
+    return answer;
+  }
+
+ private:
+  const Implementation& _implementation;
+  const std::shared_ptr<ZEBQuery> _query;
+  const std::shared_ptr<Collector> _collector;
+};
+
+std::shared_ptr<LiveSearch> HelpSearch::beginLiveSearch(std::string_view text,
+                                                        const std::vector<std::string>& bookIDs) {
+  return std::make_shared<Live>(
+      *_implementation,
+      makeQuery(text, bookIDs, {ZEBHelpArticleResult, ZEBHelpSuggestionResult}, 0));
+}
 
 HelpSearch::HelpSearch(std::unique_ptr<Implementation> implementation)
     : _implementation(std::move(implementation)) {}
@@ -257,7 +325,8 @@ HelpSearch::Indexing HelpSearch::makeIndexes(const std::vector<std::string>& boo
         for (const std::string& bookID : _implementation->reports->take()) {
           tell(bookID);
         }
-        return collector->ended() && _implementation->host->owner().isQuietFor(quietSpan);
+        return collector->ended() && _implementation->host->owner().isQuietFor(quietSpan) &&
+               _implementation->reports->areQuietFor(modelSpan);
       },
       limit);
   // Not reported are books whose indexes were there before, and those that another process has made
@@ -311,16 +380,20 @@ std::optional<Answer> HelpSearch::searchActions(std::string_view words,
 
 std::optional<std::vector<Suggestion>> HelpSearch::suggestions(
     std::string_view text, const std::vector<std::string>& bookIDs, size_t limit) {
-  return _implementation->suggestionsOfQuery(
-      makeQuery(text, bookIDs, {ZEBHelpSuggestionResult}, limit), ZEBHelpSuggestionResult, limit);
+  const auto delivery =
+      _implementation->deliveryOfQuery(makeQuery(text, bookIDs, {ZEBHelpSuggestionResult}, limit));
+  return delivery ? std::optional(suggestionsOfDelivery(*delivery, ZEBHelpSuggestionResult, limit))
+                  : std::nullopt;
 }
 
 std::optional<std::vector<Suggestion>> HelpSearch::similarSearches(
     std::string_view words, const std::vector<std::string>& bookIDs, size_t limit) {
   // With articles, whose titles are then not offered again.
-  return _implementation->suggestionsOfQuery(
-      makeQuery(words, bookIDs, {ZEBHelpArticleResult, ZEBHelpSimilarSuggestionResult}, limit),
-      ZEBHelpSimilarSuggestionResult, limit);
+  const auto delivery = _implementation->deliveryOfQuery(
+      makeQuery(words, bookIDs, {ZEBHelpArticleResult, ZEBHelpSimilarSuggestionResult}, limit));
+  return delivery ? std::optional(
+                        suggestionsOfDelivery(*delivery, ZEBHelpSimilarSuggestionResult, limit))
+                  : std::nullopt;
 }
 
 std::optional<Answer> HelpSearch::lookUpAnchor(std::string_view name,

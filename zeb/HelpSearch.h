@@ -43,6 +43,24 @@ struct Answer {
   size_t count = 0;
 };
 
+/// What is shown while somebody types.
+struct LiveAnswer {
+  std::vector<Suggestion> completions;
+  /// Best first.
+  std::vector<FoundPage> pages;
+};
+
+/// A search that is under way. Thread-safety: internally synchronised.
+class LiveSearch {
+ public:
+  virtual ~LiveSearch() = default;
+  /// The answer is no longer wanted.
+  virtual void cancel() = 0;
+  virtual bool ended() const = 0;
+  /// What was found up to now, at most so many pages and completions.
+  virtual LiveAnswer answer(size_t limit) const = 0;
+};
+
 /// The one place in which the command line meets the search: a host in this process, with the
 /// plug-in. Its functions run the main loop while they wait, so all of them belong to the main
 /// thread. Lists of identifiers that are empty stand for all books.
@@ -104,11 +122,17 @@ class HelpSearch {
                                                          const std::vector<std::string>& bookIDs,
                                                          size_t limit);
 
+  /// Begins a search for completions and pages and returns at once. The main loop has to run on; it
+  /// is woken at the end.
+  std::shared_ptr<LiveSearch> beginLiveSearch(std::string_view text,
+                                              const std::vector<std::string>& bookIDs);
+
   /// Lets the plug-in come to an end with what it is doing, for `limit` at most.
   void settle(platform::Seconds limit);
 
  private:
   struct Implementation;
+  class Live;
   explicit HelpSearch(std::unique_ptr<Implementation> implementation);
 
   const std::unique_ptr<Implementation> _implementation;

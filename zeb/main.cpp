@@ -26,6 +26,7 @@ platform::Environment environmentOfProgram() {
 
 int main(int argc, char** argv) {
   zeb::Console console(std::cout, std::cerr);
+  console.setInIsTerminal(isatty(STDIN_FILENO) == 1);
   console.setOutIsTerminal(isatty(STDOUT_FILENO) == 1);
   console.setErrIsTerminal(isatty(STDERR_FILENO) == 1);
   // No thread has been started yet.

@@ -218,6 +218,59 @@ TEST_F(ProgramTest, EndsAtOnceThoughBooksAreStillBeingIndexedWhenToldNotToWait) 
   EXPECT_EQ(zeb({"search", "half"}).status, 0);
 }
 
+TEST_F(ProgramTest, SearchWithoutWordsOnATerminalSearchesWhileOneTypes) {
+  scanManual();
+  std::vector<std::string> arguments = {ZEB_PROGRAM, "search", "--cache-dir", files.path("cache")};
+  std::vector<char*> pointers;
+  for (std::string& argument : arguments) {
+    pointers.push_back(argument.data());
+  }
+  pointers.push_back(nullptr);
+  int terminal = -1;
+  const pid_t child = forkpty(&terminal, nullptr, nullptr, nullptr);
+  if (child == 0) {
+    execv(pointers[0], pointers.data());
+    _exit(127);
+  }
+  std::string output;
+  // Reads until the text has been shown; the child's end closes the terminal.
+  const auto waitFor = [&](const std::string& text) {
+    std::array<char, 4096> buffer{};
+    while (output.find(text) == std::string::npos) {
+      const ssize_t count = read(terminal, buffer.data(), buffer.size());
+      if (count <= 0) {
+        return false;
+      }
+      output.append(buffer.data(), static_cast<size_t>(count));
+    }
+    output.clear();
+    return true;
+  };
+  const auto type = [&](const std::string& keys) {
+    EXPECT_EQ(write(terminal, keys.data(), keys.size()), static_cast<ssize_t>(keys.size()));
+  };
+  EXPECT_TRUE(waitFor("search: "));
+  type("hal");
+  EXPECT_TRUE(waitFor("half"));
+  type("f words");
+  EXPECT_TRUE(waitFor("Search with words and half words"));
+  type("\x1B[B");
+  EXPECT_TRUE(waitFor("\033[7m> "));
+  type("\x1B");
+  EXPECT_FALSE(waitFor("never shown"));
+  close(terminal);
+  int status = -1;
+  waitpid(child, &status, 0);
+  EXPECT_EQ(status, 0);
+}
+
+TEST_F(ProgramTest, SearchWithoutWordsNeedsATerminal) {
+  const ProgramRun run = shell(quoted(ZEB_PROGRAM) + " search </dev/null");
+  EXPECT_EQ(run.status, 2);
+  EXPECT_EQ(run.err,
+            "zeb: error: search: words are needed where there is no terminal to type them\n");
+}
+
 TEST_F(ProgramTest, DemonstrationSearchesWithoutAnyHelpOnTheComputer) {
   const std::string demo = "ZEB_DEMO_ROOT=" + quoted(files.path("nothing")) + " " +
                            quoted(std::string(ZEB_SOURCE_DIR) + "/scripts/demo") + " " +

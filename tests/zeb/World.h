@@ -75,7 +75,7 @@ class World {
   /// quickly that waits for quiet cost next to nothing.
   platform::Environment _madeEnvironment() const {
     platform::Environment environment = *platform::Environment::current();
-    environment.clock = std::make_shared<QuickClock>(10);
+    environment.clock = std::make_shared<QuickClock>(20);
     environment.cachesDirectory = cacheFolder();
     environment.notificationCenter = platform::localNotificationCenter();
     return environment;
