@@ -52,6 +52,10 @@ class HelpPluginController : public ZEBPlugin,
 
   // Internal: for tests.
   const std::shared_ptr<ZEBIndexshelf>& _shelf() const { return _indexshelf; }
+  /// Null where no user was logged in when the controller was made.
+  const std::shared_ptr<LUXSearchController>& _luxController() const {
+    return _luxSearchController;
+  }
   /// Before the controller is used by others.
   void _setLuxSearchController(std::shared_ptr<LUXSearchController> controller) {
     _luxSearchController = std::move(controller);

@@ -10,6 +10,8 @@
 #include <memory>
 #include <mutex>
 #include <optional>
+#include <ostream>
+#include <set>
 #include <string>
 #include <utility>
 #include <vector>
@@ -30,6 +32,15 @@
 #include "tests/platform/TemporaryFolder.h"
 #include "tests/plugin/HelpIndexWorld.h"
 #include "tests/plugin/front/RecordingOwner.h"
+
+namespace platform {
+
+/// What failing tests print.
+inline void PrintTo(const CapturingLogSink::Entry& entry, std::ostream* stream) {
+  *stream << entry.level << ": " << entry.message;
+}
+
+}  // namespace platform
 
 namespace tests {
 

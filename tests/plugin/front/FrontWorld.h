@@ -19,6 +19,7 @@
 #include "host/Zebrine/ZEBResult.h"
 #include "platform/DistributedNotificationCenter.h"
 #include "platform/Environment.h"
+#include "platform/OperationQueue.h"
 #include "platform/Processes.h"
 #include "platform/PropertyList.h"
 #include "platform/RunLoop.h"
@@ -180,16 +181,25 @@ class FrontWorld {
     return controller->_shelf()->indicesForBook(book);
   }
 
-  /// Lets background work and the main loop come to rest, time passing as they need it.
+  /// Lets background work and the main loop come to rest, time passing as they need it. Whatever
+  /// keeps the daemon from exiting is work.
   void drain() const {
     const auto& shelf = controller->_shelf();
     const auto busy = [&] {
       return shelf->indexGeneratingQueue()->operationCount() +
              shelf->indexRegistrationQueue()->operationCount() +
              shelf->indexFetchUpdateQueue()->operationCount() +
-             shelf->indexDownloadQueue()->operationCount();
+             shelf->indexDownloadQueue()->operationCount() + static_cast<size_t>(owner->guards());
     };
-    while (platform::RunLoop::main()->runPending() + busy() > 0) {
+    const auto& models = controller->_luxController();
+    // A model that somebody else keeps busy is not waited for.
+    int patience = 10000;
+    const auto modelsAreBehind = [&] {
+      return models && --patience > 0 &&
+             (models->_modelUpdateQueue()->operationCount() > 0 ||
+              !models->_pendingIndexEvents().empty());
+    };
+    while (platform::RunLoop::main()->runPending() + busy() > 0 || modelsAreBehind()) {
       clock->advance(platform::Seconds(0.5));
       std::this_thread::sleep_for(std::chrono::microseconds(200));
     }

@@ -4,7 +4,6 @@
 #include <functional>
 #include <map>
 #include <memory>
-#include <optional>
 #include <set>
 #include <string>
 #include <utility>
@@ -34,11 +33,11 @@ class ScriptedSemantics : public LUXSearchController {
     steps.emplace_back(useShorterTimeouts ? "shorter" : "not shorter");
   }
 
-  Results doSearchForQuery(
-      const std::shared_ptr<ZEBQuery>& query, const std::string& requestedResultType,
-      const std::vector<std::shared_ptr<ZEBIndex>>& inIndices,
-      const std::vector<std::string>& ignoringItems,
-      std::set<std::string>* passingBackSearchedHelpbookIDs) override {
+  Results doSearchForQuery(const std::shared_ptr<ZEBQuery>& query,
+                           const std::string& requestedResultType,
+                           const std::vector<std::shared_ptr<ZEBIndex>>& inIndices,
+                           const std::vector<std::string>& ignoringItems,
+                           std::set<std::string>* passingBackSearchedHelpbookIDs) override {
     steps.push_back(requestedResultType);
     calls.push_back(
         {requestedResultType, inIndices, ignoringItems, passingBackSearchedHelpbookIDs != nullptr});
@@ -49,7 +48,7 @@ class ScriptedSemantics : public LUXSearchController {
       onSearch(query);
     }
     const auto answer = answers.find(requestedResultType);
-    return answer == answers.end() ? Results() : answer->second.value_or(Results());
+    return answer == answers.end() ? Results() : answer->second;
   }
 
   void completeSearchQuery(const std::shared_ptr<ZEBQuery>& query) override {
@@ -61,8 +60,8 @@ class ScriptedSemantics : public LUXSearchController {
     }
   }
 
-  /// By kind of result; a kind that is not there is answered with nothing at all.
-  std::map<std::string, std::optional<Results>> answers;
+  /// By kind of result; a kind that is not there has an empty answer.
+  std::map<std::string, Results> answers;
   std::set<std::string> searchedBooks;
   std::function<void(const std::shared_ptr<ZEBQuery>& query)> onSearch;
   std::function<void()> onLoad;

@@ -280,7 +280,8 @@ TEST(SearchBooks, OfflineWhoWantsNoArticlesGetsNoTopic) {
   world.addRemoteBook("r1", {page("/p.html", "Printing", "print queue")});
   world.owner->online = false;
   world.search(FrontWorld::query("print", {"r1"}, {ZEBHelpSuggestionResult}));
-  EXPECT_THAT(world.owner->deliveries(), ElementsAre("finished"));
+  EXPECT_THAT(world.owner->deliveries(), ElementsAre("found", "finished"));
+  EXPECT_THAT(world.owner->records(0), IsEmpty());
   EXPECT_THAT(semantics->steps, ElementsAre(ZEBHelpSuggestionResult));
 }
 
