@@ -106,6 +106,13 @@ LUXWorld::~LUXWorld() {
   EXPECT_FALSE(controller->_queryInProgress());
   // The shelf keeps its observers; who does not keep the shelf in turn is freed with it.
   controller->setIndexshelf(nullptr);
+  const std::weak_ptr<LUXSearchController> weak = controller;
+  controller.reset();
+  shelf.reset();
+  EXPECT_TRUE(waitUntil([&] { return weak.expired(); })) << "the controller is kept alive";
+  // The run loop is the same for all tests: timers that were left fire here, and find nobody.
+  clock->advance(std::chrono::hours(1));
+  platform::RunLoop::main()->runPending();
   HelpLUXModel::setGroupList({});
 }
 
