@@ -133,6 +133,7 @@ platform::Data LUXWorld::semanticData(const std::vector<LUXPage>& pages) {
 std::shared_ptr<ZEBHelpBook> LUXWorld::addBook(const std::string& bookID,
                                                std::vector<LUXPage> pages, const std::string& group,
                                                int32_t type) {
+  _pages[bookID] = pages;
   return addBookWithData(bookID, semanticData(pages), group, type);
 }
 
@@ -150,8 +151,17 @@ std::shared_ptr<ZEBHelpBook> LUXWorld::addBookWithData(const std::string& bookID
 
 std::string LUXWorld::writeIndex(const std::string& bookID,
                                  const std::optional<platform::Data>& data) const {
-  platform::Value::Dictionary content{
-      {"SKI_INDEX_DATA", keywordIndex({page("/start.html", "Start", "words of " + bookID)})}};
+  std::vector<searchkit::Document> documents{page("/start.html", "Start", "words of " + bookID)};
+  if (const auto pages = _pages.find(bookID); pages != _pages.end()) {
+    for (const LUXPage& each : pages->second) {
+      std::string text;
+      for (const std::string& block : each.blocks) {
+        text += block + "\n";
+      }
+      documents.push_back(page("/" + each.key, each.title, text));
+    }
+  }
+  platform::Value::Dictionary content{{"SKI_INDEX_DATA", keywordIndex(std::move(documents))}};
   if (data) {
     content["LUXIndexData"] = *data;
   }

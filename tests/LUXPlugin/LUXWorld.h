@@ -198,6 +198,7 @@ class LUXWorld {
   std::optional<platform::EnvironmentOverride> _override;
   std::map<std::string, platform::Value::Dictionary> _books;
   std::map<std::string, double> _weights;
+  std::map<std::string, std::vector<LUXPage>> _pages;
   void _applyGroupList() const;
 
  public:
