@@ -134,6 +134,21 @@ TEST(FileManager, createsParentFoldersAndAcceptsExistingOnes) {
   EXPECT_TRUE(files.createDirectoryWithParents(folder.path("file/below")));
 }
 
+TEST(FileManager, createsOneFolderWhereNothingIsAndTheParentExists) {
+  const TemporaryFolder folder;
+  const FileManager files;
+  EXPECT_FALSE(files.createDirectory(folder.path("a")));
+  bool isDirectory = false;
+  EXPECT_TRUE(files.fileExistsAtPath(folder.path("a"), &isDirectory));
+  EXPECT_TRUE(isDirectory);
+  EXPECT_EQ(files.createDirectory(folder.path("a"))->code, EEXIST);
+  EXPECT_EQ(files.createDirectory(folder.path("b/c"))->code, ENOENT);
+  EXPECT_FALSE(files.fileExistsAtPath(folder.path("b")));
+  folder.write("file", "");
+  EXPECT_EQ(files.createDirectory(folder.path("file"))->code, EEXIST);
+  EXPECT_EQ(files.createDirectory(nameWithNUL())->code, ENOENT);
+}
+
 TEST(FileManager, copiesFilesOnly) {
   const TemporaryFolder folder;
   const FileManager files;
@@ -205,6 +220,7 @@ TEST(FailingFileManager, failsEveryKindOfChange) {
   files.fail(FailingFileManager::Operation::remove, EROFS);
   files.fail(FailingFileManager::Operation::modificationDate, EIO);
   EXPECT_EQ(files.createDirectoryWithParents(folder.path("b"))->code, EROFS);
+  EXPECT_EQ(files.createDirectory(folder.path("b"))->code, EROFS);
   EXPECT_EQ(files.copyItem(path, folder.path("target"))->code, EROFS);
   EXPECT_EQ(files.removeItem(path)->code, EROFS);
   EXPECT_FALSE(files.modificationDate(path));

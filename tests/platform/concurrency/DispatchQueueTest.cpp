@@ -1,7 +1,10 @@
 #include "platform/DispatchQueue.h"
 
 #include <gtest/gtest.h>
+#include <sys/resource.h>
+#include <unistd.h>
 
+#include <algorithm>
 #include <atomic>
 #include <thread>
 #include <vector>
@@ -25,6 +28,22 @@ TEST(DispatchQueue, serialBlocksRunOneAfterTheOtherInOrder) {
     EXPECT_EQ(order[static_cast<size_t>(i)], i);
   }
   EXPECT_EQ(queue->label(), "serial");
+}
+
+TEST(DispatchQueue, aSerialQueueMayRunAtBackgroundPriority) {
+  int normal = -100;
+  int background = -100;
+  const auto priority = [] { return ::getpriority(PRIO_PROCESS, static_cast<id_t>(::gettid())); };
+  DispatchQueue::serial("normal")->sync([&] { normal = priority(); });
+  const auto queue = DispatchQueue::serial("background", ThreadPriority::background);
+  std::vector<int> order;
+  for (int i = 0; i < 50; ++i) {
+    queue->async([&order, i] { order.push_back(i); });
+  }
+  queue->sync([&] { background = priority(); });
+  EXPECT_GT(background, normal);
+  EXPECT_TRUE(std::is_sorted(order.begin(), order.end()));
+  EXPECT_EQ(order.size(), 50U);
 }
 
 TEST(DispatchQueue, concurrentBlocksOverlap) {

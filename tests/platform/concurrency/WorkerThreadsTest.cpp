@@ -1,6 +1,7 @@
 #include "platform/WorkerThreads.h"
 
 #include <gtest/gtest.h>
+#include <pthread.h>
 #include <sys/resource.h>
 #include <unistd.h>
 
@@ -83,6 +84,27 @@ TEST(WorkerThreads, namedThreadKnowsItsName) {
   EXPECT_FALSE(main);
   EXPECT_TRUE(isMainThread());
   EXPECT_EQ(currentThreadName(), "");
+}
+
+TEST(WorkerThreads, aTaskMayNameItsThreadUntilItEnds) {
+  // Workers are used again: enough tasks one after the other meet one that had a name.
+  for (int i = 0; i < 20; ++i) {
+    DispatchSemaphore done(0);
+    std::string before;
+    std::string during;
+    char inTheKernel[16] = {};
+    runOnWorkerThread([&] {
+      before = currentThreadName();
+      setCurrentThreadName("a name of more than fifteen bytes");
+      during = currentThreadName();
+      ::pthread_getname_np(::pthread_self(), inTheKernel, sizeof inTheKernel);
+      done.signal();
+    });
+    done.wait();
+    EXPECT_EQ(before, "");
+    EXPECT_EQ(during, "a name of more than fifteen bytes");
+    EXPECT_STREQ(inTheKernel, "a name of more ");
+  }
 }
 
 TEST(WorkerThreads, anExceptionEndsANamedThreadNotTheProcess) {

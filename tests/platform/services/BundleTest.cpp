@@ -115,6 +115,48 @@ TEST(Bundle, anExecutableNameNeverLeavesTheFolder) {
   }
 }
 
+TEST(Bundle, findsResourcesInTheLanguageFolderFirst) {
+  const TemporaryFolder folder;
+  folder.write("Info.plist", information(""));
+  folder.write("Resources/Help/page.html", "");
+  folder.write("Resources/German.lproj/Help/page.html", "");
+  folder.write("Resources/list.plist", "");
+  folder.write("Resources/deep/list.plist", "");
+  const auto bundle = Bundle::bundleWithPath(folder.path());
+  ASSERT_NE(bundle, nullptr);
+  const auto none = std::nullopt;
+  EXPECT_EQ(bundle->pathForResource("Help", none, none, "German"),
+            folder.path("Resources/German.lproj/Help"));
+  EXPECT_EQ(bundle->pathForResource("Help", none, none, "French"), folder.path("Resources/Help"));
+  EXPECT_EQ(bundle->pathForResource("Help", none, none, none), folder.path("Resources/Help"));
+  EXPECT_EQ(bundle->pathForResource("Help", "", "", ""), folder.path("Resources/Help"));
+  EXPECT_EQ(bundle->pathForResource("list", "plist", none, "German"),
+            folder.path("Resources/list.plist"));
+  EXPECT_EQ(bundle->pathForResource("list", "plist", "deep", none),
+            folder.path("Resources/deep/list.plist"));
+  EXPECT_EQ(bundle->pathForResource("missing", none, none, "German"), std::nullopt);
+  EXPECT_EQ(bundle->pathForResource("list", none, none, none), std::nullopt);
+}
+
+TEST(Bundle, findsNoResourcesOutsideItsResourceFolder) {
+  const TemporaryFolder folder;
+  folder.write("Info.plist", information(""));
+  folder.write("Resources/inside.html", "");
+  folder.write("ResourcesToo/outside.html", "");
+  const auto bundle = Bundle::bundleWithPath(folder.path());
+  ASSERT_NE(bundle, nullptr);
+  const auto none = std::nullopt;
+  for (const std::string name :
+       {"", ".", "..", "../Info.plist", "../ResourcesToo/outside.html", "../../../../etc/passwd"}) {
+    EXPECT_EQ(bundle->pathForResource(name, none, none, none), std::nullopt) << name;
+    EXPECT_EQ(bundle->pathForResource(name, none, none, "German"), std::nullopt) << name;
+  }
+  EXPECT_EQ(bundle->pathForResource("Info", "plist", "..", none), std::nullopt);
+  EXPECT_EQ(bundle->pathForResource(std::string("inside.html\0", 12), none, none, none),
+            std::nullopt);
+  EXPECT_TRUE(bundle->pathForResource("inside.html", none, none, "../../etc"));
+}
+
 TEST(Bundle, anExecutableNameWithANULIsRefused) {
   const TemporaryFolder folder;
   // One dictionary of two strings, the second of them "a\0b".
