@@ -101,6 +101,30 @@ TEST_F(CommandLineTest, AnchorTakesOneName) {
   expectUsageError({"anchor", "a", "b"}, "b");
 }
 
+TEST_F(CommandLineTest, SuggestAndSimilarTakeWords) {
+  const auto suggest =
+      parsed<zeb::SuggestCommand>({"suggest", "pri", "--limit", "3", "--book", "a", "--json"});
+  EXPECT_EQ(suggest.kind, zeb::SuggestCommand::Kind::completions);
+  EXPECT_THAT(suggest.words, ElementsAre("pri"));
+  EXPECT_THAT(suggest.books, ElementsAre("a"));
+  EXPECT_EQ(suggest.limit, 3U);
+  EXPECT_TRUE(suggest.json);
+  const auto similar = parsed<zeb::SuggestCommand>({"similar", "-print", "page"});
+  EXPECT_EQ(similar.kind, zeb::SuggestCommand::Kind::similar);
+  EXPECT_THAT(similar.words, ElementsAre("-print", "page"));
+}
+
+TEST_F(CommandLineTest, SearchMayHaveNoWordsAndMayAskForActions) {
+  EXPECT_THAT(parsed<zeb::SearchCommand>({"search"}).words, IsEmpty());
+  EXPECT_FALSE(parsed<zeb::SearchCommand>({"search", "a"}).actions);
+  EXPECT_TRUE(parsed<zeb::SearchCommand>({"search", "a", "--actions"}).actions);
+}
+
+TEST_F(CommandLineTest, ModelsTakesNothingButJSON) {
+  EXPECT_TRUE(parsed<zeb::ModelsCommand>({"models", "--json"}).json);
+  expectUsageError({"models", "a"}, "a");
+}
+
 TEST_F(CommandLineTest, BooksTakesNothingButJSON) {
   EXPECT_TRUE(parsed<zeb::BooksCommand>({"books", "--json"}).json);
   expectUsageError({"books", "a"}, "a");
@@ -156,7 +180,8 @@ TEST_F(CommandLineTest, ColorKnowsThreeWords) {
 TEST_F(CommandLineTest, WrongLinesAreUsageErrors) {
   expectUsageError({}, "subcommand");
   expectUsageError({"sing"}, "sing");
-  expectUsageError({"search"}, "words");
+  expectUsageError({"suggest"}, "words");
+  expectUsageError({"similar"}, "words");
   expectUsageError({"search", "a", "--limt", "3"}, "--limt");
   expectUsageError({"search", "a", "--limit", "0"}, "--limit");
   expectUsageError({"search", "a", "--limit", "-3"}, "--limit");

@@ -4,6 +4,7 @@
 #include <filesystem>
 #include <nlohmann/json.hpp>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "tests/zeb/World.h"
@@ -63,10 +64,14 @@ TEST_F(MeaningTest, ScanLeavesAModelOfTheBooks) {
 }
 
 TEST_F(MeaningTest, PagesAreFoundByQuestionsInTheUsersWords) {
-  const JSON json =
-      JSON::parse(world->zeb({"search", "how do I complete half a word", "--json"}).out);
-  ASSERT_FALSE(json["results"].empty());
-  EXPECT_THAT(json["results"][0]["url"].get<std::string>(), HasSubstr("searching.html"));
+  for (const auto& [question, page] :
+       {std::pair("is my query sent anywhere", "files-and-privacy.html"),
+        std::pair("add my own pages", "books.html"),
+        std::pair("no internet", "not-connected.html")}) {
+    const JSON json = JSON::parse(world->zeb({"search", question, "--json"}).out);
+    ASSERT_FALSE(json["results"].empty()) << question;
+    EXPECT_THAT(json["results"][0]["url"].get<std::string>(), HasSubstr(page)) << question;
+  }
 }
 
 TEST_F(MeaningTest, ExactTitleComesFirstWithRelevanceOne) {
