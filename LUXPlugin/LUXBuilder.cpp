@@ -75,7 +75,7 @@ std::optional<std::vector<std::string>> stringsOfValue(const Value& value) {
 
 std::shared_ptr<LUXModelBuildOperation> LUXSearchController::startBuildingModelGroupName(
     const std::string& modelGroupName, const std::string& language) {
-  const auto operation = LUXModelBuildOperation::blockOperationWithBlock(
+  auto operation = LUXModelBuildOperation::blockOperationWithBlock(
       [controller = shared_from_this(), modelGroupName, language] {
         if (const auto model = controller->aquiredModelWithGroupName(
                 modelGroupName, language, kLUXModelActivityBuilding, buildAcquisitionWait)) {

@@ -48,7 +48,7 @@ std::shared_ptr<ZEBIndexshelf> LUXSearchController::indexshelf() const {
   return _indexshelf;
 }
 
-void LUXSearchController::setIndexshelf(std::shared_ptr<ZEBIndexshelf> indexshelf) {
+void LUXSearchController::setIndexshelf(const std::shared_ptr<ZEBIndexshelf>& indexshelf) {
   {
     const platform::MonitorLock lock(_monitor);
     _indexshelf = indexshelf;

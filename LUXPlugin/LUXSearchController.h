@@ -65,7 +65,7 @@ class LUXSearchController : public ZEBIndexshelfObserver,
 
   std::shared_ptr<ZEBIndexshelf> indexshelf() const;
   /// Observes the shelf from now on. To be called once.
-  virtual void setIndexshelf(std::shared_ptr<ZEBIndexshelf> indexshelf);
+  virtual void setIndexshelf(const std::shared_ptr<ZEBIndexshelf>& indexshelf);
 
   /// Whether searches wait one second for models and results, or 8 and 16.
   virtual void useShorterTimeouts(bool useShorterTimeouts);

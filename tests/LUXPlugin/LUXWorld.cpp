@@ -131,8 +131,8 @@ platform::Data LUXWorld::semanticData(const std::vector<LUXPage>& pages) {
 }
 
 std::shared_ptr<ZEBHelpBook> LUXWorld::addBook(const std::string& bookID,
-                                               std::vector<LUXPage> pages, const std::string& group,
-                                               int32_t type) {
+                                               const std::vector<LUXPage>& pages,
+                                               const std::string& group, int32_t type) {
   _pages[bookID] = pages;
   return addBookWithData(bookID, semanticData(pages), group, type);
 }
@@ -165,7 +165,7 @@ std::string LUXWorld::writeIndex(const std::string& bookID,
   if (data) {
     content["LUXIndexData"] = *data;
   }
-  const std::string path = folder.path("books/" + bookID + "/book.helpindex");
+  std::string path = folder.path("books/" + bookID + "/book.helpindex");
   std::filesystem::create_directories(folder.path("books/" + bookID));
   // A new file in the old one's place: records keep a mapping of the old one.
   EXPECT_FALSE(platform::systemFileManager()->writeAtomically(

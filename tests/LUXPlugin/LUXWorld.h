@@ -133,7 +133,7 @@ class LUXWorld {
 
   /// A book with an index of its own, known to the host. With a group, the group list names it
   /// there.
-  std::shared_ptr<ZEBHelpBook> addBook(const std::string& bookID, std::vector<LUXPage> pages,
+  std::shared_ptr<ZEBHelpBook> addBook(const std::string& bookID, const std::vector<LUXPage>& pages,
                                        const std::string& group = {},
                                        int32_t type = ZEBHelpBookType1);
   /// The same with whatever the index file is to hold as semantic data.

@@ -398,6 +398,7 @@ TEST_F(Synchronisation, doesNotWaitForFetchedUpdates) {
   world.shelf->indexFetchUpdateQueue()->addOperationWithBlock([&] { release.wait(); });
   sync();
   release.signal();
+  world.shelf->indexFetchUpdateQueue()->waitUntilAllOperationsAreFinished();
 }
 
 TEST_F(Synchronisation, thatThrowsIsLoggedAndTheNextOneRuns) {

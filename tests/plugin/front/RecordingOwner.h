@@ -67,8 +67,9 @@ class RecordingOwner : public ZEBPluginOwner {
     _told("disableShutdown");
   }
   void enableShutdown() override {
-    --_guards;
+    // In this order: who waits for the last guard to go may then change what is called here.
     _told("enableShutdown");
+    --_guards;
   }
   void setIdleTimeOutDelay(const platform::Value& delay) override {
     {

@@ -28,7 +28,7 @@ class ScriptedSemantics : public LUXSearchController {
 
   ScriptedSemantics() : LUXSearchController(nullptr) {}
 
-  void setIndexshelf(std::shared_ptr<ZEBIndexshelf>) override {}
+  void setIndexshelf(const std::shared_ptr<ZEBIndexshelf>&) override {}
   void useShorterTimeouts(bool useShorterTimeouts) override {
     steps.emplace_back(useShorterTimeouts ? "shorter" : "not shorter");
   }

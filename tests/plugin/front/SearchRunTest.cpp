@@ -260,15 +260,18 @@ TEST(SearchRun, WhateverTheOwnerThrowsEndsTheSearchIsLoggedAndReleasesTheGuard) 
 
 TEST(SearchRun, TheExceptionIsLoggedBeforeTheGuardIsReleased) {
   const RunWorld world;
+  size_t releases = 0;
   world.owner->onMessage = [&](const std::string& told) {
     if (told == "found") {
       throw std::runtime_error("full");
     }
-    if (told == "enableShutdown" && world.owner->guards() == 0) {
+    if (told == "enableShutdown" && world.owner->guards() == 1) {
+      ++releases;
       EXPECT_THAT(world.logged(0), ElementsAre("full"));
     }
   };
   world.search(RunWorld::fullQuery());
+  EXPECT_EQ(releases, 1U);
 }
 
 TEST(SearchRun, BatchesDeliveredBeforeTheExceptionStand) {
