@@ -1,6 +1,7 @@
 #include "host/Luxwell/LUXScoring.h"
 
 #include <algorithm>
+#include <array>
 #include <bit>
 #include <functional>
 #include <limits>
@@ -35,6 +36,8 @@ class Search {
         _plan(plan),
         _scope(scope),
         _isCancelled(isCancelled),
+        _vectors(view.pageVectors()),
+        _scales(plan.latent.empty() ? std::span<const float>() : view.pageScales()),
         _count(std::min<size_t>(count, scope.end - scope.first)),
         _meaning(plan.latent.empty() ? 0 : plan.latentWeight),
         _wordShare(1 - plan.latentWeight),
@@ -117,42 +120,44 @@ class Search {
 
   // A score that at least `_count` pages reach, and not many more; the least score that a page with
   // a word of the query has where there may be fewer. If so many groups have a page that reaches
-  // it, so many pages do; and the best pages seldom share a group.
+  // it, so many pages do; and the best pages seldom share a group. Groups are counted by classes of
+  // scores, which is quicker than putting them in order and good enough.
   float _lowerBoundOfBest() const {
-    // Groups of groups, as long as they are enough to tell well.
-    size_t stride = 1;
-    while (_maxima.size() / (2 * stride) >= 4 * _count) {
-      stride *= 2;
-    }
-    std::vector<float> highest((_maxima.size() + stride - 1) / stride);
-    if (highest.size() < _count) {
+    const float highest = *std::max_element(_maxima.begin(), _maxima.end());
+    if (_maxima.size() < _count || !(highest > leastScore && highest < everything)) {
       return leastScore;
     }
-    for (size_t i = 0; i < _maxima.size(); ++i) {
-      highest[i / stride] = std::max(highest[i / stride], _maxima[i]);
+    constexpr size_t classCount = 256;
+    const float scale = static_cast<float>(classCount - 1) / highest;
+    std::array<uint32_t, classCount> groups{};
+    for (const float maximum : _maxima) {
+      ++groups[static_cast<size_t>(std::max(maximum, 0.0F) * scale)];
     }
-    const auto last = highest.begin() + static_cast<ptrdiff_t>(_count) - 1;
-    std::nth_element(highest.begin(), last, highest.end(), std::greater<>());
-    return std::max(*last, leastScore);
+    size_t counted = 0;
+    for (size_t i = classCount - 1; i > 0; --i) {
+      counted += groups[i];
+      if (counted >= _count) {
+        return std::max(static_cast<float>(i) / scale * (1 - roundingReserve), leastScore);
+      }
+    }
+    return leastScore;
   }
 
+  // In this order it is 0 also where a damaged model makes it what is no number.
+  static float _clamped(float cosine) { return std::min(std::max(0.0F, cosine), 1.0F); }
+
   float _cosine(uint32_t page) const {
-    const int8_t* const vector = _plan.latent.empty() ? nullptr : _view.pageVector(page);
-    if (vector == nullptr) {
+    if (page >= _scales.size()) {
       return 0;
     }
-    const int32_t product = LUXInnerProduct(_plan.latent.data(), vector, _plan.latent.size());
-    const float cosine = static_cast<float>(product) * _plan.latentScale * _view.pageScale(page);
-    // Also for what is not a number.
-    return cosine > 0 ? std::min(cosine, 1.0F) : 0;
+    const size_t length = _plan.latent.size();
+    const int32_t product = _innerProduct(_plan.latent.data(), _vectors + page * length, length);
+    return _clamped(static_cast<float>(product) * _plan.latentScale * _scales[page]);
   }
 
   void _take(size_t place, float lexical) {
     const uint32_t page = _scope.first + static_cast<uint32_t>(place);
-    const float score = _wordShare * lexical + _meaning * _cosine(page);
-    if (score > 0) {
-      _best.add(rankOfPage(page, _scope), score);
-    }
+    _best.add(rankOfPage(page, _scope), _wordShare * lexical + _meaning * _cosine(page));
   }
 
   // Takes the pages with a lexical score from `least` to below `end`; `least` rises as better pages
@@ -182,12 +187,66 @@ class Search {
   }
 
   bool _takeThoseWithoutWords() {
-    for (size_t place = 0; place < _lexical.size(); ++place) {
-      if (place % stepLength == 0 && _cancelled()) {
+    const uint32_t size = _scope.end - _scope.first;
+    if (size >= luxmodel::neighbourhoodPageCount && _view.neighbourhoodCount() > 0) {
+      return _takeNeighbours();
+    }
+    using luxscoring::groupLength;
+    std::array<int32_t, 16 * groupLength> products;
+    std::array<float, products.size()> cosines;
+    const uint32_t end = std::min(_scope.end, static_cast<uint32_t>(_scales.size()));
+    for (uint32_t first = _scope.first; first < end; first += products.size()) {
+      if (_cancelled()) {
         return false;
       }
-      if (_lexical[place] == 0) {
-        _take(place, 0);
+      const size_t count = std::min<size_t>(end - first, products.size());
+      const size_t length = _plan.latent.size();
+      LUXInnerProducts(_plan.latent.data(), _vectors + first * length, length, count,
+                       products.data());
+      cosines.fill(0);
+      for (size_t i = 0; i < count; ++i) {
+        cosines[i] = static_cast<float>(products[i]) * _plan.latentScale * _scales[first + i];
+      }
+      for (size_t group = 0; group < count; group += groupLength) {
+        const float least = std::max(_best.threshold() / _meaning, leastScore);
+        for (uint32_t bits = luxscoring::scoresWithin(cosines.data() + group, least, everything);
+             bits != 0; bits &= bits - 1) {
+          const size_t i = group + static_cast<size_t>(std::countr_zero(bits));
+          if (_lexical[first - _scope.first + i] == 0) {
+            _best.add(rankOfPage(first + static_cast<uint32_t>(i), _scope),
+                      _meaning * _clamped(cosines[i]));
+          }
+        }
+      }
+    }
+    return true;
+  }
+
+  // Looks at the neighbourhoods whose centres are nearest to the query, until that are pages enough
+  // to choose among.
+  bool _takeNeighbours() {
+    LUXBest nearest(_view.neighbourhoodCount());
+    for (uint32_t i = 0; i < _view.neighbourhoodCount(); ++i) {
+      nearest.add(i, _cosine(_view.neighbourhoodCentre(i)));
+    }
+    const size_t enough = std::max(neighboursWanted * _count, fewestNeighbours);
+    size_t seen = 0;
+    for (const LUXBest::Item& item : nearest.sorted()) {
+      if (seen >= enough) {
+        break;
+      }
+      if (_cancelled()) {
+        return false;
+      }
+      for (const uint32_t page : _view.pagesOfNeighbourhood(item.number)) {
+        const uint32_t place = page - _scope.first;
+        if (place >= _scope.end - _scope.first || _lexical[place] != 0) {
+          continue;
+        }
+        ++seen;
+        if (const float score = _meaning * _cosine(page); score > 0) {
+          _best.add(rankOfPage(page, _scope), score);
+        }
       }
     }
     return true;
@@ -204,11 +263,18 @@ class Search {
   // Of those places that fill up the last group.
   static constexpr float filling = -1;
   static constexpr float roundingReserve = 1e-6F;
+  // How many pages are looked at for each that is wanted, and at least.
+  static constexpr size_t neighboursWanted = 8;
+  static constexpr size_t fewestNeighbours = 1024;
 
   const LUXModelView& _view;
   const LUXScoringPlan& _plan;
   const LUXPageScope& _scope;
   const LUXIsCancelled& _isCancelled;
+  const LUXInnerProductFunction _innerProduct = LUXFastestInnerProduct();
+  const int8_t* const _vectors;
+  // Empty where the query or the model has no meaning, so that cosines are 0.
+  const std::span<const float> _scales;
   const size_t _count;
   // What the cosine and the words count for.
   const float _meaning;

@@ -28,6 +28,25 @@ TEST(LUXInnerProduct, IsTheSameWithAndWithoutWideInstructions) {
   }
 }
 
+TEST(LUXInnerProduct, OfManyVectorsIsThatOfEach) {
+  std::mt19937 random(6);
+  for (const size_t length : {size_t{32}, size_t{64}, size_t{320}}) {
+    const auto vector = randomVector(length, random);
+    for (size_t count = 0; count <= 9; ++count) {
+      const auto others = randomVector(length * count, random);
+      std::vector<int32_t> products(count);
+      std::vector<int32_t> plain(count);
+      LUXInnerProducts(vector.data(), others.data(), length, count, products.data());
+      LUXPlainInnerProducts(vector.data(), others.data(), length, count, plain.data());
+      for (size_t i = 0; i < count; ++i) {
+        EXPECT_EQ(products[i],
+                  LUXPlainInnerProduct(vector.data(), others.data() + i * length, length));
+        EXPECT_EQ(products[i], plain[i]);
+      }
+    }
+  }
+}
+
 TEST(LUXInnerProduct, HoldsTheLargestNumbers) {
   const std::vector<int8_t> high(320, 127);
   const std::vector<int8_t> low(320, -127);
