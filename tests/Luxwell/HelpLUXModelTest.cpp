@@ -367,23 +367,30 @@ TEST_F(HelpLUXModelFile, LeftoversOfProcessesThatHaveEndedAreDeleted) {
 }
 
 TEST_F(HelpLUXModelFile, ABuildThatIsKilledAtAnyMomentLeavesAWholeModel) {
-  save(*open(), "old");
-  const std::vector<tests::ModelPage> pages = tests::randomModelPages(60, 30, 1);
+  const std::vector<tests::ModelPage> pages = tests::randomModelPages(12, 12, 1);
+  const auto build = [&](const std::string& book) {
+    const auto model = open();
+    model->reset();
+    model->addHelpbookID(book);
+    tests::addPages(*model, pages);
+    return model->saveWithOptions({});
+  };
+  // How long it takes here, so that the children are killed before, in and after it.
+  ASSERT_TRUE(build("old"));
+  const auto start = std::chrono::steady_clock::now();
+  ASSERT_TRUE(build("old"));
+  const auto duration = std::chrono::steady_clock::now() - start;
   size_t replaced = 0;
   for (unsigned round = 0; round < 100; ++round) {
     const pid_t child = ::fork();
     if (child == 0) {
-      // Builds one model after another until it is killed.
-      const auto model = open();
       while (true) {
-        model->reset();
-        model->addHelpbookID("new" + std::to_string(round));
-        tests::addPages(*model, pages);
-        model->saveWithOptions({});
+        build("new" + std::to_string(round));
       }
     }
     ASSERT_GT(child, 0);
-    std::this_thread::sleep_for(std::chrono::microseconds(1 + round * 7919 % 20011));
+    // Any order of the numbers from 0 to 100 will do.
+    std::this_thread::sleep_for(duration * (round * 37 % 101) / 67);
     ASSERT_EQ(::kill(child, SIGKILL), 0);
     ASSERT_EQ(::waitpid(child, nullptr, 0), child);
     const auto model = open();
