@@ -64,6 +64,7 @@ class Search {
       return {};
     }
     std::vector<LUXScoredPage> pages;
+    pages.reserve(_count);
     for (const LUXBest::Item& item : _best.sorted()) {
       pages.push_back({pageOfRank(item.number), item.score});
     }
@@ -115,7 +116,7 @@ class Search {
 
   void _findMaxima() {
     _maxima.resize(_lexical.size() / luxscoring::groupLength);
-    luxscoring::findGroupMaxima(_lexical.data(), _maxima.size(), _maxima.data());
+    _highest = luxscoring::findGroupMaxima(_lexical.data(), _maxima.size(), _maxima.data());
   }
 
   // A score that at least `_count` pages reach, and not many more; the least score that a page with
@@ -123,19 +124,20 @@ class Search {
   // it, so many pages do; and the best pages seldom share a group. Groups are counted by classes of
   // scores, which is quicker than putting them in order and good enough.
   float _lowerBoundOfBest() const {
-    const float highest = *std::max_element(_maxima.begin(), _maxima.end());
-    if (_maxima.size() < _count || !(highest > leastScore && highest < everything)) {
+    if (_maxima.size() < _count || !(_highest > leastScore && _highest < everything)) {
       return leastScore;
     }
     constexpr size_t classCount = 256;
-    const float scale = static_cast<float>(classCount - 1) / highest;
-    std::array<uint32_t, classCount> groups{};
-    for (const float maximum : _maxima) {
-      ++groups[static_cast<size_t>(std::max(maximum, 0.0F) * scale)];
+    const float scale = static_cast<float>(classCount - 1) / _highest;
+    // Two tables in turns: counting in the same place twice in a row is slow.
+    std::array<std::array<uint32_t, classCount>, 2> groups{};
+    for (size_t i = 0; i < _maxima.size(); i += 2) {
+      ++groups[0][static_cast<size_t>(static_cast<int>(std::max(_maxima[i], 0.0F) * scale))];
+      ++groups[1][static_cast<size_t>(static_cast<int>(std::max(_maxima[i + 1], 0.0F) * scale))];
     }
     size_t counted = 0;
     for (size_t i = classCount - 1; i > 0; --i) {
-      counted += groups[i];
+      counted += groups[0][i] + groups[1][i];
       if (counted >= _count) {
         return std::max(static_cast<float>(i) / scale * (1 - roundingReserve), leastScore);
       }
@@ -155,34 +157,50 @@ class Search {
     return _clamped(static_cast<float>(product) * _plan.latentScale * _scales[page]);
   }
 
-  void _take(size_t place, float lexical) {
-    const uint32_t page = _scope.first + static_cast<uint32_t>(place);
-    _best.add(rankOfPage(page, _scope), _wordShare * lexical + _meaning * _cosine(page));
+  // Takes a page, some time later: its vector is called for and used when some more pages have
+  // followed, since memory is slow and the vectors of pages lie far apart.
+  void _take(uint32_t page, float lexical) {
+    if (page < _scales.size()) {
+      const int8_t* const vector = _vectors + page * _plan.latent.size();
+      for (size_t i = 0; i < _plan.latent.size(); i += cacheLineLength) {
+        __builtin_prefetch(vector + i);
+      }
+    }
+    _waiting[_waitingCount++] = {page, lexical};
+    if (_waitingCount == _waiting.size()) {
+      _takeWaiting();
+    }
+  }
+
+  void _takeWaiting() {
+    for (size_t i = 0; i < _waitingCount; ++i) {
+      const auto [page, lexical] = _waiting[i];
+      _best.add(rankOfPage(page, _scope), _wordShare * lexical + _meaning * _cosine(page));
+    }
+    _waitingCount = 0;
   }
 
   // Takes the pages with a lexical score from `least` to below `end`; `least` rises as better pages
   // are found. False when cancelled.
   bool _takeBetween(float least, float end) {
-    using luxscoring::groupLength;
+    constexpr size_t unit = 4 * luxscoring::groupLength;
     float threshold = _best.threshold();
-    for (size_t group = 0; group < _maxima.size(); ++group) {
-      if (group % (stepLength / groupLength) == 0 && _cancelled()) {
+    for (size_t first = 0; first < _lexical.size(); first += unit) {
+      if (first % stepLength == 0 && _cancelled()) {
         return false;
       }
-      if (_maxima[group] < least) {
-        continue;
-      }
-      const size_t first = group * groupLength;
-      for (uint32_t bits = luxscoring::scoresWithin(_lexical.data() + first, least, end); bits != 0;
-           bits &= bits - 1) {
+      uint64_t bits = luxscoring::scoresWithinFourGroups(
+          _lexical.data() + first, _maxima.data() + first / luxscoring::groupLength, least, end);
+      for (; bits != 0; bits &= bits - 1) {
         const size_t place = first + static_cast<size_t>(std::countr_zero(bits));
-        _take(place, _lexical[place]);
+        _take(_scope.first + static_cast<uint32_t>(place), _lexical[place]);
       }
       if (_best.threshold() != threshold) {
         threshold = _best.threshold();
         least = std::max(least, _leastWithinReach());
       }
     }
+    _takeWaiting();
     return true;
   }
 
@@ -244,11 +262,10 @@ class Search {
           continue;
         }
         ++seen;
-        if (const float score = _meaning * _cosine(page); score > 0) {
-          _best.add(rankOfPage(page, _scope), score);
-        }
+        _take(page, 0);
       }
     }
+    _takeWaiting();
     return true;
   }
 
@@ -263,6 +280,7 @@ class Search {
   // Of those places that fill up the last group.
   static constexpr float filling = -1;
   static constexpr float roundingReserve = 1e-6F;
+  static constexpr size_t cacheLineLength = 64;
   // How many pages are looked at for each that is wanted, and at least.
   static constexpr size_t neighboursWanted = 8;
   static constexpr size_t fewestNeighbours = 1024;
@@ -280,8 +298,11 @@ class Search {
   const float _meaning;
   const float _wordShare;
   LUXBest _best;
+  std::array<LUXScoredPage, 16> _waiting;
+  size_t _waitingCount = 0;
   std::vector<float> _lexical;
   std::vector<float> _maxima;
+  float _highest = 0;
 };
 
 float stretched(float score, size_t termCount) {

@@ -154,34 +154,15 @@ class Planner {
     }
     _sum.resize(_view.stride());
     const float weight = std::log2(1 + static_cast<float>(count)) * _view.termScale(stem);
-    // In blocks, whose fixed length lets compilers handle several numbers at a time.
-    for (size_t block = 0; block < _sum.size(); block += LUXVectorBlock) {
-      for (size_t i = 0; i < LUXVectorBlock; ++i) {
-        _sum[block + i] += weight * static_cast<float>(vector[block + i]);
-      }
-    }
+    LUXAddScaled(_sum.data(), vector, weight, _sum.size());
   }
 
   void _finishLatent() {
-    float largest = 0;
-    for (const float component : _sum) {
-      largest = std::max(largest, std::fabs(component));
+    _plan.latent.resize(_sum.size());
+    _plan.latentScale = LUXQuantize(_sum.data(), _plan.latent.data(), _sum.size());
+    if (_plan.latentScale == 0) {
+      _plan.latent.clear();
     }
-    // Written so that what is not a number, which a damaged model may hold, is left out as well.
-    if (!(largest > 0 && largest < std::numeric_limits<float>::infinity())) {
-      return;
-    }
-    _plan.latent.reserve(_sum.size());
-    const float scale = 127 / largest;
-    int32_t squares = 0;
-    for (const float component : _sum) {
-      const float scaled = component * scale;
-      const float away = scaled < 0 ? -0.5F : 0.5F;
-      const int rounded = scaled == scaled ? static_cast<int>(scaled + away) : 0;
-      squares += rounded * rounded;
-      _plan.latent.push_back(static_cast<int8_t>(rounded));
-    }
-    _plan.latentScale = 1 / std::sqrt(static_cast<float>(squares));
   }
 
   const LUXModelView& _view;

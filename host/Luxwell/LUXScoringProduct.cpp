@@ -1,8 +1,19 @@
 #include "host/Luxwell/LUXScoringProduct.h"
 
+#include <algorithm>
+#include <cmath>
+
 #if defined(__x86_64__)
 #include <immintrin.h>
 #endif
+
+namespace {
+
+// Nothing smaller is divided by.
+constexpr float smallestSum = 1e-30F;
+constexpr float largestSum = 1e30F;
+
+}  // namespace
 
 int32_t LUXPlainInnerProduct(const int8_t* a, const int8_t* b, size_t length) noexcept {
   int32_t sum = 0;
@@ -108,4 +119,110 @@ LUXInnerProductFunction LUXFastestInnerProduct() noexcept { return LUXPlainInner
 
 int32_t LUXInnerProduct(const int8_t* a, const int8_t* b, size_t length) noexcept {
   return LUXFastestInnerProduct()(a, b, length);
+}
+
+// Both ways of these multiply first and add then, each rounded, and so give the same.
+
+#if defined(__SSE2__)
+
+namespace {
+
+// Sixteen small integers as four times four numbers.
+struct Sixteen {
+  explicit Sixteen(const int8_t* bytes) {
+    const __m128i all = _mm_loadu_si128(reinterpret_cast<const __m128i*>(bytes));
+    const __m128i zero = _mm_setzero_si128();
+    // Moved to the upper half of wider integers and back, which repeats the sign.
+    const __m128i low = _mm_srai_epi16(_mm_unpacklo_epi8(zero, all), 8);
+    const __m128i high = _mm_srai_epi16(_mm_unpackhi_epi8(zero, all), 8);
+    numbers[0] = _mm_cvtepi32_ps(_mm_srai_epi32(_mm_unpacklo_epi16(zero, low), 16));
+    numbers[1] = _mm_cvtepi32_ps(_mm_srai_epi32(_mm_unpackhi_epi16(zero, low), 16));
+    numbers[2] = _mm_cvtepi32_ps(_mm_srai_epi32(_mm_unpacklo_epi16(zero, high), 16));
+    numbers[3] = _mm_cvtepi32_ps(_mm_srai_epi32(_mm_unpackhi_epi16(zero, high), 16));
+  }
+
+  __m128 numbers[4];
+};
+
+float largestMagnitude(const float* sum, size_t length) noexcept {
+  const __m128 sign = _mm_set1_ps(-0.0F);
+  __m128 largest = _mm_setzero_ps();
+  for (size_t i = 0; i < length; i += 4) {
+    // In this order the maximum with what is no number is the other one.
+    largest = _mm_max_ps(_mm_andnot_ps(sign, _mm_loadu_ps(sum + i)), largest);
+  }
+  float lanes[4];
+  _mm_storeu_ps(lanes, largest);
+  return *std::max_element(lanes, lanes + 4);
+}
+
+__m128i roundedProducts(const float* sum, __m128 scale) noexcept {
+  const __m128 scaled = _mm_mul_ps(_mm_loadu_ps(sum), scale);
+  const __m128 half = _mm_or_ps(_mm_and_ps(scaled, _mm_set1_ps(-0.0F)), _mm_set1_ps(0.5F));
+  const __m128 isNumber = _mm_cmpord_ps(scaled, scaled);
+  return _mm_cvttps_epi32(_mm_and_ps(isNumber, _mm_add_ps(scaled, half)));
+}
+
+void quantizeBy(float scale, const float* sum, int8_t* vector, size_t length) noexcept {
+  const __m128 four = _mm_set1_ps(scale);
+  for (size_t i = 0; i < length; i += 16) {
+    const __m128i low =
+        _mm_packs_epi32(roundedProducts(sum + i, four), roundedProducts(sum + i + 4, four));
+    const __m128i high =
+        _mm_packs_epi32(roundedProducts(sum + i + 8, four), roundedProducts(sum + i + 12, four));
+    _mm_storeu_si128(reinterpret_cast<__m128i*>(vector + i), _mm_packs_epi16(low, high));
+  }
+}
+
+}  // namespace
+
+void LUXAddScaled(float* sum, const int8_t* vector, float weight, size_t length) noexcept {
+  const __m128 factor = _mm_set1_ps(weight);
+  for (size_t i = 0; i < length; i += 16) {
+    const Sixteen sixteen(vector + i);
+    for (size_t part = 0; part < 4; ++part) {
+      float* const four = sum + i + 4 * part;
+      _mm_storeu_ps(four,
+                    _mm_add_ps(_mm_loadu_ps(four), _mm_mul_ps(factor, sixteen.numbers[part])));
+    }
+  }
+}
+
+#else
+
+namespace {
+
+float largestMagnitude(const float* sum, size_t length) noexcept {
+  float largest = 0;
+  for (size_t i = 0; i < length; ++i) {
+    largest = std::max(largest, std::fabs(sum[i]));
+  }
+  return largest;
+}
+
+void quantizeBy(float scale, const float* sum, int8_t* vector, size_t length) noexcept {
+  for (size_t i = 0; i < length; ++i) {
+    const float scaled = sum[i] * scale;
+    const float rounded = scaled + (scaled < 0 ? -0.5F : 0.5F);
+    vector[i] = static_cast<int8_t>(scaled == scaled ? static_cast<int>(rounded) : 0);
+  }
+}
+
+}  // namespace
+
+void LUXAddScaled(float* sum, const int8_t* vector, float weight, size_t length) noexcept {
+  for (size_t i = 0; i < length; ++i) {
+    sum[i] += weight * static_cast<float>(vector[i]);
+  }
+}
+
+#endif
+
+float LUXQuantize(const float* sum, int8_t* vector, size_t length) noexcept {
+  const float largest = largestMagnitude(sum, length);
+  if (!(largest > smallestSum && largest < largestSum)) {
+    return 0;
+  }
+  quantizeBy(127 / largest, sum, vector, length);
+  return 1 / std::sqrt(static_cast<float>(LUXInnerProduct(vector, vector, length)));
 }

@@ -1,4 +1,4 @@
-// Inner products of small integers: the innermost loop of comparing meanings.
+// Vectors of small integers: the innermost loops of comparing meanings.
 #pragma once
 
 #include <cstddef>
@@ -25,3 +25,12 @@ int32_t LUXInnerProduct(const int8_t* a, const int8_t* b, size_t length) noexcep
 void LUXPlainInnerProducts(const int8_t* vector, const int8_t* others, size_t length, size_t count,
                            int32_t* products) noexcept;
 int32_t LUXPlainInnerProduct(const int8_t* a, const int8_t* b, size_t length) noexcept;
+
+/// Adds weight * vector[i] to sum[i]. `length` is a multiple of LUXVectorBlock.
+void LUXAddScaled(float* sum, const int8_t* vector, float weight, size_t length) noexcept;
+
+/// Makes small integers of a sum, the largest component 127 or -127, and gives what makes their
+/// vector one of length 1. 0, with nothing written, when no component is a number other than 0 that
+/// is neither infinite nor too small to be divided by; of several, those that are no number count
+/// as 0. `length` is a multiple of LUXVectorBlock.
+float LUXQuantize(const float* sum, int8_t* vector, size_t length) noexcept;
