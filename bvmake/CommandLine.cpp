@@ -54,7 +54,11 @@ ParsedCommandLine parseCommandLine(const std::vector<std::string>& arguments) {
       ->type_name("N")
       ->check(CLI::Range(size_t{0}, longestMinimumTermLength).description(""));
   app.add_flag("--append-LUX-only", create.appendLUXOnly,
-               "Add only semantic data to the file there (refused by this version)");
+               "Add semantic data to the file there and change nothing else in it");
+  app.add_option(
+         "--language", create.language,
+         "The language of the pages (\"de\", \"pt-BR\", \"German\"); without, it is found out")
+      ->type_name("TAG");
   app.add_flag("--lowered-priority", create.loweredPriority,
                "Give way to other programs, on the processor and on the disk");
   app.add_flag("-v,--verbose", command.verbosity,

@@ -60,6 +60,9 @@ void HTMLPageBuilder::startElement(std::string_view name, Attributes attributes)
   if ((traits & elementtraits::meta) != 0) {
     _readMeta(attributes);
   }
+  if ((traits & elementtraits::root) != 0) {
+    _readLanguage(attributes);
+  }
   if ((traits & elementtraits::title) != 0 && !_titleDone) {
     _inTitle = true;
   }
@@ -188,6 +191,15 @@ void HTMLPageBuilder::_readMeta(Attributes attributes) {
     addKeywords(content, _page.keywords);
   } else if (equalsIgnoringCase(kind, "robots")) {
     _page.excludedFromSearch = _page.excludedFromSearch || forbidsIndexing(content);
+  }
+}
+
+void HTMLPageBuilder::_readLanguage(Attributes attributes) {
+  for (const char* const name : {"lang", "xml:lang"}) {
+    const char* tag = attribute(attributes, name);
+    if (_page.language.empty() && tag != nullptr) {
+      _page.language = collapsedText(tag);
+    }
   }
 }
 

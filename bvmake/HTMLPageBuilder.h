@@ -54,6 +54,7 @@ class HTMLPageBuilder {
   bool _isHidden(ElementTraits traits, Attributes attributes) const;
   void _collectAnchors(ElementTraits traits, Attributes attributes);
   void _readMeta(Attributes attributes);
+  void _readLanguage(Attributes attributes);
   void _startLink();
   void _endLink();
   void _finishBlock();

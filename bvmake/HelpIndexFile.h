@@ -27,7 +27,15 @@ inline constexpr const char* luxIndexData = "LUXIndexData";
 
 /// The bytes of a help-index file for pages that lie on the disk. `anchors` is a dictionary, or
 /// absent for a file without anchor table.
-platform::Data helpIndexFile(const platform::Data& indexData, const platform::Value& anchors);
+platform::Data helpIndexFile(const platform::Data& indexData, const platform::Data& luxIndexData,
+                             const platform::Value& anchors);
+
+/// The bytes of a help-index file with other semantic data, put in the place of the old or, where
+/// there are none, at the end; all other content is written as it was, whoever wrote it. Absent,
+/// with `error` set when given, for bytes that are no archive of a dictionary.
+std::optional<platform::Data> helpIndexFileWithLUXIndexData(const platform::Data& file,
+                                                            const platform::Data& luxIndexData,
+                                                            platform::Error* error = nullptr);
 
 /// The dictionary of the file at `path`; its data values are slices of the mapped file. Absent,
 /// with `error` set when given, when the file cannot be read or is no archive of a dictionary.

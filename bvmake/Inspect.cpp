@@ -9,6 +9,7 @@
 #include "SearchKit/IndexReader.h"
 #include "bvmake/HelpIndexFile.h"
 #include "bvmake/Report.h"
+#include "host/Luxwell/HelpLUXIndex.h"
 
 namespace bvmake {
 
@@ -72,6 +73,7 @@ class Inspection {
       }
     }
     _showIndex();
+    _showSemanticData();
     _showAnchors();
     if (_options.term) {
       _showTerm(*_options.term);
@@ -114,6 +116,35 @@ class Inspection {
     for (const searchkit::SectionInfo& section : summary.sections) {
       _line("  section {}: {} bytes{}", section.name, section.length,
             section.isIntact ? "" : ", DAMAGED");
+    }
+  }
+
+  void _showSemanticData() {
+    const platform::Data* bytes = _root[helpindexkeys::luxIndexData].dataIf();
+    if (bytes == nullptr) {
+      _line("semantic data: none");
+      return;
+    }
+    const auto index = HelpLUXIndex::initWithVersionedData(*bytes);
+    const auto sections = LUXSectionedData::read(*bytes);
+    if (index == nullptr || !sections) {
+      _line("semantic data: {} bytes that cannot be read", bytes->length());
+      return;
+    }
+    const platform::Value& attributes = index->attributes();
+    const std::vector<std::string> keys = index->documentKeys();
+    const LUXTokenCounts first =
+        keys.empty() ? LUXTokenCounts() : index->tokenCountsForKey(keys[0]);
+    _line("semantic data: {} pages, {} tokens, {} bytes", keys.size(), first.table()->size(),
+          bytes->length());
+    _line("  language {}, thresholds {:.3f} and {:.3f}{}",
+          printable(attributes[HelpLUXIndexAttributeLanguageKey].stringValue().value_or("none")),
+          attributes[HelpLUXIndexAttributeBigramThresholdKey].doubleValue(),
+          attributes[HelpLUXIndexAttributeTrigramThresholdKey].doubleValue(),
+          attributes[HelpLUXIndexAttributeIgnoreLUXKey].boolValue() ? ", not to be used" : "");
+    for (const LUXSection& section : sections->sections()) {
+      _line("  section {}: {} bytes{}", section.type, section.bytes.length(),
+            section.checksumMatches() ? "" : ", DAMAGED");
     }
   }
 

@@ -25,6 +25,8 @@ constexpr size_t maximumNamespaceCount = 256;
 
 constexpr size_t longestEntity = 4096;
 
+constexpr std::string_view xmlNamespace = "http://www.w3.org/XML/1998/namespace";
+
 /// An entity as the parser wants to be handed it: posing as a predefined one, whose text it takes
 /// as it is and never looks into.
 struct Entity {
@@ -94,6 +96,7 @@ void startElement(void* context, const xmlChar* name, const xmlChar*, const xmlC
       session.stop("too many name spaces");
       return;
     }
+    const bool isRoot = session.namespaces.size() == 1;
     std::string_view id;
     std::string_view type;
     for (int i = 0; i < attributeCount; ++i, attributes += 5) {
@@ -104,9 +107,10 @@ void startElement(void* context, const xmlChar* name, const xmlChar*, const xmlC
         id = value;
       } else if (attributes[2] == nullptr && view(attributes[0]) == "type") {
         type = value;
+      } else if (isRoot && view(attributes[2]) == xmlNamespace && view(attributes[0]) == "lang") {
+        session.builder.setLanguage(value);
       }
     }
-    const bool isRoot = session.namespaces.size() == 1;
     session.builder.startElement(view(namespaceURI), view(name), id, type);
     if (isRoot && !session.builder.isMallardPage()) {
       session.stop("no Mallard page");

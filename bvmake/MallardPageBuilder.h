@@ -19,6 +19,8 @@ class MallardPageBuilder {
   /// `id` is the element's identifier, empty when it has none; `type` its attribute of that name.
   void startElement(std::string_view namespaceURI, std::string_view name, std::string_view id,
                     std::string_view type);
+  /// The language of the text, from the page's own element.
+  void setLanguage(std::string_view tag) { _page.language = collapsedText(tag); }
   void endElement();
   void characters(std::string_view text);
 

@@ -36,6 +36,8 @@ struct Page {
   std::vector<TextBlock> body;
   /// Names by which places in the page can be addressed, each once, in document order.
   std::vector<std::string> anchors;
+  /// The tag of the language that the page says it is in, as written; empty when it does not say.
+  std::string language;
   /// The page asks not to be found.
   bool excludedFromSearch = false;
 

@@ -15,6 +15,7 @@
 #include "bvmake/PageReader.h"
 #include "bvmake/Priority.h"
 #include "bvmake/Report.h"
+#include "bvmake/SemanticData.h"
 #include "bvmake/Summary.h"
 #include "platform/Environment.h"
 #include "platform/Exception.h"
@@ -29,10 +30,11 @@ std::string nameFromPath(const std::string& path) {
   return name.substr(0, name.rfind('.'));
 }
 
-searchkit::Document documentFromPage(const std::string& path, Page page, std::string abstract) {
+searchkit::Document documentFromPage(const std::string& path, std::string title, Page page,
+                                     std::string abstract) {
   searchkit::Document document;
   document.path = path;
-  document.title = page.title.empty() ? nameFromPath(path) : std::move(page.title);
+  document.title = std::move(title);
   document.headings = std::move(page.headings);
   document.headings.insert(document.headings.end(), page.keywords.begin(), page.keywords.end());
   if (!page.description.empty()) {
@@ -53,11 +55,12 @@ class Run {
       : _options(options),
         _report(report),
         _files(platform::Environment::current()->files),
-        _writer({options.minimumTermLength}) {}
+        _writer({options.minimumTermLength}),
+        _semanticData(options.folder, options.language) {}
 
   Outcome run() {
-    if (_options.appendLUXOnly) {
-      return _fail("--append-LUX-only: this version has no semantic data to append");
+    if (!_options.language.empty() && !SemanticData::isLanguage(_options.language)) {
+      return _fail(fmt::format("no language that is known here: {}", _options.language));
     }
     if (_options.loweredPriority) {
       if (const auto error = lowerPriority()) {
@@ -73,6 +76,9 @@ class Run {
     if (!_prepareOutput()) {
       return _outcome;
     }
+    if (_options.appendLUXOnly && !readHelpIndexFile(_options.outputPath, &error)) {
+      return _failToAppend(error);
+    }
     for (const FoundPage& page : *pages) {
       _addFile(page);
     }
@@ -84,6 +90,11 @@ class Run {
     _report.error(why);
     _outcome.exitCode = ExitCode::failure;
     return _outcome;
+  }
+
+  Outcome _failToAppend(const platform::Error& error) {
+    return _fail(
+        fmt::format("cannot add semantic data to {}: {}", _options.outputPath, error.description));
   }
 
   bool _prepareOutput() {
@@ -131,13 +142,16 @@ class Run {
   }
 
   void _addPage(const FoundPage& found, Page page) {
-    if (page.excludedFromSearch) {
-      _report.progress(2, fmt::format("{}: asks not to be indexed", found.path));
+    if (!page.hasText() && page.anchors.empty()) {
+      _report.progress(2, fmt::format("{}: nothing in it", found.path));
       ++_outcome.leftOutCount;
       return;
     }
-    if (!page.hasText() && page.anchors.empty()) {
-      _report.progress(2, fmt::format("{}: nothing in it", found.path));
+    std::string title = page.title.empty() ? nameFromPath(found.path) : page.title;
+    if (page.excludedFromSearch) {
+      // Its words are those of the book all the same, and say how the book uses them.
+      _semanticData.addPage(found.path, title, page.description, page);
+      _report.progress(2, fmt::format("{}: asks not to be indexed", found.path));
       ++_outcome.leftOutCount;
       return;
     }
@@ -146,10 +160,14 @@ class Run {
       abstract = _summarizer.summary(page);
     }
     const bool hasAbstract = !abstract.empty();
-    const std::vector<std::string> anchors = std::move(page.anchors);
-    _writer.add(documentFromPage(found.path, std::move(page), std::move(abstract)));
-    if (_options.anchors) {
-      _anchors.addPage(found.path, anchors);
+    _semanticData.addPage(found.path, title, abstract, page);
+    if (!_options.appendLUXOnly) {
+      const std::vector<std::string> anchors = std::move(page.anchors);
+      _writer.add(
+          documentFromPage(found.path, std::move(title), std::move(page), std::move(abstract)));
+      if (_options.anchors) {
+        _anchors.addPage(found.path, anchors);
+      }
     }
     _outcome.abstractCount += hasAbstract ? 1 : 0;
     ++_outcome.pageCount;
@@ -163,17 +181,34 @@ class Run {
       _report.warning(fmt::format("nothing to index in {}; the index is empty", _options.folder));
     }
     _outcome.anchorCount = _anchors.count();
-    const platform::Data file =
-        helpIndexFile(_writer.finish(), _options.anchors ? _anchors.value() : platform::Value());
-    if (const auto error = _files->writeAtomically(_options.outputPath, file)) {
+    platform::Error why;
+    const std::optional<platform::Data> file = _file(&why);
+    if (!file) {
+      return _failToAppend(why);
+    }
+    if (const auto error = _files->writeAtomically(_options.outputPath, *file)) {
       return _fail(fmt::format("cannot write {}: {}", _options.outputPath, error->description));
     }
-    _outcome.outputBytes = file.length();
+    _outcome.outputBytes = file->length();
     _report.progress(
-        1, fmt::format("{}: {} pages ({} skipped, {} left out), {} anchors, {} bytes",
+        1, fmt::format("{}: {} pages ({} skipped, {} left out), {} anchors, language {}, {} bytes, "
+                       "of these {} of semantic data",
                        _options.outputPath, _outcome.pageCount, _outcome.skippedCount,
-                       _outcome.leftOutCount, _outcome.anchorCount, _outcome.outputBytes));
+                       _outcome.leftOutCount, _outcome.anchorCount, _semanticData.languageTag(),
+                       _outcome.outputBytes, _outcome.semanticBytes));
     return _outcome;
+  }
+
+  /// The bytes to write; absent, with `error` set, where the file to add to cannot be read.
+  std::optional<platform::Data> _file(platform::Error* error) {
+    const platform::Data semanticData = _semanticData.finish();
+    _outcome.semanticBytes = semanticData.length();
+    if (!_options.appendLUXOnly) {
+      return helpIndexFile(_writer.finish(), semanticData,
+                           _options.anchors ? _anchors.value() : platform::Value());
+    }
+    const auto former = _files->contentsMappedAtPath(_options.outputPath, error);
+    return former ? helpIndexFileWithLUXIndexData(*former, semanticData, error) : std::nullopt;
   }
 
   const CreateOptions& _options;
@@ -181,6 +216,7 @@ class Run {
   std::shared_ptr<platform::FileManager> _files;
   Outcome _outcome;
   searchkit::IndexWriter _writer;
+  SemanticData _semanticData;
   AnchorTable _anchors;
   Summarizer _summarizer;
 };

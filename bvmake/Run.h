@@ -30,8 +30,12 @@ struct CreateOptions {
   bool generateSummaries = false;
   /// Terms of fewer characters are left out of the keyword index.
   size_t minimumTermLength = 1;
-  /// Add only semantic data to the file that is there. Refused: there is no such data yet.
+  /// Add semantic data to the file that is there, in place of what it has of them, and leave
+  /// everything else in it as it is.
   bool appendLUXOnly = false;
+  /// The tag or name of the language that the pages are in; when empty it is found out
+  /// (SemanticData).
+  std::string language;
   /// Give way to all other programs, on the processor and on the disk. Holds for the whole process
   /// from then on.
   bool loweredPriority = false;
@@ -40,7 +44,7 @@ struct CreateOptions {
 /// What one run did.
 struct Outcome {
   ExitCode exitCode = ExitCode::success;
-  /// Pages in the index.
+  /// Pages in the keyword index; with appendLUXOnly in the semantic data.
   size_t pageCount = 0;
   /// Pages that could not be read and were reported.
   size_t skippedCount = 0;
@@ -52,6 +56,8 @@ struct Outcome {
   size_t anchorCount = 0;
   /// Bytes of all pages read.
   uint64_t inputBytes = 0;
+  /// Bytes of the semantic data.
+  uint64_t semanticBytes = 0;
   /// Bytes of the file written.
   uint64_t outputBytes = 0;
 };

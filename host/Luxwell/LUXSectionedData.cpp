@@ -11,31 +11,52 @@
 
 namespace {
 
-constexpr std::string_view magic = "LUXINDEX";
 constexpr size_t headerLength = 32;
 constexpr size_t checkedHeaderLength = 24;
 constexpr size_t entryLength = 32;
 constexpr size_t alignment = 8;
 
-constexpr std::array<uint32_t, 256> makeChecksumTable() {
-  std::array<uint32_t, 256> table{};
-  for (uint32_t i = 0; i < table.size(); ++i) {
+using ChecksumTables = std::array<std::array<uint32_t, 256>, 8>;
+
+constexpr ChecksumTables makeChecksumTables() {
+  ChecksumTables tables{};
+  for (uint32_t i = 0; i < 256; ++i) {
     uint32_t value = i;
     for (int bit = 0; bit < 8; ++bit) {
       value = (value & 1) != 0 ? (value >> 1) ^ 0xEDB88320U : value >> 1;
     }
-    table[i] = value;
+    tables[0][i] = value;
   }
-  return table;
+  for (size_t ahead = 1; ahead < tables.size(); ++ahead) {
+    for (size_t i = 0; i < 256; ++i) {
+      const uint32_t value = tables[ahead - 1][i];
+      tables[ahead][i] = (value >> 8) ^ tables[0][value & 0xFF];
+    }
+  }
+  return tables;
 }
 
-constexpr std::array<uint32_t, 256> checksumTable = makeChecksumTable();
+constexpr ChecksumTables checksumTables = makeChecksumTables();
 
-// CRC-32 as in IEEE 802.3, one table look-up a byte. `former` continues an earlier stretch.
+// CRC-32 as in IEEE 802.3, eight bytes at a time (M. Kounavis, F. Berry, "A systematic approach to
+// building high performance software-based CRC generators", 2005): models have many bytes.
+// `former` continues an earlier stretch.
 uint32_t checksumOf(const uint8_t* bytes, size_t length, uint32_t former = 0) noexcept {
+  const ChecksumTables& tables = checksumTables;
   uint32_t value = ~former;
+  for (; length >= 8; bytes += 8, length -= 8) {
+    uint64_t word = 0;
+    for (unsigned i = 0; i < 8; ++i) {
+      word |= static_cast<uint64_t>(bytes[i]) << (8 * i);
+    }
+    word ^= value;
+    value = 0;
+    for (unsigned i = 0; i < 8; ++i) {
+      value ^= tables[7 - i][(word >> (8 * i)) & 0xFF];
+    }
+  }
   for (size_t i = 0; i < length; ++i) {
-    value = checksumTable[(value ^ bytes[i]) & 0xFF] ^ (value >> 8);
+    value = tables[0][(value ^ bytes[i]) & 0xFF] ^ (value >> 8);
   }
   return ~value;
 }
@@ -94,8 +115,8 @@ bool LUXSection::checksumMatches() const noexcept {
   return checksumOf(bytes.bytes(), bytes.length()) == checksum;
 }
 
-LUXSectionedData::LUXSectionedData(std::vector<LUXSection> sections)
-    : _sections(std::move(sections)) {
+LUXSectionedData::LUXSectionedData(std::vector<LUXSection> sections, const LUXContainerForm& form)
+    : _form(form), _sections(std::move(sections)) {
   if (_sections.size() > maximumSectionCount) {
     throw platform::Exception(platform::invalidArgumentException, "too many sections");
   }
@@ -110,15 +131,16 @@ LUXSectionedData::LUXSectionedData(std::vector<LUXSection> sections)
   }
 }
 
-std::optional<LUXSectionedData> LUXSectionedData::read(const platform::Data& data) {
-  if (data.length() < headerLength || !data.view().starts_with(magic)) {
+std::optional<LUXSectionedData> LUXSectionedData::read(const platform::Data& data,
+                                                       const LUXContainerForm& form) {
+  if (data.length() < headerLength || !data.view().starts_with(form.magic)) {
     return std::nullopt;
   }
   const uint8_t* bytes = data.bytes();
-  LUXSectionedData result;
-  result._minorVersion = readInteger<uint16_t>(bytes + 10);
+  LUXSectionedData result(form);
+  result._form.minorVersion = readInteger<uint16_t>(bytes + 10);
   const auto count = readInteger<uint32_t>(bytes + 12);
-  if (readInteger<uint16_t>(bytes + 8) != majorVersion || count > maximumSectionCount ||
+  if (readInteger<uint16_t>(bytes + 8) != form.majorVersion || count > maximumSectionCount ||
       readInteger<uint64_t>(bytes + 16) != data.length()) {
     return std::nullopt;
   }
@@ -172,10 +194,10 @@ platform::Data LUXSectionedData::write() const {
     appendInteger(table, uint64_t{0});
     end = offset + section.bytes.length();
   }
-  std::string out{magic};
+  std::string out{_form.magic};
   out.reserve(end);
-  appendInteger(out, majorVersion);
-  appendInteger(out, _minorVersion);
+  appendInteger(out, _form.majorVersion);
+  appendInteger(out, _form.minorVersion);
   appendInteger(out, static_cast<uint32_t>(_sections.size()));
   appendInteger(out, end);
   const uint32_t headerChecksum = checksumOf(bytesOf(out), out.size());

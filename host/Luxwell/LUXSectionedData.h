@@ -1,9 +1,10 @@
-// The container of versioned semantic index data: a checked header, a table, and sections.
+// The container of semantic data, of a book or of a model: a checked header, a table, and sections.
 #pragma once
 
 #include <cstddef>
 #include <cstdint>
 #include <optional>
+#include <string_view>
 #include <vector>
 
 #include "platform/Data.h"
@@ -23,27 +24,42 @@ struct LUXSection {
   bool checksumMatches() const noexcept;
 };
 
+/// What the header of a container says of its content. Thread-safety: immutable.
+struct LUXContainerForm {
+  /// Eight bytes.
+  std::string_view magic;
+  uint16_t majorVersion = 1;
+  uint16_t minorVersion = 0;
+};
+
+/// One book's semantic data.
+inline constexpr LUXContainerForm LUXIndexForm{"LUXINDEX", 1, 1};
+
 /// Sections in order of type, each type once. docs/formats/lux-index.md describes the bytes.
 ///
 /// Reading takes time in proportion to the number of sections, not to their size, and copies no
 /// section: their bytes are slices of what was read. Thread-safety: immutable.
 class LUXSectionedData {
  public:
-  static constexpr uint16_t majorVersion = 1;
-  static constexpr uint16_t minorVersion = 0;
+  static constexpr uint16_t majorVersion = LUXIndexForm.majorVersion;
+  static constexpr uint16_t minorVersion = LUXIndexForm.minorVersion;
   static constexpr size_t maximumSectionCount = 64;
 
-  /// The sections of `data`; absent when it is no such container, of another major version, torn,
-  /// or followed by bytes that do not belong to it. Never throws for bad input.
-  static std::optional<LUXSectionedData> read(const platform::Data& data);
+  /// The sections of `data`; absent when it is no container of this form, of another major version,
+  /// torn, or followed by bytes that do not belong to it. Never throws for bad input.
+  static std::optional<LUXSectionedData> read(const platform::Data& data,
+                                              const LUXContainerForm& form = LUXIndexForm);
 
   /// New content of the present version. The sections are put in order of type. Throws
   /// platform::Exception "InvalidArgumentException" for a type that occurs twice and for more than
   /// maximumSectionCount sections.
-  explicit LUXSectionedData(std::vector<LUXSection> sections);
+  explicit LUXSectionedData(std::vector<LUXSection> sections,
+                            const LUXContainerForm& form = LUXIndexForm);
 
   /// The section of a type, null when there is none. Valid as long as this object lives.
   const LUXSection* sectionWithType(uint32_t type) const noexcept;
+
+  const std::vector<LUXSection>& sections() const noexcept { return _sections; }
 
   /// The bytes: sections in order of type, nothing between them but alignment. Checksums are
   /// written as they are, not made anew, so that damage stays visible; the minor version is kept,
@@ -51,8 +67,8 @@ class LUXSectionedData {
   platform::Data write() const;
 
  private:
-  LUXSectionedData() = default;
+  explicit LUXSectionedData(const LUXContainerForm& form) : _form(form) {}
 
-  uint16_t _minorVersion = minorVersion;
+  LUXContainerForm _form;
   std::vector<LUXSection> _sections;
 };

@@ -142,8 +142,8 @@ TEST(CommandLine, helpNamesEveryOptionAndSucceeds) {
   EXPECT_EQ(result.errorOutput, "");
   for (const char* option :
        {"--create", "--anchors", "--generate-summaries", "--file", "--min-term-length",
-        "--append-LUX-only", "--lowered-priority", "--verbose", "--inspect", "--term", "--anchor",
-        "--pages", "--version", "FOLDER", "Exit status"}) {
+        "--append-LUX-only", "--language", "--lowered-priority", "--verbose", "--inspect", "--term",
+        "--anchor", "--pages", "--version", "FOLDER", "Exit status"}) {
     EXPECT_THAT(result.output, HasSubstr(option));
   }
 }

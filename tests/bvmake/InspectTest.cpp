@@ -126,8 +126,9 @@ TEST_F(Inspect, archiveOfSomethingElseFails) {
 }
 
 TEST_F(Inspect, keywordIndexThatCannotBeOpenedFails) {
-  const std::string path =
-      _folder.write("x", helpIndexFile(platform::Data::copy("no index"), platform::Value()).view());
+  const std::string path = _folder.write(
+      "x",
+      helpIndexFile(platform::Data::copy("no index"), platform::Data(), platform::Value()).view());
   output(options(path), ExitCode::failure);
   EXPECT_THAT(_report.errors, ElementsAre(HasSubstr("cannot be opened")));
 }

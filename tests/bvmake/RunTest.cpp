@@ -185,8 +185,8 @@ TEST_F(Run, fileHasTheKeysOfALocalBook) {
   for (const auto& entry : *file.dictionaryIf()) {
     keys.push_back(entry.first);
   }
-  EXPECT_THAT(keys,
-              UnorderedElementsAre("SKI_INDEX_DATA", "SKI_ANCHOR_DATA", "SKI_USE_REMOTE_ROOT"));
+  EXPECT_THAT(keys, UnorderedElementsAre("SKI_INDEX_DATA", "SKI_ANCHOR_DATA", "SKI_USE_REMOTE_ROOT",
+                                         "LUXIndexData"));
   EXPECT_FALSE(file[helpindexkeys::useRemoteRoot].boolValue());
 }
 
@@ -313,15 +313,6 @@ TEST_F(Run, outputThatIsAPipeIsNotReplaced) {
   EXPECT_EQ(create().exitCode, ExitCode::failure);
   EXPECT_THAT(_report.errors, ElementsAre(HasSubstr("no regular file")));
   EXPECT_TRUE(std::filesystem::is_fifo(outputPath()));
-}
-
-TEST_F(Run, appendingSemanticDataIsRefusedAndTouchesNothing) {
-  page("a.html", "<p>word");
-  _folder.write("out/deeper/book.helpindex", "former");
-  options().appendLUXOnly = true;
-  EXPECT_EQ(create().exitCode, ExitCode::failure);
-  EXPECT_THAT(_report.errors, ElementsAre(HasSubstr("--append-LUX-only")));
-  EXPECT_EQ(contentsOfFile(outputPath()), "former");
 }
 
 TEST_F(Run, verbosityTellsOfTheRunThenOfEachPage) {

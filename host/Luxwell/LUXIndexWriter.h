@@ -1,0 +1,51 @@
+// Makes one book's semantic index data from the text of its pages.
+#pragma once
+
+#include <cstddef>
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "platform/Data.h"
+
+class HelpTokenizer;
+
+/// What a page says, as far as search by meaning is concerned. Strings are UTF-8.
+struct LUXDocument {
+  /// The page's path within the book, without a slash before it.
+  std::string key;
+  /// Shown, and counted as title.
+  std::string title;
+  /// Shown; counted only where it is also among the blocks.
+  std::optional<std::string> description;
+  /// The page is to lend the model its words, but never to be found.
+  bool excludedFromSearch = false;
+  /// Headings, paragraphs and so on; no word group reaches from one into the next.
+  std::vector<std::string> blocks;
+};
+
+/// Collects pages and writes the data that HelpLUXIndex reads, the same bytes for the same pages in
+/// whatever order they are added. Thread-safety: confined to one thread.
+class LUXIndexWriter {
+ public:
+  /// The language of the book. `tokenizer` must not be null.
+  explicit LUXIndexWriter(std::shared_ptr<const HelpTokenizer> tokenizer);
+  ~LUXIndexWriter();
+  LUXIndexWriter(const LUXIndexWriter&) = delete;
+  LUXIndexWriter& operator=(const LUXIndexWriter&) = delete;
+
+  /// Throws platform::Exception "InvalidArgumentException" for a key that was added before.
+  void addDocument(const LUXDocument& document);
+
+  size_t documentCount() const noexcept;
+
+  /// The bytes. The writer is not used afterwards. Throws platform::Exception
+  /// "InvalidArgumentException" for a book whose data would be too large for the format (4 GiB a
+  /// section).
+  platform::Data finish();
+
+ private:
+  struct Implementation;
+  std::unique_ptr<Implementation> _implementation;
+};

@@ -1,0 +1,115 @@
+#include "host/Luxwell/LUXNumbering.h"
+
+#include <limits>
+
+#include "platform/Exception.h"
+
+// Both are open tables of numbers, at most three quarters full, in which one looks on from the slot
+// that the hash names.
+
+namespace {
+
+constexpr size_t smallestTable = 64;
+
+bool isFull(size_t used, size_t slots) noexcept { return used + 1 > slots / 4 * 3; }
+
+uint32_t hashOf(std::string_view string) noexcept {
+  uint64_t hash = 0xCBF29CE484222325ULL;
+  for (const char byte : string) {
+    hash = (hash ^ static_cast<uint8_t>(byte)) * 0x100000001B3ULL;
+  }
+  return static_cast<uint32_t>(hash ^ (hash >> 32U));
+}
+
+uint64_t hashOf(LUXPairNumbering::Pair pair) noexcept {
+  uint64_t hash = (static_cast<uint64_t>(pair.first) << 32U | pair.second) * 0x9E3779B97F4A7C15ULL;
+  hash ^= hash >> 32U;
+  return hash;
+}
+
+[[noreturn]] void throwTooMany() {
+  throw platform::Exception(platform::invalidArgumentException, "too many tokens for a model");
+}
+
+}  // namespace
+
+std::string_view LUXStringNumbering::operator[](size_t number) const noexcept {
+  const uint32_t from = number == 0 ? 0 : _ends[number - 1];
+  return std::string_view(_text).substr(from, _ends[number] - from);
+}
+
+size_t LUXStringNumbering::_slotOf(std::string_view string, uint32_t hash) const noexcept {
+  const size_t mask = _slots.size() - 1;
+  size_t slot = hash & mask;
+  while (_slots[slot] != none &&
+         (_hashes[_slots[slot]] != hash || (*this)[_slots[slot]] != string)) {
+    slot = (slot + 1) & mask;
+  }
+  return slot;
+}
+
+uint32_t LUXStringNumbering::find(std::string_view string) const noexcept {
+  return _slots.empty() ? none : _slots[_slotOf(string, hashOf(string))];
+}
+
+uint32_t LUXStringNumbering::numberOf(std::string_view string) {
+  if (isFull(_ends.size(), _slots.size())) {
+    _grow();
+  }
+  const uint32_t hash = hashOf(string);
+  const size_t slot = _slotOf(string, hash);
+  if (_slots[slot] == none) {
+    if (_text.size() + string.size() > std::numeric_limits<uint32_t>::max() ||
+        _ends.size() + 2 >= none) {
+      throwTooMany();
+    }
+    _slots[slot] = static_cast<uint32_t>(_ends.size());
+    _text += string;
+    _ends.push_back(static_cast<uint32_t>(_text.size()));
+    _hashes.push_back(hash);
+  }
+  return _slots[slot];
+}
+
+void LUXStringNumbering::_grow() {
+  _slots.assign(_slots.empty() ? smallestTable : _slots.size() * 2, none);
+  const size_t mask = _slots.size() - 1;
+  for (uint32_t number = 0; number < _ends.size(); ++number) {
+    size_t slot = _hashes[number] & mask;
+    while (_slots[slot] != none) {
+      slot = (slot + 1) & mask;
+    }
+    _slots[slot] = number;
+  }
+}
+
+size_t LUXPairNumbering::_slotOf(Pair pair) const noexcept {
+  const size_t mask = _slots.size() - 1;
+  size_t slot = hashOf(pair) & mask;
+  while (_slots[slot] != LUXStringNumbering::none && _pairs[_slots[slot]] != pair) {
+    slot = (slot + 1) & mask;
+  }
+  return slot;
+}
+
+uint32_t LUXPairNumbering::numberOf(Pair pair) {
+  if (isFull(_pairs.size(), _slots.size())) {
+    _grow();
+  }
+  const size_t slot = _slotOf(pair);
+  if (_slots[slot] == LUXStringNumbering::none) {
+    if (_pairs.size() + 2 >= LUXStringNumbering::none) {
+      throwTooMany();
+    }
+    _slots[slot] = static_cast<uint32_t>(_pairs.size());
+    _pairs.push_back(pair);
+  }
+  return _slots[slot];
+}
+
+void LUXPairNumbering::_grow() {
+  _slots.assign(_slots.empty() ? smallestTable : _slots.size() * 2, LUXStringNumbering::none);
+  for (uint32_t number = 0; number < _pairs.size(); ++number) {
+    _slots[_slotOf(_pairs[number])] = number;
+  }
+}

@@ -1,0 +1,56 @@
+// Numbers for things, in the order in which they come.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <vector>
+
+/// Strings, each once, numbered from 0. Takes little more memory than the text.
+/// Thread-safety: confined to one thread while strings are added; then immutable.
+class LUXStringNumbering {
+ public:
+  static constexpr uint32_t none = 0xFFFFFFFF;
+
+  /// The number of a string, which is added when it is new. Throws platform::Exception
+  /// "InvalidArgumentException" when there is no room: 4 GiB of text or as many strings as numbers.
+  uint32_t numberOf(std::string_view string);
+  /// none for a string that was not added.
+  uint32_t find(std::string_view string) const noexcept;
+
+  size_t size() const noexcept { return _ends.size(); }
+  /// Valid until the next string is added.
+  std::string_view operator[](size_t number) const noexcept;
+
+ private:
+  size_t _slotOf(std::string_view string, uint32_t hash) const noexcept;
+  void _grow();
+
+  std::string _text;
+  std::vector<uint32_t> _ends;
+  std::vector<uint32_t> _hashes;
+  std::vector<uint32_t> _slots;
+};
+
+/// Pairs of numbers below LUXStringNumbering::none, in the same way.
+class LUXPairNumbering {
+ public:
+  struct Pair {
+    uint32_t first;
+    uint32_t second;
+    friend bool operator==(const Pair&, const Pair&) = default;
+  };
+
+  uint32_t numberOf(Pair pair);
+
+  size_t size() const noexcept { return _pairs.size(); }
+  Pair operator[](size_t number) const noexcept { return _pairs[number]; }
+
+ private:
+  size_t _slotOf(Pair pair) const noexcept;
+  void _grow();
+
+  std::vector<Pair> _pairs;
+  std::vector<uint32_t> _slots;
+};

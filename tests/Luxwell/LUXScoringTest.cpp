@@ -1,0 +1,321 @@
+#include "host/Luxwell/LUXScoring.h"
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <cmath>
+#include <map>
+#include <random>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "tests/Luxwell/LUXNaiveScoring.h"
+#include "tests/Luxwell/LUXQueryWorld.h"
+
+using tests::NaiveScoring;
+using tests::QueryWorld;
+
+namespace {
+
+const QueryWorld& office() {
+  static const auto& world = *new QueryWorld(tests::officePages());
+  return world;
+}
+
+const QueryWorld& randomWorld() {
+  static const auto& world = *new QueryWorld(tests::randomPages(300, 7));
+  return world;
+}
+
+std::vector<LUXScoredPage> best(const QueryWorld& world, std::string_view text, size_t count = 50,
+                                const LUXPageScope& scope = {}) {
+  return LUXScoring(*world.view()).bestPages(world.termsOf(text), count, scope);
+}
+
+std::string keyOf(const QueryWorld& world, const LUXScoredPage& page) {
+  return std::string(world.view()->page(page.page).key);
+}
+
+std::string firstKey(const QueryWorld& world, std::string_view text) {
+  const auto pages = best(world, text);
+  return pages.empty() ? "" : keyOf(world, pages.front());
+}
+
+std::set<std::string> keys(const QueryWorld& world, std::string_view text, size_t count = 50) {
+  std::set<std::string> found;
+  for (const LUXScoredPage& page : best(world, text, count)) {
+    found.insert(keyOf(world, page));
+  }
+  return found;
+}
+
+std::string randomQuery(std::mt19937& random) {
+  std::string text;
+  for (size_t words = 1 + random() % 9; words > 0; --words) {
+    const size_t kind = random() % 12;
+    if (kind == 0) {
+      text += "unheardof" + std::to_string(random() % 3);
+    } else if (kind == 1) {
+      text += tests::vocabularyWord(random() % tests::vocabularySize).substr(0, 4);
+    } else {
+      text += tests::vocabularyWord(random() % (kind < 7 ? 30 : tests::vocabularySize));
+    }
+    text += random() % 5 == 0 ? ", " : " ";
+  }
+  if (random() % 2 == 0) {
+    text.pop_back();
+  }
+  return text;
+}
+
+}  // namespace
+
+TEST(LUXScoring, GivesTheScoresOfTheNaiveTwin) {
+  const NaiveScoring naive(randomWorld());
+  std::mt19937 random(11);
+  size_t compared = 0;
+  for (int i = 0; i < 200; ++i) {
+    const std::string text = randomQuery(random);
+    const LUXQueryTerms terms = randomWorld().termsOf(text);
+    const auto expected = naive.scores(terms);
+    const auto found = best(randomWorld(), text, 1000);
+    for (const LUXScoredPage& page : found) {
+      EXPECT_NEAR(static_cast<double>(page.score), expected.at(page.page), 0.004) << text;
+      ++compared;
+    }
+    for (size_t j = 1; j < found.size(); ++j) {
+      EXPECT_GE(found[j - 1].score, found[j].score) << text;
+    }
+    // Whatever the twin gives a score to is found.
+    const auto aboveNothing = std::count_if(expected.begin(), expected.end(),
+                                            [](const auto& page) { return page.second > 0.005; });
+    EXPECT_GE(found.size(), static_cast<size_t>(aboveNothing)) << text;
+  }
+  EXPECT_GT(compared, 10000U);
+}
+
+TEST(LUXScoring, TheBestFewAreTheFirstOfAll) {
+  std::mt19937 random(12);
+  const NaiveScoring naive(randomWorld());
+  for (int i = 0; i < 300; ++i) {
+    const std::string text = randomQuery(random);
+    const auto all = best(randomWorld(), text, 1000);
+    const size_t withWords = naive.pagesWithWords(randomWorld().termsOf(text));
+    for (const size_t count : {size_t{1}, size_t{5}, size_t{20}, size_t{100}}) {
+      // Only then are pages left out that share no word with the query.
+      if (withWords < count) {
+        continue;
+      }
+      const auto few = best(randomWorld(), text, count);
+      ASSERT_EQ(few.size(), count) << text;
+      size_t place = 0;
+      for (const LUXScoredPage& page : few) {
+        while (place < all.size() && !(all[place] == page)) {
+          // What lies between them shares no word with the query.
+          EXPECT_LE(all[place].score, 0.2F * 4 / 3) << text;
+          ++place;
+        }
+        ASSERT_LT(place++, all.size()) << text;
+      }
+    }
+  }
+}
+
+TEST(LUXScoring, AnExactTitleHasOneAndNothingElseComesNear) {
+  const auto pages = best(office(), "add a PRINTER");
+  ASSERT_FALSE(pages.empty());
+  EXPECT_EQ(keyOf(office(), pages[0]), "add-printer.html");
+  EXPECT_EQ(pages[0].score, 1);
+  ASSERT_GT(pages.size(), 1U);
+  EXPECT_LT(pages[1].score, 0.99F);
+}
+
+TEST(LUXScoring, EveryExactTitleComesFirst) {
+  for (const tests::QueryPage& page : tests::officePages()) {
+    if (!page.excludedFromSearch) {
+      const auto pages = best(office(), page.title);
+      ASSERT_FALSE(pages.empty()) << page.title;
+      EXPECT_EQ(keyOf(office(), pages[0]), page.key);
+      EXPECT_EQ(pages[0].score, 1) << page.title;
+    }
+  }
+}
+
+TEST(LUXScoring, TheSameWordsInAnotherOrderAreNoExactTitle) {
+  const auto pages = best(office(), "soup tomato cooking");
+  ASSERT_FALSE(pages.empty());
+  EXPECT_EQ(keyOf(office(), pages[0]), "soup.html");
+  EXPECT_LT(pages[0].score, 0.99F);
+}
+
+TEST(LUXScoring, ScoresStayBetweenZeroAndWhatIsNotNamed) {
+  std::mt19937 random(13);
+  for (int i = 0; i < 100; ++i) {
+    for (const LUXScoredPage& page : best(randomWorld(), randomQuery(random), 1000)) {
+      EXPECT_GT(page.score, 0);
+      EXPECT_TRUE(page.score < 0.99F || page.score == 1);
+    }
+  }
+}
+
+TEST(LUXScoring, WordsThatTheModelDoesNotKnowLowerTheScore) {
+  const float known = best(office(), "wireless password ").at(0).score;
+  const float foreign =
+      best(office(), "wireless password zygote quantum entanglement ").at(0).score;
+  EXPECT_LT(foreign, known / 2);
+  EXPECT_GT(foreign, 0);
+}
+
+TEST(LUXScoring, ForeignWordsAloneFindNothing) {
+  EXPECT_TRUE(best(office(), "zygote quantum entanglement ").empty());
+  EXPECT_TRUE(best(office(), "xyz").empty());
+}
+
+TEST(LUXScoring, AWordBeingTypedFindsTheWordsThatBeginWithIt) {
+  EXPECT_EQ(firstKey(office(), "wirele"), "wifi.html");
+  EXPECT_TRUE(keys(office(), "change passw").contains("password.html"));
+  EXPECT_EQ(firstKey(office(), "change passw"), "password.html");
+}
+
+TEST(LUXScoring, AFinishedWordIsNotExpanded) {
+  EXPECT_TRUE(best(office(), "wirele ").empty());
+  EXPECT_TRUE(best(office(), "wirele.").empty());
+}
+
+TEST(LUXScoring, TwoLettersAreNotExpanded) { EXPECT_TRUE(best(office(), "wi").empty()); }
+
+TEST(LUXScoring, AKnownWordIsNotExpanded) {
+  // "print" is in many pages; "printer" shares no stem with it.
+  const auto pages = best(office(), "print");
+  const auto finished = best(office(), "print ");
+  EXPECT_EQ(pages, finished);
+}
+
+TEST(LUXScoring, StopWordsAloneAreLookedUpAsTheyStand) {
+  const auto found = keys(office(), "of its own");
+  EXPECT_TRUE(found.contains("password.html"));
+}
+
+TEST(LUXScoring, ExcludedPagesAreNeverFound) {
+  EXPECT_FALSE(keys(office(), "secret spices").contains("hidden.html"));
+  EXPECT_FALSE(keys(office(), "Secret recipes").contains("hidden.html"));
+  EXPECT_FALSE(keys(office(), "tomato soup", 1000).contains("hidden.html"));
+}
+
+TEST(LUXScoring, PagesOutsideTheScopeAreNotFound) {
+  const auto book = office().view()->bookNumber("org.zeb.kitchen");
+  ASSERT_TRUE(book);
+  const auto [first, end] = office().view()->pageRangeOfBook(*book);
+  const auto pages = best(office(), "open the tomato tray of the printer", 50, {first, end, 0, 0});
+  ASSERT_FALSE(pages.empty());
+  for (const LUXScoredPage& page : pages) {
+    EXPECT_GE(page.page, first);
+    EXPECT_LT(page.page, end);
+  }
+  EXPECT_TRUE(best(office(), "Add a printer", 50, {first, end, 0, 0}).empty() ||
+              best(office(), "Add a printer", 50, {first, end, 0, 0})[0].score < 0.99F);
+}
+
+TEST(LUXScoring, TheScopeDoesNotChangeScores) {
+  const auto everywhere = best(randomWorld(), "babrakbak fobrakbak", 1000);
+  const auto second = randomWorld().view()->bookNumber("org.zeb.second");
+  ASSERT_TRUE(second);
+  const auto [first, end] = randomWorld().view()->pageRangeOfBook(*second);
+  const auto within = best(randomWorld(), "babrakbak fobrakbak", 1000, {first, end, 0, 0});
+  ASSERT_FALSE(within.empty());
+  std::vector<LUXScoredPage> filtered;
+  for (const LUXScoredPage& page : everywhere) {
+    if (page.page >= first && page.page < end) {
+      filtered.push_back(page);
+    }
+  }
+  EXPECT_EQ(within, filtered);
+}
+
+TEST(LUXScoring, TheFocusedBookWinsTiesAndNothingMore) {
+  std::vector<tests::QueryPage> pages;
+  for (const char* book : {"org.zeb.a", "org.zeb.b", "org.zeb.c"}) {
+    pages.push_back({"same.html", "Clouds", {"Water vapour rises."}, book});
+    pages.push_back({"other.html", "Water", {"Water and clouds, clouds, clouds."}, book});
+  }
+  const QueryWorld world(pages);
+  const LUXScoring scoring(*world.view());
+  const auto terms = world.termsOf("vapour rises ");
+  const auto plain = scoring.bestPages(terms, 3);
+  const auto focus = world.view()->pageRangeOfBook(*world.view()->bookNumber("org.zeb.b"));
+  LUXPageScope scope;
+  scope.focusFirst = focus.first;
+  scope.focusEnd = focus.second;
+  const auto focused = scoring.bestPages(terms, 3, scope);
+  ASSERT_EQ(plain.size(), 3U);
+  ASSERT_EQ(focused.size(), 3U);
+  EXPECT_EQ(plain[0].score, plain[1].score);
+  EXPECT_EQ(world.view()->page(plain[0].page).book, 0U);
+  EXPECT_EQ(world.view()->page(focused[0].page).book, 1U);
+  EXPECT_EQ(world.view()->page(focused[1].page).book, 0U);
+  // Among exact titles, too.
+  EXPECT_EQ(world.view()->page(scoring.bestPages(world.termsOf("clouds"), 1, scope)[0].page).book,
+            1U);
+  // A page of another book that is better stays before it.
+  const auto better = scoring.bestPages(world.termsOf("clouds water "), 6, scope);
+  for (size_t i = 1; i < better.size(); ++i) {
+    EXPECT_GE(better[i - 1].score, better[i].score);
+  }
+}
+
+TEST(LUXScoring, PagesThatUseOtherWordsAreFoundByMeaning) {
+  // Two subjects, each with many words of its own; in one, half of the pages say "car" and half
+  // say "automobile".
+  std::mt19937 random(5);
+  std::vector<tests::QueryPage> pages;
+  for (int i = 0; i < 200; ++i) {
+    const bool driving = i % 2 == 0;
+    std::string text = !driving ? "tea" : i % 4 == 0 ? "car" : "automobile";
+    const std::string kind = driving ? (i % 4 == 0 ? "car" : "auto") : "tea";
+    for (int words = 0; words < 12; ++words) {
+      text += ' ' + tests::vocabularyWord((driving ? 0 : 100) + random() % 100);
+    }
+    pages.push_back({kind + std::to_string(i), "Page", {text}});
+  }
+  const QueryWorld world(pages);
+  std::map<std::string, double> sums;
+  for (const LUXScoredPage& page : best(world, "car ", 200)) {
+    sums[keyOf(world, page).substr(0, 3)] += static_cast<double>(page.score);
+  }
+  EXPECT_GT(sums["car"], 4 * sums["aut"]);
+  EXPECT_GT(sums["aut"], 0);
+  EXPECT_GT(sums["aut"], 2 * sums["tea"]);
+}
+
+TEST(LUXScoring, NothingWantedIsNothingFound) {
+  EXPECT_TRUE(best(office(), "printer", 0).empty());
+  EXPECT_TRUE(best(office(), "", 50).empty());
+  EXPECT_TRUE(best(office(), "printer", 50, {3, 3, 0, 0}).empty());
+  EXPECT_TRUE(best(office(), "printer", 50, {1000, 2000, 0, 0}).empty());
+}
+
+TEST(LUXScoring, CountsAboveThePagesThereAreGiveAll) {
+  EXPECT_LE(best(office(), "printer", SIZE_MAX).size(), tests::officePages().size());
+  EXPECT_FALSE(best(office(), "printer", SIZE_MAX).empty());
+}
+
+TEST(LUXScoring, ACancelledSearchFindsNothing) {
+  const LUXScoring scoring(*randomWorld().view());
+  const auto terms = randomWorld().termsOf("babrakbak fobrakbak debrakbak");
+  int questions = 0;
+  ASSERT_FALSE(scoring.bestPages(terms, 50, {}, [&questions] { return ++questions < 0; }).empty());
+  ASSERT_GT(questions, 3);
+  for (int limit = 1; limit <= questions; ++limit) {
+    int asked = 0;
+    EXPECT_TRUE(scoring.bestPages(terms, 50, {}, [&] { return ++asked >= limit; }).empty());
+  }
+}
+
+TEST(LUXScoring, SearchingTwiceGivesTheSame) {
+  std::mt19937 random(14);
+  for (int i = 0; i < 20; ++i) {
+    const std::string text = randomQuery(random);
+    EXPECT_EQ(best(randomWorld(), text), best(randomWorld(), text));
+  }
+}
