@@ -6,9 +6,11 @@
 
 #include "host/Luxwell/HelpLUXModel.h"
 #include "host/Zebrine/ZEBHelpBook.h"
+#include "platform/Value.h"
 
 // Each reduces the identifier to its unversioned form first, so that versions never reach the
-// semantic framework.
+// semantic framework, and does then what HelpLUXModel's function of the same name without the
+// prefix does.
 
 inline std::string zeb_modelGroupNameForHelpbookID(std::string_view helpbookID) {
   return HelpLUXModel::modelGroupNameForHelpbookID(

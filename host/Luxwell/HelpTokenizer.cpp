@@ -15,6 +15,7 @@
 #include <utility>
 
 #include "host/Luxwell/LUXFolding.h"
+#include "host/Luxwell/LUXKoreanEndings.h"
 #include "host/Luxwell/LUXLanguage.h"
 #include "host/Luxwell/LUXStopWords.h"
 
@@ -427,7 +428,8 @@ bool endsUnspaced(std::string_view text) noexcept {
 
 }  // namespace
 
-HelpTokenizer::HelpTokenizer(const LUXLanguage& language) : _language(language) {
+HelpTokenizer::HelpTokenizer(const LUXLanguage& language)
+    : _language(language), _isKorean(std::string_view(language.tag) == "ko") {
   std::string_view words = LUXStopWordsForLanguage(language.tag);
   while (!words.empty()) {
     const size_t end = std::min(words.find(' '), words.size());
@@ -533,9 +535,12 @@ std::optional<HelpTokenizer::Word> HelpTokenizer::wordOfSurface(std::string_view
   if (word.form.empty()) {
     return std::nullopt;
   }
-  word.stem = _language.stemmer == nullptr
-                  ? word.form
-                  : luxfolding::withoutDiacritics(stemOf(folded, _language.stemmer));
+  word.stem = word.form;
+  if (_language.stemmer != nullptr) {
+    word.stem = luxfolding::withoutDiacritics(stemOf(folded, _language.stemmer));
+  } else if (_isKorean) {
+    word.stem = LUXWithoutKoreanEnding(word.form);
+  }
   if (word.stem.empty() || word.stem.size() > maximumFormLength) {
     word.stem = word.form;
   }

@@ -21,7 +21,8 @@ struct LUXLanguage;
 ///
 /// The form of a word is without the differences that a search overlooks: case, compatibility
 /// forms, diacritics. The stem is what Snowball's algorithm for the language leaves of the word,
-/// folded in the same way; where there is no algorithm, it is the form.
+/// folded in the same way; in Korean it is what is left without particles and verb endings; in
+/// other languages without an algorithm it is the form.
 ///
 /// Thread-safety: immutable.
 class HelpTokenizer {
@@ -110,5 +111,6 @@ class HelpTokenizer {
   std::string _folded(std::string_view surface) const;
 
   const LUXLanguage& _language;
+  const bool _isKorean;
   std::unordered_set<std::string> _stopWords;
 };

@@ -1,77 +1,100 @@
 #include "host/Luxwell/LUXHit.h"
 
+#include <cstddef>
+#include <string_view>
 #include <utility>
 
 #include "host/Luxwell/LUXCompletion.h"
 #include "host/Luxwell/LUXModelView.h"
 #include "host/Luxwell/LUXScoring.h"
 
-std::shared_ptr<LUXHit> LUXHit::hitWithTitle(std::optional<std::string> title, float score,
-                                             std::optional<std::string> path, std::string book) {
-  const std::shared_ptr<LUXHit> hit(new LUXHit);
-  hit->_strings =
-      std::make_unique<const Strings>(Strings{std::move(title), std::move(path), std::move(book)});
-  hit->_score = score;
-  return hit;
-}
+struct LUXHit::Block {
+  explicit Block(size_t count) : hits(new LUXHit[count]) {}
 
-template <typename Scored>
-std::vector<std::shared_ptr<LUXHit>> LUXHit::_hits(const std::shared_ptr<const LUXModelView>& view,
-                                                   Kind kind, std::span<const Scored> items,
-                                                   uint32_t Scored::*number) {
-  const std::shared_ptr<LUXHit[]> block(new LUXHit[items.size()]);
+  Place add(std::string_view string) {
+    const Place place{static_cast<uint32_t>(text.size()), static_cast<uint32_t>(string.size())};
+    text.append(string);
+    return place;
+  }
+
+  std::string text;
+  const std::unique_ptr<LUXHit[]> hits;
+};
+
+namespace {
+
+// A guess at what paths, or phrases, take.
+constexpr size_t usualLength = 40;
+
+template <typename Scored, typename Fill>
+std::vector<std::shared_ptr<LUXHit>> hitsFor(std::span<const Scored> items, Fill fill) {
   std::vector<std::shared_ptr<LUXHit>> hits;
   hits.reserve(items.size());
-  LUXHit* hit = block.get();
   for (const Scored& item : items) {
-    hit->_view = view;
-    hit->_number = item.*number;
-    hit->_score = item.score;
-    hit->_kind = kind;
-    hits.emplace_back(block, hit++);
+    hits.push_back(fill(item));
   }
   return hits;
 }
 
-std::vector<std::shared_ptr<LUXHit>> LUXHit::hitsForPages(
-    const std::shared_ptr<const LUXModelView>& view, std::span<const LUXScoredPage> pages) {
-  return _hits(view, Kind::page, pages, &LUXScoredPage::page);
+}  // namespace
+
+std::shared_ptr<LUXHit> LUXHit::hitWithTitle(std::optional<std::string> title, float score,
+                                             std::optional<std::string> path, std::string book) {
+  const auto block = std::make_shared<Block>(1);
+  LUXHit& hit = block->hits[0];
+  hit._block = block.get();
+  hit._score = score;
+  hit._title = title ? block->add(*title) : Place();
+  hit._path = path ? block->add(*path) : Place();
+  hit._book = block->add(book);
+  return {block, &hit};
+}
+
+std::vector<std::shared_ptr<LUXHit>> LUXHit::hitsForPages(const LUXModelView& view,
+                                                          std::span<const LUXScoredPage> pages) {
+  const auto block = std::make_shared<Block>(pages.size());
+  block->text.reserve(pages.size() * usualLength);
+  uint32_t book = 0;
+  Place bookPlace;
+  LUXHit* next = block->hits.get();
+  return hitsFor(pages, [&](const LUXScoredPage& scored) {
+    const LUXModelView::Page page = view.page(scored.page);
+    // Pages of one book mostly follow one another.
+    if (bookPlace.length == absent || page.book != book) {
+      book = page.book;
+      bookPlace = block->add(view.bookID(book));
+    }
+    LUXHit& hit = *next++;
+    hit._block = block.get();
+    hit._path = block->add(page.key);
+    hit._book = bookPlace;
+    hit._score = scored.score;
+    return std::shared_ptr<LUXHit>(block, &hit);
+  });
 }
 
 std::vector<std::shared_ptr<LUXHit>> LUXHit::hitsForPhrases(
-    const std::shared_ptr<const LUXModelView>& view, std::span<const LUXScoredPhrase> phrases) {
-  return _hits(view, Kind::phrase, phrases, &LUXScoredPhrase::phrase);
+    const LUXModelView& view, std::span<const LUXScoredPhrase> phrases) {
+  const auto block = std::make_shared<Block>(phrases.size());
+  block->text.reserve(phrases.size() * usualLength);
+  LUXHit* next = block->hits.get();
+  return hitsFor(phrases, [&](const LUXScoredPhrase& phrase) {
+    LUXHit& hit = *next++;
+    hit._block = block.get();
+    hit._title = block->add(view.phraseText(phrase.phrase));
+    hit._score = phrase.score;
+    return std::shared_ptr<LUXHit>(block, &hit);
+  });
 }
 
-std::optional<std::string> LUXHit::title() const {
-  switch (_kind) {
-    case Kind::page:
-      return std::nullopt;
-    case Kind::phrase:
-      return std::string(_view->phraseText(_number));
-    default:
-      return _strings->title;
-  }
+std::optional<std::string> LUXHit::_string(Place place) const {
+  return place.length == absent
+             ? std::nullopt
+             : std::optional<std::string>(_block->text.substr(place.start, place.length));
 }
 
-std::optional<std::string> LUXHit::path() const {
-  switch (_kind) {
-    case Kind::page:
-      return std::string(_view->page(_number).key);
-    case Kind::phrase:
-      return std::nullopt;
-    default:
-      return _strings->path;
-  }
-}
+std::optional<std::string> LUXHit::title() const { return _string(_title); }
 
-std::string LUXHit::book() const {
-  switch (_kind) {
-    case Kind::page:
-      return std::string(_view->bookID(_view->page(_number).book));
-    case Kind::phrase:
-      return {};
-    default:
-      return _strings->book;
-  }
-}
+std::optional<std::string> LUXHit::path() const { return _string(_path); }
+
+std::string LUXHit::book() const { return _string(_book).value_or(std::string()); }

@@ -15,24 +15,21 @@ struct LUXScoredPhrase;
 /// A page, or a phrase that is offered as something to search for.
 ///
 /// Pages have a path and a book and no title: titles belong to the books' own index data, not to
-/// the model. Phrases have a title alone. A hit keeps the part of the model that it points into
-/// alive, so that its strings are made only when somebody asks.
+/// the model. Phrases have a title alone. The hits of one answer share one block of memory with the
+/// text of all, which is freed with the last of them; they need neither model nor query.
 /// Thread-safety: immutable but for the score, which is confined to one thread.
 class LUXHit {
  public:
-  /// A hit that points nowhere and knows what it is given.
   static std::shared_ptr<LUXHit> hitWithTitle(std::optional<std::string> title, float score,
                                               std::optional<std::string> path = std::nullopt,
                                               std::string book = {});
 
-  /// One hit for each page, in the same order. They share one block of memory, which is freed with
-  /// the last of them.
-  static std::vector<std::shared_ptr<LUXHit>> hitsForPages(
-      const std::shared_ptr<const LUXModelView>& view, std::span<const LUXScoredPage> pages);
-
+  /// One hit for each page of the model, in the same order.
+  static std::vector<std::shared_ptr<LUXHit>> hitsForPages(const LUXModelView& view,
+                                                           std::span<const LUXScoredPage> pages);
   /// The same for phrases.
   static std::vector<std::shared_ptr<LUXHit>> hitsForPhrases(
-      const std::shared_ptr<const LUXModelView>& view, std::span<const LUXScoredPhrase> phrases);
+      const LUXModelView& view, std::span<const LUXScoredPhrase> phrases);
 
   std::optional<std::string> title() const;
 
@@ -46,25 +43,22 @@ class LUXHit {
   std::string book() const;
 
  private:
-  enum class Kind : uint8_t { page, phrase, free };
-
-  /// What a hit has that points nowhere.
-  struct Strings {
-    std::optional<std::string> title;
-    std::optional<std::string> path;
-    std::string book;
+  struct Block;
+  /// Where in the block's text a string lies.
+  struct Place {
+    uint32_t start = 0;
+    uint32_t length = absent;
   };
+  static constexpr uint32_t absent = UINT32_MAX;
 
   LUXHit() = default;
 
-  template <typename Scored>
-  static std::vector<std::shared_ptr<LUXHit>> _hits(const std::shared_ptr<const LUXModelView>& view,
-                                                    Kind kind, std::span<const Scored> items,
-                                                    uint32_t Scored::*number);
+  std::optional<std::string> _string(Place place) const;
 
-  std::shared_ptr<const LUXModelView> _view;
-  std::unique_ptr<const Strings> _strings;
-  uint32_t _number = 0;
+  /// The block that this hit is in.
+  const Block* _block = nullptr;
+  Place _title;
+  Place _path;
+  Place _book;
   float _score = 0;
-  Kind _kind = Kind::free;
 };

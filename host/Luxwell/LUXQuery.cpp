@@ -91,12 +91,12 @@ std::vector<std::shared_ptr<LUXHit>> LUXQuery::_results() const {
   switch (_queryType) {
     case LUXQueryTypeCompletions:
       return LUXHit::hitsForPhrases(
-          view, LUXCompletions(*view, terms, _requestedCount, book, isCancelled));
+          *view, LUXCompletions(*view, terms, _requestedCount, book, isCancelled));
     case LUXQueryTypeSimilar:
       return LUXHit::hitsForPhrases(
-          view, LUXSimilarPhrases(*view, terms, _requestedCount, scope, book, isCancelled));
+          *view, LUXSimilarPhrases(*view, terms, _requestedCount, scope, book, isCancelled));
     default:
       return LUXHit::hitsForPages(
-          view, LUXScoring(*view).bestPages(terms, _requestedCount, scope, isCancelled));
+          *view, LUXScoring(*view).bestPages(terms, _requestedCount, scope, isCancelled));
   }
 }

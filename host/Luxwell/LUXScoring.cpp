@@ -1,6 +1,7 @@
 #include "host/Luxwell/LUXScoring.h"
 
 #include <algorithm>
+#include <array>
 #include <bit>
 #include <functional>
 #include <limits>
@@ -35,6 +36,8 @@ class Search {
         _plan(plan),
         _scope(scope),
         _isCancelled(isCancelled),
+        _vectors(view.pageVectors()),
+        _scales(plan.latent.empty() ? std::span<const float>() : view.pageScales()),
         _count(std::min<size_t>(count, scope.end - scope.first)),
         _meaning(plan.latent.empty() ? 0 : plan.latentWeight),
         _wordShare(1 - plan.latentWeight),
@@ -61,6 +64,7 @@ class Search {
       return {};
     }
     std::vector<LUXScoredPage> pages;
+    pages.reserve(_count);
     for (const LUXBest::Item& item : _best.sorted()) {
       pages.push_back({pageOfRank(item.number), item.score});
     }
@@ -112,84 +116,156 @@ class Search {
 
   void _findMaxima() {
     _maxima.resize(_lexical.size() / luxscoring::groupLength);
-    luxscoring::findGroupMaxima(_lexical.data(), _maxima.size(), _maxima.data());
+    _highest = luxscoring::findGroupMaxima(_lexical.data(), _maxima.size(), _maxima.data());
   }
 
   // A score that at least `_count` pages reach, and not many more; the least score that a page with
   // a word of the query has where there may be fewer. If so many groups have a page that reaches
-  // it, so many pages do; and the best pages seldom share a group.
+  // it, so many pages do; and the best pages seldom share a group. Groups are counted by classes of
+  // scores, which is quicker than putting them in order and good enough.
   float _lowerBoundOfBest() const {
-    // Groups of groups, as long as they are enough to tell well.
-    size_t stride = 1;
-    while (_maxima.size() / (2 * stride) >= 4 * _count) {
-      stride *= 2;
-    }
-    std::vector<float> highest((_maxima.size() + stride - 1) / stride);
-    if (highest.size() < _count) {
+    if (_maxima.size() < _count || !(_highest > leastScore && _highest < everything)) {
       return leastScore;
     }
-    for (size_t i = 0; i < _maxima.size(); ++i) {
-      highest[i / stride] = std::max(highest[i / stride], _maxima[i]);
+    constexpr size_t classCount = 256;
+    const float scale = static_cast<float>(classCount - 1) / _highest;
+    // Two tables in turns: counting in the same place twice in a row is slow.
+    std::array<std::array<uint32_t, classCount>, 2> groups{};
+    for (size_t i = 0; i < _maxima.size(); i += 2) {
+      ++groups[0][static_cast<size_t>(static_cast<int>(std::max(_maxima[i], 0.0F) * scale))];
+      ++groups[1][static_cast<size_t>(static_cast<int>(std::max(_maxima[i + 1], 0.0F) * scale))];
     }
-    const auto last = highest.begin() + static_cast<ptrdiff_t>(_count) - 1;
-    std::nth_element(highest.begin(), last, highest.end(), std::greater<>());
-    return std::max(*last, leastScore);
+    size_t counted = 0;
+    for (size_t i = classCount - 1; i > 0; --i) {
+      counted += groups[0][i] + groups[1][i];
+      if (counted >= _count) {
+        return std::max(static_cast<float>(i) / scale * (1 - roundingReserve), leastScore);
+      }
+    }
+    return leastScore;
   }
+
+  // In this order it is 0 also where a damaged model makes it what is no number.
+  static float _clamped(float cosine) { return std::min(std::max(0.0F, cosine), 1.0F); }
 
   float _cosine(uint32_t page) const {
-    const int8_t* const vector = _plan.latent.empty() ? nullptr : _view.pageVector(page);
-    if (vector == nullptr) {
+    if (page >= _scales.size()) {
       return 0;
     }
-    const int32_t product = LUXInnerProduct(_plan.latent.data(), vector, _plan.latent.size());
-    const float cosine = static_cast<float>(product) * _plan.latentScale * _view.pageScale(page);
-    // Also for what is not a number.
-    return cosine > 0 ? std::min(cosine, 1.0F) : 0;
+    const size_t length = _plan.latent.size();
+    const int32_t product = _innerProduct(_plan.latent.data(), _vectors + page * length, length);
+    return _clamped(static_cast<float>(product) * _plan.latentScale * _scales[page]);
   }
 
-  void _take(size_t place, float lexical) {
-    const uint32_t page = _scope.first + static_cast<uint32_t>(place);
-    const float score = _wordShare * lexical + _meaning * _cosine(page);
-    if (score > 0) {
-      _best.add(rankOfPage(page, _scope), score);
+  // Takes a page, some time later: its vector is called for and used when some more pages have
+  // followed, since memory is slow and the vectors of pages lie far apart.
+  void _take(uint32_t page, float lexical) {
+    if (page < _scales.size()) {
+      const int8_t* const vector = _vectors + page * _plan.latent.size();
+      for (size_t i = 0; i < _plan.latent.size(); i += cacheLineLength) {
+        __builtin_prefetch(vector + i);
+      }
     }
+    _waiting[_waitingCount++] = {page, lexical};
+    if (_waitingCount == _waiting.size()) {
+      _takeWaiting();
+    }
+  }
+
+  void _takeWaiting() {
+    for (size_t i = 0; i < _waitingCount; ++i) {
+      const auto [page, lexical] = _waiting[i];
+      _best.add(rankOfPage(page, _scope), _wordShare * lexical + _meaning * _cosine(page));
+    }
+    _waitingCount = 0;
   }
 
   // Takes the pages with a lexical score from `least` to below `end`; `least` rises as better pages
   // are found. False when cancelled.
   bool _takeBetween(float least, float end) {
-    using luxscoring::groupLength;
+    constexpr size_t unit = 4 * luxscoring::groupLength;
     float threshold = _best.threshold();
-    for (size_t group = 0; group < _maxima.size(); ++group) {
-      if (group % (stepLength / groupLength) == 0 && _cancelled()) {
+    for (size_t first = 0; first < _lexical.size(); first += unit) {
+      if (first % stepLength == 0 && _cancelled()) {
         return false;
       }
-      if (_maxima[group] < least) {
-        continue;
-      }
-      const size_t first = group * groupLength;
-      for (uint32_t bits = luxscoring::scoresWithin(_lexical.data() + first, least, end); bits != 0;
-           bits &= bits - 1) {
+      uint64_t bits = luxscoring::scoresWithinFourGroups(
+          _lexical.data() + first, _maxima.data() + first / luxscoring::groupLength, least, end);
+      for (; bits != 0; bits &= bits - 1) {
         const size_t place = first + static_cast<size_t>(std::countr_zero(bits));
-        _take(place, _lexical[place]);
+        _take(_scope.first + static_cast<uint32_t>(place), _lexical[place]);
       }
       if (_best.threshold() != threshold) {
         threshold = _best.threshold();
         least = std::max(least, _leastWithinReach());
       }
     }
+    _takeWaiting();
     return true;
   }
 
   bool _takeThoseWithoutWords() {
-    for (size_t place = 0; place < _lexical.size(); ++place) {
-      if (place % stepLength == 0 && _cancelled()) {
+    const uint32_t size = _scope.end - _scope.first;
+    if (size >= luxmodel::neighbourhoodPageCount && _view.neighbourhoodCount() > 0) {
+      return _takeNeighbours();
+    }
+    using luxscoring::groupLength;
+    std::array<int32_t, 16 * groupLength> products;
+    std::array<float, products.size()> cosines;
+    const uint32_t end = std::min(_scope.end, static_cast<uint32_t>(_scales.size()));
+    for (uint32_t first = _scope.first; first < end; first += products.size()) {
+      if (_cancelled()) {
         return false;
       }
-      if (_lexical[place] == 0) {
-        _take(place, 0);
+      const size_t count = std::min<size_t>(end - first, products.size());
+      const size_t length = _plan.latent.size();
+      LUXInnerProducts(_plan.latent.data(), _vectors + first * length, length, count,
+                       products.data());
+      cosines.fill(0);
+      for (size_t i = 0; i < count; ++i) {
+        cosines[i] = static_cast<float>(products[i]) * _plan.latentScale * _scales[first + i];
+      }
+      for (size_t group = 0; group < count; group += groupLength) {
+        const float least = std::max(_best.threshold() / _meaning, leastScore);
+        for (uint32_t bits = luxscoring::scoresWithin(cosines.data() + group, least, everything);
+             bits != 0; bits &= bits - 1) {
+          const size_t i = group + static_cast<size_t>(std::countr_zero(bits));
+          if (_lexical[first - _scope.first + i] == 0) {
+            _best.add(rankOfPage(first + static_cast<uint32_t>(i), _scope),
+                      _meaning * _clamped(cosines[i]));
+          }
+        }
       }
     }
+    return true;
+  }
+
+  // Looks at the neighbourhoods whose centres are nearest to the query, until that are pages enough
+  // to choose among.
+  bool _takeNeighbours() {
+    LUXBest nearest(_view.neighbourhoodCount());
+    for (uint32_t i = 0; i < _view.neighbourhoodCount(); ++i) {
+      nearest.add(i, _cosine(_view.neighbourhoodCentre(i)));
+    }
+    const size_t enough = std::max(neighboursWanted * _count, fewestNeighbours);
+    size_t seen = 0;
+    for (const LUXBest::Item& item : nearest.sorted()) {
+      if (seen >= enough) {
+        break;
+      }
+      if (_cancelled()) {
+        return false;
+      }
+      for (const uint32_t page : _view.pagesOfNeighbourhood(item.number)) {
+        const uint32_t place = page - _scope.first;
+        if (place >= _scope.end - _scope.first || _lexical[place] != 0) {
+          continue;
+        }
+        ++seen;
+        _take(page, 0);
+      }
+    }
+    _takeWaiting();
     return true;
   }
 
@@ -204,18 +280,29 @@ class Search {
   // Of those places that fill up the last group.
   static constexpr float filling = -1;
   static constexpr float roundingReserve = 1e-6F;
+  static constexpr size_t cacheLineLength = 64;
+  // How many pages are looked at for each that is wanted, and at least.
+  static constexpr size_t neighboursWanted = 8;
+  static constexpr size_t fewestNeighbours = 1024;
 
   const LUXModelView& _view;
   const LUXScoringPlan& _plan;
   const LUXPageScope& _scope;
   const LUXIsCancelled& _isCancelled;
+  const LUXInnerProductFunction _innerProduct = LUXFastestInnerProduct();
+  const int8_t* const _vectors;
+  // Empty where the query or the model has no meaning, so that cosines are 0.
+  const std::span<const float> _scales;
   const size_t _count;
   // What the cosine and the words count for.
   const float _meaning;
   const float _wordShare;
   LUXBest _best;
+  std::array<LUXScoredPage, 16> _waiting;
+  size_t _waitingCount = 0;
   std::vector<float> _lexical;
   std::vector<float> _maxima;
+  float _highest = 0;
 };
 
 float stretched(float score, size_t termCount) {

@@ -23,7 +23,9 @@ class LUXBest {
     float score = 0;
   };
 
-  explicit LUXBest(size_t count) : _count(count) {}
+  explicit LUXBest(size_t count) : _count(count) {
+    _keys.reserve(std::min(_capacity(), mostReserved));
+  }
 
   void add(uint32_t number, float score) {
     if (score < _threshold || _count == 0) {
@@ -32,7 +34,7 @@ class LUXBest {
     // Adding zero makes a positive zero of a negative one.
     const auto bits = std::bit_cast<uint32_t>(score + 0.0F);
     _keys.push_back(static_cast<uint64_t>(bits) << 32 | ~number);
-    if (_keys.size() >= 2 * _count + reserve) {
+    if (_keys.size() >= _capacity()) {
       settle();
     }
   }
@@ -55,16 +57,15 @@ class LUXBest {
   std::vector<Item> sorted() {
     settle();
     std::sort(_keys.begin(), _keys.end(), std::greater<>());
-    std::vector<Item> items;
-    items.reserve(_keys.size());
-    for (const uint64_t key : _keys) {
-      items.push_back(_item(key));
-    }
+    std::vector<Item> items(_keys.size());
+    std::transform(_keys.begin(), _keys.end(), items.begin(), _item);
     return items;
   }
 
  private:
-  static constexpr size_t reserve = 64;
+  static constexpr size_t mostReserved = 4096;
+
+  size_t _capacity() const noexcept { return 2 * _count + 64; }
 
   static Item _item(uint64_t key) noexcept {
     return {~static_cast<uint32_t>(key), std::bit_cast<float>(static_cast<uint32_t>(key >> 32))};

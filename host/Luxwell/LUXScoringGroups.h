@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <cstddef>
 #include <cstdint>
+#include <limits>
 
 #if defined(__SSE2__)
 #include <emmintrin.h>
@@ -13,9 +14,11 @@ namespace luxscoring {
 
 inline constexpr size_t groupLength = 16;
 
-/// The highest score of each group. `groupCount` is a multiple of 4, and no score is NaN.
-inline void findGroupMaxima(const float* scores, size_t groupCount, float* maxima) noexcept {
+/// The highest score of each group, and of all. `groupCount` is a multiple of 4, and no score is
+/// NaN.
+inline float findGroupMaxima(const float* scores, size_t groupCount, float* maxima) noexcept {
 #if defined(__SSE2__)
+  __m128 highest = _mm_set1_ps(-std::numeric_limits<float>::infinity());
   for (size_t group = 0; group < groupCount; group += 4) {
     __m128 rows[4];
     for (__m128& row : rows) {
@@ -24,13 +27,20 @@ inline void findGroupMaxima(const float* scores, size_t groupCount, float* maxim
       scores += groupLength;
     }
     _MM_TRANSPOSE4_PS(rows[0], rows[1], rows[2], rows[3]);
-    _mm_storeu_ps(maxima + group,
-                  _mm_max_ps(_mm_max_ps(rows[0], rows[1]), _mm_max_ps(rows[2], rows[3])));
+    const __m128 four = _mm_max_ps(_mm_max_ps(rows[0], rows[1]), _mm_max_ps(rows[2], rows[3]));
+    _mm_storeu_ps(maxima + group, four);
+    highest = _mm_max_ps(highest, four);
   }
+  float lanes[4];
+  _mm_storeu_ps(lanes, highest);
+  return *std::max_element(lanes, lanes + 4);
 #else
+  float highest = -std::numeric_limits<float>::infinity();
   for (size_t group = 0; group < groupCount; ++group, scores += groupLength) {
     maxima[group] = *std::max_element(scores, scores + groupLength);
+    highest = std::max(highest, maxima[group]);
   }
+  return highest;
 #endif
 }
 
@@ -50,6 +60,22 @@ inline uint32_t scoresWithin(const float* scores, float least, float end) noexce
     bits |= (scores[i] >= least && scores[i] < end ? 1U : 0U) << i;
   }
 #endif
+  return bits;
+}
+
+/// The same for four groups at once, whose highest scores `maxima` are.
+inline uint64_t scoresWithinFourGroups(const float* scores, const float* maxima, float least,
+                                       float end) noexcept {
+#if defined(__SSE2__)
+  if (_mm_movemask_ps(_mm_cmpge_ps(_mm_loadu_ps(maxima), _mm_set1_ps(least))) == 0) {
+    return 0;
+  }
+#endif
+  uint64_t bits = 0;
+  for (uint32_t group = 0; group < 4; ++group) {
+    bits |= static_cast<uint64_t>(scoresWithin(scores + group * groupLength, least, end))
+            << (group * groupLength);
+  }
   return bits;
 }
 

@@ -26,6 +26,7 @@ class Planner {
   Planner(const LUXModelView& view, const LUXQueryTerms& terms) : _view(view), _terms(terms) {}
 
   LUXScoringPlan plan(const LUXIsCancelled& isCancelled) {
+    _plan.lists.reserve(_terms.stems.size() + _terms.bigrams.size() + _terms.forms.size());
     const auto& words = _terms.onlyStopWords ? _terms.forms : _terms.stems;
     const LUXTokenKind kind = _terms.onlyStopWords ? LUXTokenKind::form : LUXTokenKind::stem;
     for (const LUXQueryTerms::Term& word : words) {
@@ -153,29 +154,15 @@ class Planner {
     }
     _sum.resize(_view.stride());
     const float weight = std::log2(1 + static_cast<float>(count)) * _view.termScale(stem);
-    for (size_t i = 0; i < _sum.size(); ++i) {
-      _sum[i] += weight * static_cast<float>(vector[i]);
-    }
+    LUXAddScaled(_sum.data(), vector, weight, _sum.size());
   }
 
   void _finishLatent() {
-    float largest = 0;
-    for (const float component : _sum) {
-      largest = std::max(largest, std::fabs(component));
+    _plan.latent.resize(_sum.size());
+    _plan.latentScale = LUXQuantize(_sum.data(), _plan.latent.data(), _sum.size());
+    if (_plan.latentScale == 0) {
+      _plan.latent.clear();
     }
-    // Written so that what is not a number, which a damaged model may hold, is left out as well.
-    if (!(largest > 0 && largest < std::numeric_limits<float>::infinity())) {
-      return;
-    }
-    _plan.latent.reserve(_sum.size());
-    double squares = 0;
-    for (const float component : _sum) {
-      const float scaled = component / largest * 127;
-      const auto rounded = static_cast<int8_t>(std::lrint(scaled == scaled ? scaled : 0));
-      squares += static_cast<double>(rounded) * rounded;
-      _plan.latent.push_back(rounded);
-    }
-    _plan.latentScale = static_cast<float>(1 / std::sqrt(squares));
   }
 
   const LUXModelView& _view;

@@ -10,26 +10,10 @@
 #include "host/Luxwell/LUXModelView.h"
 #include "host/Luxwell/LUXStemsKey.h"
 
-std::vector<LUXScoredPage> LUXProfile(const LUXModelView& view, const LUXQueryTerms& terms,
-                                      const LUXPageScope& scope,
-                                      const LUXIsCancelled& isCancelled) {
-  std::vector<LUXScoredPage> profile =
-      LUXScoring(view).bestPages(terms, LUXProfileLength, scope, isCancelled);
-  float squares = 0;
-  for (LUXScoredPage& page : profile) {
-    page.score *= page.score;
-    squares += page.score * page.score;
-  }
-  if (!(squares > 0)) {
-    return {};
-  }
-  for (LUXScoredPage& page : profile) {
-    page.score /= std::sqrt(squares);
-  }
-  return profile;
-}
-
 namespace {
+
+// A quarter of what is shown at all: what scores less says nothing of what is asked for.
+constexpr float leastScore = luxscoring::cutoff / 4;
 
 uint32_t stemsKey(const LUXQueryTerms& terms) {
   std::vector<std::string_view> stems;
@@ -43,6 +27,26 @@ uint32_t stemsKey(const LUXQueryTerms& terms) {
 float goodness(float score) { return score > 0 ? score : 0; }
 
 }  // namespace
+
+std::vector<LUXScoredPage> LUXProfile(const LUXModelView& view, const LUXQueryTerms& terms,
+                                      const LUXPageScope& scope,
+                                      const LUXIsCancelled& isCancelled) {
+  std::vector<LUXScoredPage> profile =
+      LUXScoring(view).bestPages(terms, LUXProfileLength, scope, isCancelled);
+  std::erase_if(profile, [](const LUXScoredPage& page) { return page.score < leastScore; });
+  float squares = 0;
+  for (LUXScoredPage& page : profile) {
+    page.score *= page.score;
+    squares += page.score * page.score;
+  }
+  if (!(squares > 0)) {
+    return {};
+  }
+  for (LUXScoredPage& page : profile) {
+    page.score /= std::sqrt(squares);
+  }
+  return profile;
+}
 
 std::vector<LUXScoredPhrase> LUXSimilarPhrases(const LUXModelView& view, const LUXQueryTerms& terms,
                                                size_t count, const LUXPageScope& scope,

@@ -13,8 +13,8 @@
 class LUXModelView;
 
 /// A result profile is what a text finds: its best pages, each with the square of its score, as a
-/// vector of unit length. Texts that find the same pages ask for the same thing, whatever words
-/// they use.
+/// vector of unit length; pages that hardly answer it do not count. Texts that find the same pages
+/// ask for the same thing, whatever words they use.
 inline constexpr size_t LUXProfileLength = 5;
 
 /// The profile of a text in the model; the scores are the components, in order of score.

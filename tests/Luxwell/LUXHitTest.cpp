@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include "host/Luxwell/LUXCompletion.h"
 #include "host/Luxwell/LUXScoring.h"
 #include "tests/Luxwell/LUXQueryWorld.h"
 
@@ -31,7 +32,7 @@ TEST(LUXHit, TheScoreCanBeSet) {
 TEST(LUXHit, PagesKeepTheirOrderAndOutliveEachOther) {
   const tests::QueryWorld world(tests::officePages());
   const std::vector<LUXScoredPage> pages{{2, 0.75F}, {0, 0.5F}};
-  auto hits = LUXHit::hitsForPages(world.view(), pages);
+  auto hits = LUXHit::hitsForPages(*world.view(), pages);
   ASSERT_EQ(hits.size(), 2U);
   EXPECT_EQ(hits[0]->score(), 0.75F);
   EXPECT_EQ(hits[0]->path(), world.view()->page(2).key);
@@ -41,4 +42,21 @@ TEST(LUXHit, PagesKeepTheirOrderAndOutliveEachOther) {
   EXPECT_EQ(second->book(), world.view()->bookID(world.view()->page(0).book));
 }
 
-TEST(LUXHit, NoPagesAreNoHits) { EXPECT_TRUE(LUXHit::hitsForPages(nullptr, {}).empty()); }
+TEST(LUXHit, PhrasesHaveATitleAlone) {
+  const tests::QueryWorld world(
+      {{"a", "Print queue", {}}, {"b", "Print queue", {}}, {"c", "Print queue", {}}});
+  ASSERT_GT(world.view()->phraseCount(), 0U);
+  const std::vector<LUXScoredPhrase> phrases{{0, 0.25F}};
+  const auto hits = LUXHit::hitsForPhrases(*world.view(), phrases);
+  ASSERT_EQ(hits.size(), 1U);
+  EXPECT_EQ(hits[0]->title(), world.view()->phraseText(0));
+  EXPECT_EQ(hits[0]->path(), std::nullopt);
+  EXPECT_EQ(hits[0]->book(), "");
+  EXPECT_EQ(hits[0]->score(), 0.25F);
+}
+
+TEST(LUXHit, NoPagesAreNoHits) {
+  const tests::QueryWorld world(tests::officePages());
+  EXPECT_TRUE(LUXHit::hitsForPages(*world.view(), {}).empty());
+  EXPECT_TRUE(LUXHit::hitsForPhrases(*world.view(), {}).empty());
+}

@@ -58,18 +58,20 @@ double NaiveScoring::_saturated(const Page& page, const Token& token) const {
   const auto [titleCount, bodyCount] = counts->second;
   const auto [titleLength, bodyLength] = page.lengths.at(token.first);
   const auto [averageTitle, averageBody] = _averages.at(token.first);
-  const auto relative = [](double length, double average, double share) {
-    return average > 0 ? 1 - share + share * length / average : 1;
+  const auto relative = [](double length, double average, double share, double exponent) {
+    return average > 0 ? 1 - share + share * std::pow(length / average, exponent) : 1;
   };
   double count = 0;
   if (token.first == LUXTokenKind::bigram) {
-    count =
-        (titleCount + bodyCount) /
-        relative(titleLength + bodyLength, averageTitle + averageBody, luxmodel::bodyLengthShare);
+    count = (titleCount + bodyCount) /
+            relative(titleLength + bodyLength, averageTitle + averageBody,
+                     luxmodel::bodyLengthShare, luxmodel::bodyLengthExponent);
   } else {
     count = luxmodel::titleWeight * titleCount /
-                relative(titleLength, averageTitle, luxmodel::titleLengthShare) +
-            bodyCount / relative(bodyLength, averageBody, luxmodel::bodyLengthShare);
+                relative(titleLength, averageTitle, luxmodel::titleLengthShare,
+                         luxmodel::titleLengthExponent) +
+            bodyCount / relative(bodyLength, averageBody, luxmodel::bodyLengthShare,
+                                 luxmodel::bodyLengthExponent);
   }
   return count / (luxmodel::saturation + count);
 }

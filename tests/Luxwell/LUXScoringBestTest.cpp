@@ -74,7 +74,8 @@ TEST(LUXScoringGroups, FindsTheHighestOfEachGroup) {
     score = static_cast<float>(random() % 1000) / 1000 - 0.2F;
   }
   std::vector<float> maxima(8);
-  luxscoring::findGroupMaxima(scores.data(), maxima.size(), maxima.data());
+  EXPECT_EQ(luxscoring::findGroupMaxima(scores.data(), maxima.size(), maxima.data()),
+            *std::max_element(scores.begin(), scores.end()));
   for (size_t group = 0; group < maxima.size(); ++group) {
     const float* const first = scores.data() + group * luxscoring::groupLength;
     EXPECT_EQ(maxima[group], *std::max_element(first, first + luxscoring::groupLength));
@@ -90,4 +91,23 @@ TEST(LUXScoringGroups, TellsWhichScoresLieBetweenTwo) {
   EXPECT_EQ(luxscoring::scoresWithin(scores.data(), 14, 100), 0xC000U);
   EXPECT_EQ(luxscoring::scoresWithin(scores.data(), 0, 1), 1U);
   EXPECT_EQ(luxscoring::scoresWithin(scores.data(), 6, 3), 0U);
+}
+
+TEST(LUXScoringGroups, FourGroupsAreFourTimesOne) {
+  std::mt19937 random(5);
+  std::vector<float> scores(4 * luxscoring::groupLength);
+  for (float& score : scores) {
+    score = static_cast<float>(random() % 100) / 100;
+  }
+  std::vector<float> maxima(4);
+  luxscoring::findGroupMaxima(scores.data(), maxima.size(), maxima.data());
+  for (const float least : {0.0F, 0.5F, 0.9F, 1.5F}) {
+    uint64_t bits = 0;
+    for (size_t group = 0; group < 4; ++group) {
+      bits |= static_cast<uint64_t>(luxscoring::scoresWithin(
+                  scores.data() + group * luxscoring::groupLength, least, 0.95F))
+              << (group * luxscoring::groupLength);
+    }
+    EXPECT_EQ(luxscoring::scoresWithinFourGroups(scores.data(), maxima.data(), least, 0.95F), bits);
+  }
 }

@@ -2,6 +2,9 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <cmath>
+#include <limits>
 #include <random>
 #include <vector>
 
@@ -28,6 +31,25 @@ TEST(LUXInnerProduct, IsTheSameWithAndWithoutWideInstructions) {
   }
 }
 
+TEST(LUXInnerProduct, OfManyVectorsIsThatOfEach) {
+  std::mt19937 random(6);
+  for (const size_t length : {size_t{32}, size_t{64}, size_t{320}}) {
+    const auto vector = randomVector(length, random);
+    for (size_t count = 0; count <= 9; ++count) {
+      const auto others = randomVector(length * count, random);
+      std::vector<int32_t> products(count);
+      std::vector<int32_t> plain(count);
+      LUXInnerProducts(vector.data(), others.data(), length, count, products.data());
+      LUXPlainInnerProducts(vector.data(), others.data(), length, count, plain.data());
+      for (size_t i = 0; i < count; ++i) {
+        EXPECT_EQ(products[i],
+                  LUXPlainInnerProduct(vector.data(), others.data() + i * length, length));
+        EXPECT_EQ(products[i], plain[i]);
+      }
+    }
+  }
+}
+
 TEST(LUXInnerProduct, HoldsTheLargestNumbers) {
   const std::vector<int8_t> high(320, 127);
   const std::vector<int8_t> low(320, -127);
@@ -51,4 +73,53 @@ TEST(LUXInnerProduct, TakesAMinimumThatOnlyADamagedFileHolds) {
   const std::vector<int8_t> query(32, 127);
   const std::vector<int8_t> page(32, -128);
   EXPECT_EQ(LUXInnerProduct(query.data(), page.data(), 32), -32 * 127 * 128);
+}
+
+TEST(LUXAddScaled, AddsEachProduct) {
+  std::mt19937 random(8);
+  const auto vector = randomVector(96, random);
+  std::vector<float> sum(96, 1.5F);
+  LUXAddScaled(sum.data(), vector.data(), -0.75F, sum.size());
+  for (size_t i = 0; i < sum.size(); ++i) {
+    EXPECT_EQ(sum[i], 1.5F + -0.75F * static_cast<float>(vector[i]));
+  }
+}
+
+TEST(LUXQuantize, KeepsDirectionAndGivesTheLength) {
+  std::mt19937 random(9);
+  std::vector<float> sum(64);
+  for (float& component : sum) {
+    component = static_cast<float>(random() % 2001) / 1000 - 1;
+  }
+  sum[7] = -3;
+  std::vector<int8_t> vector(64);
+  const float scale = LUXQuantize(sum.data(), vector.data(), sum.size());
+  EXPECT_EQ(vector[7], -127);
+  float squares = 0;
+  for (size_t i = 0; i < sum.size(); ++i) {
+    EXPECT_NEAR(static_cast<float>(vector[i]), sum[i] * 127 / 3, 0.501F);
+    squares += static_cast<float>(vector[i]) * scale * static_cast<float>(vector[i]) * scale;
+  }
+  EXPECT_NEAR(squares, 1, 1e-5);
+}
+
+TEST(LUXQuantize, HasNothingToSayOfNothing) {
+  std::vector<int8_t> vector(32, 5);
+  for (const float component :
+       {0.0F, std::numeric_limits<float>::quiet_NaN(), std::numeric_limits<float>::infinity(),
+        std::numeric_limits<float>::denorm_min()}) {
+    const std::vector<float> sum(32, component);
+    EXPECT_EQ(LUXQuantize(sum.data(), vector.data(), sum.size()), 0);
+  }
+  EXPECT_EQ(vector, std::vector<int8_t>(32, 5));
+  EXPECT_EQ(LUXQuantize(nullptr, nullptr, 0), 0);
+}
+
+TEST(LUXQuantize, CountsWhatIsNoNumberAsZero) {
+  std::vector<float> sum(32, 1);
+  sum[3] = std::numeric_limits<float>::quiet_NaN();
+  std::vector<int8_t> vector(32);
+  EXPECT_GT(LUXQuantize(sum.data(), vector.data(), sum.size()), 0);
+  EXPECT_EQ(vector[3], 0);
+  EXPECT_EQ(vector[4], 127);
 }

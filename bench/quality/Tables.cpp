@@ -1,0 +1,160 @@
+#include "bench/quality/Tables.h"
+
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <array>
+#include <iterator>
+
+namespace quality {
+
+namespace {
+
+constexpr std::array<const char*, 5> engineNames = {ours, xapian, xapianTitles, sqlite, bm25};
+
+/// What nDCG@10 has to reach.
+double goalOf(const std::string& name) {
+  static const std::map<std::string, double> goals = {
+      {"cran", .475},         {"cisi", .415},
+      {"cacm", .52},          {"libreoffice-keywords", .67},
+      {"gimp-keywords", .81}, {"gnome-titles", .805},
+      {"python-titles", .57}, {"gnome-descriptions", .815}};
+  const auto goal = goals.find(name);
+  return goal == goals.end() ? 0 : goal->second;
+}
+
+std::string shortNumber(double number) {
+  std::string text = fmt::format("{:.3f}", number);
+  if (text.starts_with("0.")) {
+    text.erase(0, 1);
+  } else if (text.starts_with("-0.")) {
+    text.erase(1, 1);
+  }
+  return text;
+}
+
+const Measured& engine(const Result& result, const char* name) { return result.engines.at(name); }
+
+const char* bestPeer(const Result& result) {
+  const char* best = xapian;
+  for (const char* name : {xapianTitles, sqlite}) {
+    if (engine(result, name).metrics.ndcg10 > engine(result, best).metrics.ndcg10) {
+      best = name;
+    }
+  }
+  return best;
+}
+
+std::string rankingTable(const std::vector<Result>& results) {
+  std::string text =
+      "| collection | pages | queries | Luxwell | Xapian | Xapian, titles ×4 | SQLite FTS5 | BM25 "
+      "| "
+      "goal | over best peer | p | over BM25 | p |\n"
+      "|---|---:|---:|---:|---:|---:|---:|---:|---:|---:|---:|---:|---:|\n";
+  std::map<std::string, double> sums;
+  for (const Result& result : results) {
+    const Measured& own = engine(result, ours);
+    const Measured& peer = engine(result, bestPeer(result));
+    const Measured& plain = engine(result, bm25);
+    text += fmt::format("| {} | {} | {} ", result.name, result.documentCount, result.queryCount);
+    for (const char* name : engineNames) {
+      const double value = engine(result, name).metrics.ndcg10;
+      sums[name] += value;
+      text += fmt::format("| {} ", shortNumber(value));
+    }
+    const double goal = goalOf(result.name);
+    text += fmt::format("| {} | {} | {} | {} | {} |\n", goal > 0 ? shortNumber(goal) : "",
+                        shortNumber(own.metrics.ndcg10 - peer.metrics.ndcg10),
+                        shortNumber(randomisationTest(own.perQuery, peer.perQuery)),
+                        shortNumber(own.metrics.ndcg10 - plain.metrics.ndcg10),
+                        shortNumber(randomisationTest(own.perQuery, plain.perQuery)));
+  }
+  const auto count = static_cast<double>(std::max<size_t>(1, results.size()));
+  const double bestMean = std::max({sums[xapian], sums[xapianTitles], sums[sqlite]}) / count;
+  text += "| **mean** | | ";
+  for (const char* name : engineNames) {
+    text += fmt::format("| {} ", shortNumber(sums[name] / count));
+  }
+  text += fmt::format("| | {} | | {} | |\n", shortNumber(sums[ours] / count - bestMean),
+                      shortNumber((sums[ours] - sums[bm25]) / count));
+  return text;
+}
+
+std::string otherMeasuresTable(const std::vector<Result>& results) {
+  std::string text = "| collection ";
+  for (const char* measure : {"MAP", "Recall@100", "reciprocal rank"}) {
+    for (const char* name : {ours, xapian, sqlite, bm25}) {
+      text += fmt::format("| {} {} ", measure, name);
+    }
+  }
+  text += "|\n|---";
+  for (int i = 0; i < 12; ++i) {
+    text += "|---:";
+  }
+  text += "|\n";
+  for (const Result& result : results) {
+    text += fmt::format("| {} ", result.name);
+    for (double Metrics::*measure : {&Metrics::map, &Metrics::recall100, &Metrics::mrr}) {
+      for (const char* name : {ours, xapian, sqlite, bm25}) {
+        text += fmt::format("| {} ", shortNumber(engine(result, name).metrics.*measure));
+      }
+    }
+    text += "|\n";
+  }
+  return text;
+}
+
+std::string checksTable(const std::vector<Result>& results) {
+  std::string text =
+      "| collection | exact titles first with 1.0 | everyday questions answered | questions on "
+      "other "
+      "subjects answered | own answers lost |\n|---|---:|---:|---:|---:|\n";
+  for (const Result& result : results) {
+    text += fmt::format("| {} | {} of {} | {:.1f} % | {:.1f} % | {:.1f} % |\n", result.name,
+                        result.titles.count, result.titles.total, result.everyday.foreign.percent(),
+                        result.foreign.foreign.percent(), result.foreign.lost.percent());
+  }
+  return text;
+}
+
+std::string suggestionsTable(const std::vector<Result>& results) {
+  std::string text =
+      "| collection | phrases | completed after four letters | by frequency | similar searches | "
+      "by "
+      "phrase vectors | similar, no word shared | by phrase vectors |\n"
+      "|---|---:|---:|---:|---:|---:|---:|---:|\n";
+  for (const Result& result : results) {
+    text += fmt::format(
+        "| {} | {} | {} | {} | {} | {} | {} | {} |\n", result.name, result.completions.count,
+        shortNumber(result.completions.ours), shortNumber(result.completions.other),
+        shortNumber(result.similar.ours), shortNumber(result.similar.other),
+        shortNumber(result.similarOtherWords.ours), shortNumber(result.similarOtherWords.other));
+  }
+  return text;
+}
+
+std::string originList(const std::vector<Result>& results) {
+  std::string text;
+  for (const Result& result : results) {
+    text += fmt::format("* {}: {}{}\n", result.name,
+                        result.origin.empty() ? "given as a folder" : result.origin,
+                        result.detectedLanguage == result.language
+                            ? ""
+                            : fmt::format(" (language taken for {})", result.detectedLanguage));
+  }
+  return text;
+}
+
+}  // namespace
+
+std::string tables(const std::vector<Result>& results, bool withChecks) {
+  std::string text = "### nDCG@10\n\n" + rankingTable(results) + "\n### Other measures\n\n" +
+                     otherMeasuresTable(results);
+  if (withChecks) {
+    text += "\n### Titles and foreign questions\n\n" + checksTable(results) +
+            "\n### Suggestions\n\n" + suggestionsTable(results);
+  }
+  return text + "\n### Where the pages come from\n\n" + originList(results);
+}
+
+}  // namespace quality
