@@ -5,6 +5,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <cerrno>
 #include <chrono>
 #include <csignal>
@@ -339,6 +340,32 @@ TEST_F(HelpLUXModelFile, OptionsThatNobodyCanKeepAreLoggedAndLeaveTheOldModel) {
       {"Address", platform::URL::URLWithString("https://example.org/").value()}}));
   EXPECT_EQ(environment.log().messages(1).size(), 1U);
   EXPECT_EQ(model->allHelpbookIDs(), Names{"old"});
+}
+
+TEST_F(HelpLUXModelFile, ViewsMayBeTakenWhileModelsAreSaved) {
+  const auto model = open();
+  save(*model);
+  std::atomic<bool> isOver{false};
+  std::atomic<size_t> damaged{0};
+  std::vector<std::thread> readers;
+  readers.reserve(3);
+  for (int i = 0; i < 3; ++i) {
+    readers.emplace_back([&, reader = i == 0 ? model : open()] {
+      while (!isOver) {
+        const auto view = reader->view();
+        damaged += view == nullptr || !view->checksumsMatch() || reader->needsBuild() ? 1 : 0;
+        reader->activity();
+      }
+    });
+  }
+  for (int i = 0; i < 20; ++i) {
+    save(*model, "book" + std::to_string(i));
+  }
+  isOver = true;
+  for (std::thread& reader : readers) {
+    reader.join();
+  }
+  EXPECT_EQ(damaged, 0U);
 }
 
 TEST_F(HelpLUXModelFile, LeftoversOfProcessesThatHaveEndedAreDeleted) {

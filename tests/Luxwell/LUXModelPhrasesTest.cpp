@@ -244,6 +244,7 @@ TEST(LUXModelPhrases, AThresholdThatAPhraseJustReachesLetsItPass) {
 
 TEST(LUXModelPhrases, OneBookThatIsContentIsEnough) {
   std::vector<ModelPage> pages;
+  pages.reserve(6);
   for (int i = 0; i < 6; ++i) {
     pages.push_back({i % 2 == 0 ? "one" : "two", std::to_string(i), "", "print queue"});
   }

@@ -140,6 +140,7 @@ TEST(LUXModelView, PostingsAreThoseOfEachPageAlone) {
           EXPECT_NEAR(luxposting::impact(posting), impact, .51) << token;
         }
         std::vector<uint32_t> expectedPages;
+        expectedPages.reserve(expected.size());
         for (const auto& [page, tf] : expected) {
           expectedPages.push_back(page);
         }
@@ -393,6 +394,7 @@ TEST(LUXModelView, EveryPageIsInTheNeighbourhoodOfItsNearestCentre) {
 
 TEST(LUXModelView, PagesThatAreAllAlikeHaveNoMeaning) {
   std::vector<ModelPage> pages;
+  pages.reserve(5);
   for (int i = 0; i < 5; ++i) {
     pages.push_back({"book", std::to_string(i), "Same title", "The same words."});
   }
