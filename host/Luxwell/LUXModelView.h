@@ -52,7 +52,7 @@ inline constexpr double bodyLengthShare = 0.9;
 inline constexpr double bodyLengthExponent = 0.6;
 
 /// Pages from which on there are neighbourhoods.
-inline constexpr size_t neighbourhoodPageCount = 4096;
+inline constexpr size_t neighbourhoodPageCount = 512;
 
 /// Vectors are filled up with zeros to a multiple of this, and no longer than that.
 inline constexpr uint32_t vectorBlock = 32;
@@ -130,6 +130,8 @@ class LUXModelView {
   std::pair<uint32_t, uint32_t> termRangeWithPrefix(LUXTokenKind kind,
                                                     std::string_view prefix) const noexcept;
   std::string term(LUXTokenKind kind, uint32_t number) const;
+  /// termNumber() of a pair whose stems' numbers are known.
+  std::optional<uint32_t> pairNumber(uint32_t firstStem, uint32_t secondStem) const noexcept;
   /// Out of totalPageCount(). At least the number of postings.
   uint32_t documentFrequency(LUXTokenKind kind, uint32_t number) const noexcept;
   /// luxposting, in order of pages, each page once. Pages that may not be found have none.
