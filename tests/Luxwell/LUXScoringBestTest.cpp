@@ -82,15 +82,18 @@ TEST(LUXScoringGroups, FindsTheHighestOfEachGroup) {
   }
 }
 
-TEST(LUXScoringGroups, TellsWhichScoresLieBetweenTwo) {
+TEST(LUXScoringGroups, TellsWhichScoresReachAnother) {
   std::vector<float> scores(luxscoring::groupLength);
   for (size_t i = 0; i < scores.size(); ++i) {
-    scores[i] = static_cast<float>(i);
+    scores[i] = static_cast<float>((i * 5) % 16);
   }
-  EXPECT_EQ(luxscoring::scoresWithin(scores.data(), 3, 6), 0b111000U);
-  EXPECT_EQ(luxscoring::scoresWithin(scores.data(), 14, 100), 0xC000U);
-  EXPECT_EQ(luxscoring::scoresWithin(scores.data(), 0, 1), 1U);
-  EXPECT_EQ(luxscoring::scoresWithin(scores.data(), 6, 3), 0U);
+  for (const float least : {-1.0F, 0.0F, 3.0F, 14.5F, 15.0F, 16.0F}) {
+    uint32_t expected = 0;
+    for (size_t i = 0; i < scores.size(); ++i) {
+      expected |= (scores[i] >= least ? 1U : 0U) << i;
+    }
+    EXPECT_EQ(luxscoring::scoresReaching(scores.data(), least), expected);
+  }
 }
 
 TEST(LUXScoringGroups, FourGroupsAreFourTimesOne) {
@@ -104,10 +107,10 @@ TEST(LUXScoringGroups, FourGroupsAreFourTimesOne) {
   for (const float least : {0.0F, 0.5F, 0.9F, 1.5F}) {
     uint64_t bits = 0;
     for (size_t group = 0; group < 4; ++group) {
-      bits |= static_cast<uint64_t>(luxscoring::scoresWithin(
-                  scores.data() + group * luxscoring::groupLength, least, 0.95F))
+      bits |= static_cast<uint64_t>(luxscoring::scoresReaching(
+                  scores.data() + group * luxscoring::groupLength, least))
               << (group * luxscoring::groupLength);
     }
-    EXPECT_EQ(luxscoring::scoresWithinFourGroups(scores.data(), maxima.data(), least, 0.95F), bits);
+    EXPECT_EQ(luxscoring::scoresReachingInFourGroups(scores.data(), maxima.data(), least), bits);
   }
 }
