@@ -200,6 +200,7 @@ TEST(LUXModelView, ManyTermsWithTheSameBeginningAreToldApart) {
       names.push_back("samehead" + std::to_string(1000 + 2 * i));
     }
     std::vector<LUXTokenCount> tokens;
+    tokens.reserve(names.size());
     for (const std::string& name : names) {
       tokens.push_back({name, LUXTokenKind::stem, 0, 1});
     }
