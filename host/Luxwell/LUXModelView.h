@@ -42,7 +42,7 @@ namespace luxmodel {
 
 /// How fast repetitions stop counting, and how much more one occurrence in a title counts.
 inline constexpr double saturation = 2.5;
-inline constexpr double titleWeight = 5;
+inline constexpr double titleWeight = 4;
 /// A field that is longer than the average has more of everything by chance: counts are divided by
 /// 1 - share + share * (length / average)^exponent. Long bodies are not that much less about their
 /// subject than their length says. Pairs of stems have one field that is as long as both.

@@ -70,7 +70,7 @@ class NaiveModel {
         posting.tf = kind == LUXTokenKind::bigram
                          ? posting.count / relative(.9, .6, titleLength + bodyLength,
                                                     titleAverage + bodyAverage)
-                         : 5 * count.titleCount / relative(.5, 1, titleLength, titleAverage) +
+                         : 4 * count.titleCount / relative(.5, 1, titleLength, titleAverage) +
                                count.bodyCount / relative(.9, .6, bodyLength, bodyAverage);
       }
     }
