@@ -56,7 +56,7 @@ class Search {
     if (!_takeFrom(lexicallyBest)) {
       return {};
     }
-    _best.settle();
+    _best.raiseThreshold();
     if (!_plan.latent.empty() && !(lexicallyBest > leastScore ? _takeFrom(_leastWithinReach())
                                    : _best.threshold() > 0    ? true
                                                               : _takeThoseWithoutWords())) {
@@ -295,7 +295,7 @@ class Search {
   static constexpr size_t waitingLength = 16;
   // How many pages are looked at for each that is wanted, and at least.
   static constexpr size_t neighboursWanted = 8;
-  static constexpr size_t fewestNeighbours = 1024;
+  static constexpr size_t fewestNeighbours = 256;
 
   const LUXModelView& _view;
   const LUXScoringPlan& _plan;

@@ -40,16 +40,45 @@ TEST(LUXBest, KeepsWhatSortingEverythingWouldKeep) {
   }
 }
 
-TEST(LUXBest, TheThresholdIsTheWorstThatIsKept) {
+TEST(LUXBest, KeepsTheBestWhateverTheirScoresAreLike) {
+  std::mt19937 random(13);
+  for (const size_t size : {size_t{20}, size_t{300}, size_t{6000}}) {
+    for (const int kind : {0, 1, 2, 3}) {
+      LUXBest best(100);
+      Pairs all;
+      for (uint32_t i = 0; i < size; ++i) {
+        const float share = static_cast<float>(random() % 100000) / 100000;
+        const float score = kind == 0   ? share
+                            : kind == 1 ? share * share * share * 1e-4F
+                            : kind == 2 ? 0.5F
+                                        : 1 / (share + 1e-5F);
+        all.emplace_back(i, score);
+        best.add(i, score);
+        if (i % 150 == 149) {
+          best.raiseThreshold();
+        }
+      }
+      std::sort(all.begin(), all.end(), [](const auto& a, const auto& b) {
+        return a.second != b.second ? a.second > b.second : a.first < b.first;
+      });
+      all.resize(std::min(all.size(), size_t{100}));
+      EXPECT_EQ(sorted(best), all) << size << ' ' << kind;
+    }
+  }
+}
+
+TEST(LUXBest, TheThresholdIsReachedByAllThatAreKept) {
   LUXBest best(2);
   best.add(1, 0.5F);
-  best.settle();
+  best.raiseThreshold();
   EXPECT_EQ(best.threshold(), 0);
   best.add(2, 0.7F);
   best.add(3, 0.6F);
-  best.settle();
-  EXPECT_EQ(best.threshold(), 0.6F);
-  EXPECT_EQ(sorted(best).size(), 2U);
+  best.raiseThreshold();
+  EXPECT_LE(best.threshold(), 0.6F);
+  EXPECT_GT(best.threshold(), 0.59F);
+  best.add(4, 0.55F);
+  EXPECT_EQ(sorted(best), (Pairs{{2, 0.7F}, {3, 0.6F}}));
 }
 
 TEST(LUXBest, TakesTheHighestAndTheLowestNumbers) {
@@ -63,7 +92,7 @@ TEST(LUXBest, TakesTheHighestAndTheLowestNumbers) {
 TEST(LUXBest, NothingIsWantedAndNothingKept) {
   LUXBest best(0);
   best.add(1, 1);
-  best.settle();
+  best.raiseThreshold();
   EXPECT_TRUE(best.sorted().empty());
 }
 
