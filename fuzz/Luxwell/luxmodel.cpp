@@ -62,6 +62,7 @@ platform::Data edited(std::string_view edits) {
     edits.remove_prefix(4 + bytes.size());
   }
   std::vector<LUXSection> made;
+  made.reserve(sections.size());
   for (const Section& section : sections) {
     made.push_back(LUXSection::sectionWithBytes(section.type, platform::Data::copy(section.bytes)));
   }

@@ -206,13 +206,18 @@ platform::Value HelpLUXIndex::fileProperitesForKey(std::string_view key) const {
   uint64_t flags = 0;
   uint64_t titleLength = 0;
   if (!readVarnumber(at, end, flags) || !readVarnumber(at, end, titleLength) ||
-      titleLength > static_cast<uint64_t>(end - at) || !platform::isValidUTF8(record)) {
+      titleLength > static_cast<uint64_t>(end - at)) {
     return properties;
   }
   const std::string_view texts = record.substr(static_cast<size_t>(at - bytesOf(record)));
-  properties.emplace(HelpDocPropertyTitle, texts.substr(0, titleLength));
+  const std::string_view title = texts.substr(0, titleLength);
+  const std::string_view description = texts.substr(titleLength);
+  if (!platform::isValidUTF8(title) || !platform::isValidUTF8(description)) {
+    return properties;
+  }
+  properties.emplace(HelpDocPropertyTitle, title);
   if ((flags & hasDescriptionFlag) != 0) {
-    properties.emplace(HelpDocPropertyDescription, texts.substr(titleLength));
+    properties.emplace(HelpDocPropertyDescription, description);
   }
   if ((flags & excludedFlag) != 0) {
     properties.emplace(HelpDocPropertyExcludeFromSearch, true);

@@ -68,7 +68,7 @@ std::string pathComponent(std::string_view name) {
 
 }  // namespace
 
-void HelpLUXModel::setGroupList(platform::Value list) {
+void HelpLUXModel::setGroupList(const platform::Value& list) {
   auto groups = std::make_shared<const LUXModelGroups>(list);
   const platform::MutexLock lock(groupList().mutex);
   groupList().groups = std::move(groups);
@@ -78,7 +78,7 @@ bool HelpLUXModel::setGroupListFromFile(const std::string& path) {
   const auto data = platform::Environment::current()->files->contentsAtPath(path);
   auto list = data ? LUXModelGroups::listFromData(*data) : std::nullopt;
   if (list) {
-    setGroupList(std::move(*list));
+    setGroupList(*list);
   }
   return list.has_value();
 }

@@ -44,7 +44,7 @@ class HelpLUXModel {
  public:
   /// The list in force from now on; what is not as above counts as not there. Without a list there
   /// is the default group "Default" alone.
-  static void setGroupList(platform::Value groupList);
+  static void setGroupList(const platform::Value& groupList);
   /// The list of a property list file. False, with the list in force unchanged, when it cannot be
   /// read or is none.
   static bool setGroupListFromFile(const std::string& path);

@@ -555,6 +555,8 @@ std::string HelpTokenizer::formOfSurface(std::string_view surface) const {
 
 std::string HelpTokenizer::_folded(std::string_view surface) const {
   std::string folded = luxfolding::caseFolded(surface, _language);
+  // A few ligatures stand for whole phrases, and tokens are joined by blanks.
+  folded.erase(std::remove(folded.begin(), folded.end(), ' '), folded.end());
   unifyApostrophes(folded);
   folded.resize(beginningOf(folded, maximumFormLength).size());
   return folded;
@@ -569,7 +571,8 @@ void HelpTokenizer::wordsOfText(std::string_view text, std::vector<Word>& words)
     breaks = breaks || segment.breaksChain;
     if (std::optional<Word> word = wordOfSurface(segment.surface)) {
       word->breaksChain = breaks;
-      if (!segment.whole.empty()) {
+      // A part before it that leaves nothing may be what the name begins with.
+      if (!segment.whole.empty() && !breaks) {
         word->wholeForm = formOfSurface(segment.whole);
       }
       words.push_back(std::move(*word));

@@ -1,6 +1,7 @@
 #include "host/Luxwell/LUXCompletion.h"
 
 #include <algorithm>
+#include <cstddef>
 #include <span>
 #include <string_view>
 
@@ -13,6 +14,7 @@ namespace {
 // Phrases have no more words.
 constexpr size_t longestPhrase = 4;
 constexpr uint32_t blockLength = LUXModelView::phraseBlockLength;
+constexpr size_t usualCount = 64;
 // So many blocks are looked at between two questions whether to give up.
 constexpr uint32_t stepLength = 256;
 
@@ -22,6 +24,7 @@ std::vector<LUXScoredPhrase> LUXCompletions(const LUXModelView& view, const LUXQ
                                             size_t count, std::optional<uint32_t> book,
                                             const LUXIsCancelled& isCancelled) {
   std::vector<LUXScoredPhrase> found;
+  found.reserve(std::min(count, usualCount));
   const size_t words = terms.wordStarts.size();
   const std::span<const float> scores = view.phraseScores();
   const std::span<const float> maxima = view.phraseBlockMaxima();
@@ -55,9 +58,11 @@ std::vector<LUXScoredPhrase> LUXCompletions(const LUXModelView& view, const LUXQ
         }
       }
     }
+    const size_t before = found.size();
     for (const LUXBest::Item& item : best.sorted()) {
       const auto isThis = [&](const LUXScoredPhrase& other) { return other.phrase == item.number; };
-      if (std::none_of(found.begin(), found.end(), isThis)) {
+      const auto former = found.begin() + static_cast<std::ptrdiff_t>(before);
+      if (std::none_of(found.begin(), former, isThis)) {
         found.push_back({item.number, most * (1 + std::min(item.score, 1.0F)) / 2});
       }
     }

@@ -125,15 +125,16 @@ struct LUXIndexWriter::Implementation {
     for (const HelpTokenizer::Segment& segment : segments) {
       breaks = breaks || segment.breaksChain;
       const uint32_t number = surfaceNumber(segment.surface);
-      if (surfaces[number].form != none) {
-        page.sequence.words.push_back({number, breaks});
-        breaks = false;
+      if (surfaces[number].form == none) {
+        continue;
       }
-      if (!segment.whole.empty()) {
+      if (!segment.whole.empty() && !breaks) {
         if (const std::string form = tokenizer->formOfSurface(segment.whole); !form.empty()) {
           page.wholes.push_back({forms.numberOf(form), isTitle});
         }
       }
+      page.sequence.words.push_back({number, breaks});
+      breaks = false;
     }
   }
 

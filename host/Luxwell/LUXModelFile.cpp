@@ -9,6 +9,7 @@
 #include "host/Luxwell/LUXModelView.h"
 #include "platform/Environment.h"
 #include "platform/Files.h"
+#include "platform/MappingGuard.h"
 #include "platform/Processes.h"
 
 namespace {
@@ -58,7 +59,7 @@ void LUXModelFile::_open(std::chrono::system_clock::time_point modified) {
   _view = nullptr;
   _length = 0;
   if (const auto data = environment->files->contentsMappedAtPath(_path)) {
-    _view = LUXModelView::viewWithData(*data);
+    _view = LUXModelView::viewWithData(platform::dataGuardedAgainstTruncation(*data));
     _length = data->length();
   }
   _modified = modified;

@@ -15,8 +15,9 @@ class LUXModelView;
 
 /// The file of a model in the model's folder. A new model takes the place of the old one in one
 /// step, and views of the old one stay as they are. Should somebody else write into the file or cut
-/// it off, then whoever asks for a view after that gets one of what is there, or none.
-/// Thread-safety: internally synchronised.
+/// it off, then whoever asks for a view after that gets one of what is there, or none; views that
+/// are in use read what is there, and zeros where nothing is left. Thread-safety: internally
+/// synchronised.
 class LUXModelFile {
  public:
   static constexpr const char* fileName = "LUXModel";

@@ -88,20 +88,30 @@ std::string_view LUXModelView::Strings::at(size_t number) const noexcept {
 
 uint32_t LUXModelView::Strings::lowerBound(std::string_view string) const noexcept {
   const uint64_t head = luxmodel::headOf(string);
-  const auto first = std::lower_bound(heads.begin(), heads.end(), head);
-  auto from = static_cast<uint32_t>(first - heads.begin());
-  // Strings that differ from this one behind the first eight bytes only.
-  auto count = static_cast<uint32_t>(std::upper_bound(first, heads.end(), head) - first);
-  while (count > 0) {
-    const uint32_t half = count / 2;
-    if (at(from + half) < string) {
+  // Halves the places without a branch: which way to go is anybody's guess.
+  size_t from = 0;
+  for (size_t count = heads.size(); count > 0;) {
+    const size_t half = (count + 1) / 2;
+    from += half * static_cast<size_t>(heads[from + half - 1] < head);
+    count -= half;
+  }
+  // Strings that differ from this one behind the first eight bytes only. There are seldom any.
+  size_t reach = 1;
+  while (from + reach <= heads.size() && heads[from + reach - 1] == head &&
+         at(from + reach - 1) < string) {
+    reach *= 2;
+  }
+  from += reach / 2;
+  for (size_t count = std::min(reach - 1 - reach / 2, heads.size() - from); count > 0;) {
+    const size_t half = count / 2;
+    if (heads[from + half] == head && at(from + half) < string) {
       from += half + 1;
       count -= half + 1;
     } else {
       count = half;
     }
   }
-  return from;
+  return static_cast<uint32_t>(from);
 }
 
 std::pair<uint32_t, uint32_t> LUXModelView::Strings::rangeWithPrefix(
@@ -290,12 +300,7 @@ std::optional<uint32_t> LUXModelView::termNumber(LUXTokenKind kind,
     if (!first || !second) {
       return std::nullopt;
     }
-    const auto seconds = itemsBetween(_pairStarts, *first, _pairSeconds);
-    const auto found = std::lower_bound(seconds.begin(), seconds.end(), *second);
-    if (found == seconds.end() || *found != *second) {
-      return std::nullopt;
-    }
-    return static_cast<uint32_t>(&*found - _pairSeconds.data());
+    return pairNumber(*first, *second);
   }
   if (termCount(kind) == 0) {
     return std::nullopt;
@@ -304,6 +309,16 @@ std::optional<uint32_t> LUXModelView::termNumber(LUXTokenKind kind,
   const uint32_t number = strings.lowerBound(token);
   return number < strings.heads.size() && strings.at(number) == token ? std::optional(number)
                                                                       : std::nullopt;
+}
+
+std::optional<uint32_t> LUXModelView::pairNumber(uint32_t firstStem,
+                                                 uint32_t secondStem) const noexcept {
+  const auto seconds = itemsBetween(_pairStarts, firstStem, _pairSeconds);
+  const auto found = std::lower_bound(seconds.begin(), seconds.end(), secondStem);
+  if (found == seconds.end() || *found != secondStem) {
+    return std::nullopt;
+  }
+  return static_cast<uint32_t>(&*found - _pairSeconds.data());
 }
 
 std::pair<uint32_t, uint32_t> LUXModelView::termRangeWithPrefix(

@@ -42,7 +42,7 @@ namespace luxmodel {
 
 /// How fast repetitions stop counting, and how much more one occurrence in a title counts.
 inline constexpr double saturation = 2.5;
-inline constexpr double titleWeight = 5;
+inline constexpr double titleWeight = 4;
 /// A field that is longer than the average has more of everything by chance: counts are divided by
 /// 1 - share + share * (length / average)^exponent. Long bodies are not that much less about their
 /// subject than their length says. Pairs of stems have one field that is as long as both.
@@ -52,7 +52,7 @@ inline constexpr double bodyLengthShare = 0.9;
 inline constexpr double bodyLengthExponent = 0.6;
 
 /// Pages from which on there are neighbourhoods.
-inline constexpr size_t neighbourhoodPageCount = 4096;
+inline constexpr size_t neighbourhoodPageCount = 512;
 
 /// Vectors are filled up with zeros to a multiple of this, and no longer than that.
 inline constexpr uint32_t vectorBlock = 32;
@@ -130,6 +130,8 @@ class LUXModelView {
   std::pair<uint32_t, uint32_t> termRangeWithPrefix(LUXTokenKind kind,
                                                     std::string_view prefix) const noexcept;
   std::string term(LUXTokenKind kind, uint32_t number) const;
+  /// termNumber() of a pair whose stems' numbers are known.
+  std::optional<uint32_t> pairNumber(uint32_t firstStem, uint32_t secondStem) const noexcept;
   /// Out of totalPageCount(). At least the number of postings.
   uint32_t documentFrequency(LUXTokenKind kind, uint32_t number) const noexcept;
   /// luxposting, in order of pages, each page once. Pages that may not be found have none.

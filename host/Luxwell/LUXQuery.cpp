@@ -87,16 +87,16 @@ std::vector<std::shared_ptr<LUXHit>> LUXQuery::_results() const {
     }
   }
   const LUXIsCancelled isCancelled = [this] { return this->isCancelled(); };
-  const LUXQueryTerms terms = LUXQueryTerms::termsOfText(*tokenizer, _queryString, isCancelled);
-  switch (_queryType) {
-    case LUXQueryTypeCompletions:
-      return LUXHit::hitsForPhrases(
-          *view, LUXCompletions(*view, terms, _requestedCount, book, isCancelled));
-    case LUXQueryTypeSimilar:
-      return LUXHit::hitsForPhrases(
-          *view, LUXSimilarPhrases(*view, terms, _requestedCount, scope, book, isCancelled));
-    default:
-      return LUXHit::hitsForPages(
-          *view, LUXScoring(*view).bestPages(terms, _requestedCount, scope, isCancelled));
+  if (_queryType == LUXQueryTypeCompletions) {
+    const LUXQueryTerms typed = LUXQueryTerms::foldedTextOf(*tokenizer, _queryString);
+    return LUXHit::hitsForPhrases(*view,
+                                  LUXCompletions(*view, typed, _requestedCount, book, isCancelled));
   }
+  const LUXQueryTerms terms = LUXQueryTerms::termsOfText(*tokenizer, _queryString, isCancelled);
+  if (_queryType == LUXQueryTypeSimilar) {
+    return LUXHit::hitsForPhrases(
+        *view, LUXSimilarPhrases(*view, terms, _requestedCount, scope, book, isCancelled));
+  }
+  return LUXHit::hitsForPages(
+      *view, LUXScoring(*view).bestPages(terms, _requestedCount, scope, isCancelled));
 }

@@ -4,6 +4,7 @@
 #include <unicode/utf8.h>
 
 #include <algorithm>
+#include <optional>
 #include <unordered_map>
 #include <utility>
 
@@ -19,31 +20,33 @@ class Collector {
  public:
   explicit Collector(std::vector<LUXQueryTerms::Term>& terms) : _terms(terms) {}
 
-  void add(std::string token) {
-    if (_terms.size() < mapSize) {
-      for (LUXQueryTerms::Term& term : _terms) {
-        if (term.token == token) {
-          ++term.count;
-          return;
-        }
-      }
+  // The token's place in the list.
+  uint32_t add(std::string token) {
+    const size_t place = _find(token);
+    if (place < _terms.size()) {
+      ++_terms[place].count;
     } else {
-      if (_places.empty()) {
-        for (size_t i = 0; i < _terms.size(); ++i) {
-          _places.emplace(_terms[i].token, i);
-        }
-      }
-      const auto [place, isNew] = _places.emplace(token, _terms.size());
-      if (!isNew) {
-        ++_terms[place->second].count;
-        return;
-      }
+      _terms.push_back({std::move(token), 1});
     }
-    _terms.push_back({std::move(token), 1});
+    return static_cast<uint32_t>(place);
   }
 
  private:
-  static constexpr size_t mapSize = 16;
+  static constexpr size_t longestSearched = 16;
+
+  // The end of the list for a token that is new, which is put there next.
+  size_t _find(const std::string& token) {
+    if (_terms.size() < longestSearched) {
+      const auto found =
+          std::find_if(_terms.begin(), _terms.end(),
+                       [&](const LUXQueryTerms::Term& term) { return term.token == token; });
+      return static_cast<size_t>(found - _terms.begin());
+    }
+    for (size_t i = _places.size(); i < _terms.size(); ++i) {
+      _places.emplace(_terms[i].token, i);
+    }
+    return _places.emplace(token, _terms.size()).first->second;
+  }
 
   std::vector<LUXQueryTerms::Term>& _terms;
   std::unordered_map<std::string, size_t> _places;
@@ -78,23 +81,48 @@ bool endsInsideWord(std::string_view text) {
   return character >= 0 && (u_isalnum(character) || (U_GET_GC_MASK(character) & U_GC_M_MASK) != 0);
 }
 
-void addBigrams(const std::vector<HelpTokenizer::Word>& words,
-                std::vector<LUXQueryTerms::Term>& terms) {
-  Collector bigrams(terms);
-  const HelpTokenizer::Word* former = nullptr;
-  for (const HelpTokenizer::Word& word : words) {
-    if (word.isStopWord) {
-      former = nullptr;
-      continue;
+void addFolded(const std::string& form, LUXQueryTerms& terms) {
+  HelpTokenizer::appendToDisplay(terms.foldedText, form);
+  terms.wordStarts.push_back(terms.foldedText.size() - form.size());
+}
+
+// Makes one of equal pairs.
+void countPairs(std::vector<LUXQueryTerms::Pair>& pairs) {
+  std::sort(pairs.begin(), pairs.end(), [](const auto& a, const auto& b) {
+    return a.first != b.first ? a.first < b.first : a.second < b.second;
+  });
+  size_t kept = 0;
+  for (size_t i = 0; i < pairs.size(); ++i) {
+    if (kept > 0 && pairs[kept - 1].first == pairs[i].first &&
+        pairs[kept - 1].second == pairs[i].second) {
+      ++pairs[kept - 1].count;
+    } else {
+      pairs[kept++] = pairs[i];
     }
-    if (former != nullptr && !word.breaksChain) {
-      bigrams.add(former->stem + ' ' + word.stem);
-    }
-    former = &word;
   }
+  pairs.resize(kept);
 }
 
 }  // namespace
+
+LUXQueryTerms LUXQueryTerms::foldedTextOf(const HelpTokenizer& tokenizer, std::string_view text) {
+  LUXQueryTerms terms;
+  if (text.size() > longestTitle) {
+    return terms;
+  }
+  std::vector<HelpTokenizer::Segment> segments;
+  std::string buffer;
+  tokenizer.segmentsOfText(text, segments, buffer);
+  for (const HelpTokenizer::Segment& segment : segments) {
+    if (const std::string form = tokenizer.formOfSurface(segment.surface); !form.empty()) {
+      addFolded(form, terms);
+    }
+  }
+  if (!terms.wordStarts.empty() && !endsInsideWord(text)) {
+    terms.foldedText += ' ';
+  }
+  return terms;
+}
 
 LUXQueryTerms LUXQueryTerms::termsOfText(const HelpTokenizer& tokenizer, std::string_view text,
                                          const LUXIsCancelled& isCancelled) {
@@ -113,18 +141,27 @@ LUXQueryTerms LUXQueryTerms::termsOfText(const HelpTokenizer& tokenizer, std::st
   }
   terms.onlyStopWords = std::all_of(
       words.begin(), words.end(), [](const HelpTokenizer::Word& word) { return word.isStopWord; });
+  const bool isFinished = !endsInsideWord(text);
+  if (!isFinished && !words.back().isStopWord) {
+    terms.unfinishedForm = words.back().form;
+    terms.unfinishedStem = words.back().stem;
+  }
+  terms.stems.reserve(words.size());
+  terms.forms.reserve(words.size());
   Collector stems(terms.stems);
   Collector forms(terms.forms);
   const bool isShort = text.size() <= longestTitle;
-  for (const HelpTokenizer::Word& word : words) {
+  // The place of the word before this one, where nothing stands between them.
+  std::optional<uint32_t> former;
+  for (HelpTokenizer::Word& word : words) {
     if (isShort) {
-      HelpTokenizer::appendToDisplay(terms.foldedText, word.form);
-      terms.wordStarts.push_back(terms.foldedText.size() - word.form.size());
+      addFolded(word.form, terms);
     }
     if (!word.wholeForm.empty()) {
-      forms.add(word.wholeForm);
+      forms.add(std::move(word.wholeForm));
     }
     if (word.isStopWord && !terms.onlyStopWords) {
+      former.reset();
       continue;
     }
     if (isShort) {
@@ -133,17 +170,16 @@ LUXQueryTerms LUXQueryTerms::termsOfText(const HelpTokenizer& tokenizer, std::st
       }
       terms.normalizedTitle += terms.onlyStopWords ? word.form : word.stem;
     }
-    stems.add(word.stem);
-    forms.add(word.form);
-  }
-  addBigrams(words, terms.bigrams);
-  if (!endsInsideWord(text)) {
-    if (isShort) {
-      terms.foldedText += ' ';
+    const uint32_t place = stems.add(std::move(word.stem));
+    forms.add(std::move(word.form));
+    if (former && !word.breaksChain && !terms.onlyStopWords) {
+      terms.bigrams.push_back({*former, place, 1});
     }
-  } else if (!words.back().isStopWord) {
-    terms.unfinishedForm = words.back().form;
-    terms.unfinishedStem = words.back().stem;
+    former = place;
+  }
+  countPairs(terms.bigrams);
+  if (isFinished && isShort) {
+    terms.foldedText += ' ';
   }
   return terms;
 }

@@ -12,18 +12,26 @@
 /// Asked every now and then by whatever takes long; true means: give up. Empty means: never.
 using LUXIsCancelled = std::function<bool()>;
 
-/// The terms of a text, each once with the number of times that it occurs, in order of their first
-/// occurrence. It depends on the language alone, not on a model. Thread-safety: immutable.
+/// The terms of a text, each once with the number of times that it occurs; stems and forms in order
+/// of their first occurrence. It depends on the language alone, not on a model. Thread-safety:
+/// immutable.
 struct LUXQueryTerms {
   struct Term {
     std::string token;
     uint32_t count = 1;
   };
 
+  /// Two stems by their places in `stems`.
+  struct Pair {
+    uint32_t first = 0;
+    uint32_t second = 0;
+    uint32_t count = 1;
+  };
+
   /// Stems of the words that are no stop words; of all words where there are only stop words.
   std::vector<Term> stems;
-  /// Pairs of stems that follow one another, joined by one blank, as pages have them.
-  std::vector<Term> bigrams;
+  /// Pairs of stems that follow one another with nothing between them, as pages have them.
+  std::vector<Pair> bigrams;
   /// Folded forms of the words that `stems` comes from, and of names that are made of several.
   std::vector<Term> forms;
   /// There are words, and all of them are stop words: no model counts their stems, only their
@@ -44,6 +52,10 @@ struct LUXQueryTerms {
   /// With each place at which a word begins. Empty, too, for a text that is longer than titles are.
   std::string foldedText;
   std::vector<size_t> wordStarts;
+
+  /// The folded text with its word starts alone, and nothing of the rest: all that completing
+  /// needs, which has to keep up with the keys.
+  static LUXQueryTerms foldedTextOf(const HelpTokenizer& tokenizer, std::string_view text);
 
   /// Takes a text apart. When cancelled, what there is so far.
   static LUXQueryTerms termsOfText(const HelpTokenizer& tokenizer, std::string_view text,

@@ -43,7 +43,7 @@ class Search {
         _wordShare(1 - plan.latentWeight),
         _best(_count),
         _lexical(_roundedUp(scope.end - scope.first)) {
-    std::fill(_lexical.begin() + (scope.end - scope.first), _lexical.end(), filling);
+    std::fill(_lexical.begin() + (scope.end - scope.first), _lexical.end(), notOfInterest);
   }
 
   // Best first, with the scores of the formula without `known`; empty when cancelled.
@@ -53,14 +53,13 @@ class Search {
     }
     _findMaxima();
     const float lexicallyBest = _lowerBoundOfBest();
-    if (!_takeBetween(lexicallyBest, everything)) {
+    if (!_takeFrom(lexicallyBest)) {
       return {};
     }
-    _best.settle();
-    if (!_plan.latent.empty() &&
-        !(lexicallyBest > leastScore ? _takeBetween(_leastWithinReach(), lexicallyBest)
-          : _best.threshold() > 0    ? true
-                                     : _takeThoseWithoutWords())) {
+    _best.raiseThreshold();
+    if (!_plan.latent.empty() && !(lexicallyBest > leastScore ? _takeFrom(_leastWithinReach())
+                                   : _best.threshold() > 0    ? true
+                                                              : _takeThoseWithoutWords())) {
       return {};
     }
     std::vector<LUXScoredPage> pages;
@@ -148,52 +147,54 @@ class Search {
   // In this order it is 0 also where a damaged model makes it what is no number.
   static float _clamped(float cosine) { return std::min(std::max(0.0F, cosine), 1.0F); }
 
-  float _cosine(uint32_t page) const {
-    if (page >= _scales.size()) {
-      return 0;
-    }
-    const size_t length = _plan.latent.size();
-    const int32_t product = _innerProduct(_plan.latent.data(), _vectors + page * length, length);
-    return _clamped(static_cast<float>(product) * _plan.latentScale * _scales[page]);
-  }
-
   // Takes a page, some time later: its vector is called for and used when some more pages have
   // followed, since memory is slow and the vectors of pages lie far apart.
   void _take(uint32_t page, float lexical) {
+    const size_t length = _plan.latent.size();
     if (page < _scales.size()) {
-      const int8_t* const vector = _vectors + page * _plan.latent.size();
-      for (size_t i = 0; i < _plan.latent.size(); i += cacheLineLength) {
+      const int8_t* const vector = _vectors + page * length;
+      for (size_t i = 0; i < length; i += cacheLineLength) {
         __builtin_prefetch(vector + i);
       }
+      _waitingVectors[_waitingCount] = vector;
+      _waitingScales[_waitingCount] = _scales[page] * _plan.latentScale;
+    } else {
+      _waitingVectors[_waitingCount] = _plan.latent.data();
+      _waitingScales[_waitingCount] = 0;
     }
-    _waiting[_waitingCount++] = {page, lexical};
-    if (_waitingCount == _waiting.size()) {
+    _waiting[_waitingCount] = {page, lexical};
+    if (++_waitingCount == waitingLength) {
       _takeWaiting();
     }
   }
 
   void _takeWaiting() {
+    std::array<int32_t, waitingLength> products;
+    LUXInnerProducts(_plan.latent.data(), _waitingVectors.data(), _plan.latent.size(),
+                     _waitingCount, products.data());
     for (size_t i = 0; i < _waitingCount; ++i) {
-      const auto [page, lexical] = _waiting[i];
-      _best.add(rankOfPage(page, _scope), _wordShare * lexical + _meaning * _cosine(page));
+      const float cosine = _clamped(static_cast<float>(products[i]) * _waitingScales[i]);
+      _best.add(rankOfPage(_waiting[i].page, _scope),
+                _wordShare * _waiting[i].score + _meaning * cosine);
     }
     _waitingCount = 0;
   }
 
-  // Takes the pages with a lexical score from `least` to below `end`; `least` rises as better pages
-  // are found. False when cancelled.
-  bool _takeBetween(float least, float end) {
+  // Takes the pages with a lexical score of at least `least`, which rises as better pages are
+  // found, but for those that were taken before. False when cancelled.
+  bool _takeFrom(float least) {
     constexpr size_t unit = 4 * luxscoring::groupLength;
     float threshold = _best.threshold();
     for (size_t first = 0; first < _lexical.size(); first += unit) {
       if (first % stepLength == 0 && _cancelled()) {
         return false;
       }
-      uint64_t bits = luxscoring::scoresWithinFourGroups(
-          _lexical.data() + first, _maxima.data() + first / luxscoring::groupLength, least, end);
+      uint64_t bits = luxscoring::scoresReachingInFourGroups(
+          _lexical.data() + first, _maxima.data() + first / luxscoring::groupLength, least);
       for (; bits != 0; bits &= bits - 1) {
         const size_t place = first + static_cast<size_t>(std::countr_zero(bits));
         _take(_scope.first + static_cast<uint32_t>(place), _lexical[place]);
+        _lexical[place] = notOfInterest;
       }
       if (_best.threshold() != threshold) {
         threshold = _best.threshold();
@@ -210,25 +211,29 @@ class Search {
       return _takeNeighbours();
     }
     using luxscoring::groupLength;
-    std::array<int32_t, 16 * groupLength> products;
-    std::array<float, products.size()> cosines;
+    constexpr size_t stretchLength = 16 * groupLength;
+    std::array<const int8_t*, stretchLength> vectors;
+    std::array<int32_t, stretchLength> products;
+    std::array<float, stretchLength> cosines;
     const uint32_t end = std::min(_scope.end, static_cast<uint32_t>(_scales.size()));
-    for (uint32_t first = _scope.first; first < end; first += products.size()) {
+    const size_t length = _plan.latent.size();
+    for (uint32_t first = _scope.first; first < end; first += stretchLength) {
       if (_cancelled()) {
         return false;
       }
-      const size_t count = std::min<size_t>(end - first, products.size());
-      const size_t length = _plan.latent.size();
-      LUXInnerProducts(_plan.latent.data(), _vectors + first * length, length, count,
-                       products.data());
+      const size_t count = std::min<size_t>(end - first, stretchLength);
+      for (size_t i = 0; i < count; ++i) {
+        vectors[i] = _vectors + (first + i) * length;
+      }
+      LUXInnerProducts(_plan.latent.data(), vectors.data(), length, count, products.data());
       cosines.fill(0);
       for (size_t i = 0; i < count; ++i) {
         cosines[i] = static_cast<float>(products[i]) * _plan.latentScale * _scales[first + i];
       }
       for (size_t group = 0; group < count; group += groupLength) {
         const float least = std::max(_best.threshold() / _meaning, leastScore);
-        for (uint32_t bits = luxscoring::scoresWithin(cosines.data() + group, least, everything);
-             bits != 0; bits &= bits - 1) {
+        for (uint32_t bits = luxscoring::scoresReaching(cosines.data() + group, least); bits != 0;
+             bits &= bits - 1) {
           const size_t i = group + static_cast<size_t>(std::countr_zero(bits));
           if (_lexical[first - _scope.first + i] == 0) {
             _best.add(rankOfPage(first + static_cast<uint32_t>(i), _scope),
@@ -244,8 +249,14 @@ class Search {
   // to choose among.
   bool _takeNeighbours() {
     LUXBest nearest(_view.neighbourhoodCount());
+    const size_t length = _plan.latent.size();
     for (uint32_t i = 0; i < _view.neighbourhoodCount(); ++i) {
-      nearest.add(i, _cosine(_view.neighbourhoodCentre(i)));
+      const uint32_t centre = _view.neighbourhoodCentre(i);
+      if (centre < _scales.size()) {
+        const int32_t product =
+            LUXInnerProduct(_plan.latent.data(), _vectors + centre * length, length);
+        nearest.add(i, _clamped(static_cast<float>(product) * _plan.latentScale * _scales[centre]));
+      }
     }
     const size_t enough = std::max(neighboursWanted * _count, fewestNeighbours);
     size_t seen = 0;
@@ -277,19 +288,19 @@ class Search {
   static constexpr float everything = std::numeric_limits<float>::infinity();
   // Of a page that has any word of the query.
   static constexpr float leastScore = std::numeric_limits<float>::min();
-  // Of those places that fill up the last group.
-  static constexpr float filling = -1;
+  // Of pages that were taken, and of those places that fill up the last group.
+  static constexpr float notOfInterest = -1;
   static constexpr float roundingReserve = 1e-6F;
   static constexpr size_t cacheLineLength = 64;
+  static constexpr size_t waitingLength = 16;
   // How many pages are looked at for each that is wanted, and at least.
   static constexpr size_t neighboursWanted = 8;
-  static constexpr size_t fewestNeighbours = 1024;
+  static constexpr size_t fewestNeighbours = 256;
 
   const LUXModelView& _view;
   const LUXScoringPlan& _plan;
   const LUXPageScope& _scope;
   const LUXIsCancelled& _isCancelled;
-  const LUXInnerProductFunction _innerProduct = LUXFastestInnerProduct();
   const int8_t* const _vectors;
   // Empty where the query or the model has no meaning, so that cosines are 0.
   const std::span<const float> _scales;
@@ -298,7 +309,10 @@ class Search {
   const float _meaning;
   const float _wordShare;
   LUXBest _best;
-  std::array<LUXScoredPage, 16> _waiting;
+  // Pages with their lexical scores, their vectors, and what makes a cosine of the product.
+  std::array<LUXScoredPage, waitingLength> _waiting;
+  std::array<const int8_t*, waitingLength> _waitingVectors;
+  std::array<float, waitingLength> _waitingScales;
   size_t _waitingCount = 0;
   std::vector<float> _lexical;
   std::vector<float> _maxima;

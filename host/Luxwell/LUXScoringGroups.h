@@ -44,39 +44,42 @@ inline float findGroupMaxima(const float* scores, size_t groupCount, float* maxi
 #endif
 }
 
-/// One bit for each score of a group, set for those from `least` to below `end`.
-inline uint32_t scoresWithin(const float* scores, float least, float end) noexcept {
-  uint32_t bits = 0;
+/// One bit for each score of a group, set for those of at least `least`.
+inline uint32_t scoresReaching(const float* scores, float least) noexcept {
 #if defined(__SSE2__)
   const __m128 lower = _mm_set1_ps(least);
-  const __m128 upper = _mm_set1_ps(end);
-  for (uint32_t i = 0; i < groupLength; i += 4) {
-    const __m128 four = _mm_loadu_ps(scores + i);
-    const __m128 within = _mm_and_ps(_mm_cmpge_ps(four, lower), _mm_cmplt_ps(four, upper));
-    bits |= static_cast<uint32_t>(_mm_movemask_ps(within)) << i;
-  }
+  const auto four = [lower](const float* place) {
+    return _mm_castps_si128(_mm_cmpge_ps(_mm_loadu_ps(place), lower));
+  };
+  return static_cast<uint32_t>(
+      _mm_movemask_epi8(_mm_packs_epi16(_mm_packs_epi32(four(scores), four(scores + 4)),
+                                        _mm_packs_epi32(four(scores + 8), four(scores + 12)))));
 #else
+  uint32_t bits = 0;
   for (uint32_t i = 0; i < groupLength; ++i) {
-    bits |= (scores[i] >= least && scores[i] < end ? 1U : 0U) << i;
+    bits |= (scores[i] >= least ? 1U : 0U) << i;
   }
-#endif
   return bits;
+#endif
 }
 
 /// The same for four groups at once, whose highest scores `maxima` are.
-inline uint64_t scoresWithinFourGroups(const float* scores, const float* maxima, float least,
-                                       float end) noexcept {
+inline uint64_t scoresReachingInFourGroups(const float* scores, const float* maxima,
+                                           float least) noexcept {
 #if defined(__SSE2__)
   if (_mm_movemask_ps(_mm_cmpge_ps(_mm_loadu_ps(maxima), _mm_set1_ps(least))) == 0) {
     return 0;
   }
-#endif
-  uint64_t bits = 0;
-  for (uint32_t group = 0; group < 4; ++group) {
-    bits |= static_cast<uint64_t>(scoresWithin(scores + group * groupLength, least, end))
-            << (group * groupLength);
+#else
+  if (*std::max_element(maxima, maxima + 4) < least) {
+    return 0;
   }
-  return bits;
+#endif
+  const auto bits = [scores, least](size_t group) {
+    return static_cast<uint64_t>(scoresReaching(scores + group * groupLength, least))
+           << (group * groupLength);
+  };
+  return bits(0) | bits(1) | bits(2) | bits(3);
 }
 
 }  // namespace luxscoring

@@ -21,12 +21,18 @@ constexpr uint32_t fewPages = 2;
 constexpr size_t mostExpansions = 32;
 constexpr uint32_t mostConsidered = 4096;
 
+// Postings and vectors are called for before they are needed, since memory is slow; of a list, its
+// beginning.
+constexpr size_t cacheLineLength = 64;
+constexpr size_t calledFor = 8 * cacheLineLength;
+
 class Planner {
  public:
   Planner(const LUXModelView& view, const LUXQueryTerms& terms) : _view(view), _terms(terms) {}
 
   LUXScoringPlan plan(const LUXIsCancelled& isCancelled) {
     _plan.lists.reserve(_terms.stems.size() + _terms.bigrams.size() + _terms.forms.size());
+    _stemNumbers.reserve(_terms.stems.size());
     const auto& words = _terms.onlyStopWords ? _terms.forms : _terms.stems;
     const LUXTokenKind kind = _terms.onlyStopWords ? LUXTokenKind::form : LUXTokenKind::stem;
     for (const LUXQueryTerms::Term& word : words) {
@@ -36,15 +42,26 @@ class Planner {
       _addWord(word, kind);
     }
     if (!_terms.onlyStopWords) {
-      for (const LUXQueryTerms::Term& bigram : _terms.bigrams) {
-        _addShare(bigram, LUXTokenKind::bigram, luxscoring::bigramWeight);
+      for (const LUXQueryTerms::Pair& pair : _terms.bigrams) {
+        const auto& first = _stemNumbers[pair.first];
+        const auto& second = _stemNumbers[pair.second];
+        if (first && second) {
+          _addShare(LUXTokenKind::bigram, _view.pairNumber(*first, *second), pair.count,
+                    luxscoring::bigramWeight);
+        }
       }
       for (const LUXQueryTerms::Term& form : _terms.forms) {
-        _addShare(form, LUXTokenKind::form, luxscoring::formWeight);
+        _addShare(LUXTokenKind::form, _view.termNumber(LUXTokenKind::form, form.token), form.count,
+                  luxscoring::formWeight);
       }
       const auto count = static_cast<float>(words.size());
       _plan.latentWeight =
           luxscoring::latentWeight * (1 - std::exp(-count / luxscoring::latentTerms));
+      for (size_t i = 0; i < _stemNumbers.size(); ++i) {
+        if (_stemNumbers[i]) {
+          _addLatent(*_stemNumbers[i], _terms.stems[i].count);
+        }
+      }
       _finishLatent();
     }
     if (!_terms.normalizedTitle.empty()) {
@@ -71,6 +88,11 @@ class Planner {
   void _addList(std::span<const uint32_t> postings, float weight) {
     _bound += weight;
     if (!postings.empty()) {
+      // The rest of the plan is made while they come.
+      const auto* const bytes = reinterpret_cast<const char*>(postings.data());
+      for (size_t i = 0; i < std::min(postings.size_bytes(), calledFor); i += cacheLineLength) {
+        __builtin_prefetch(bytes + i);
+      }
       _plan.lists.push_back({postings, weight});
     }
   }
@@ -78,8 +100,9 @@ class Planner {
   void _addWord(const LUXQueryTerms::Term& word, LUXTokenKind kind) {
     const std::optional<uint32_t> number = _view.termNumber(kind, word.token);
     const uint32_t frequency = number ? _view.documentFrequency(kind, *number) : 0;
+    _stemNumbers.push_back(number);
     if (number && kind == LUXTokenKind::stem) {
-      _addLatent(*number, word.count);
+      _callForVector(*number);
     }
     const auto postings = number ? _view.postings(kind, *number) : std::span<const uint32_t>();
     const auto count = static_cast<float>(word.count);
@@ -138,23 +161,28 @@ class Planner {
     return true;
   }
 
-  void _addShare(const LUXQueryTerms::Term& term, LUXTokenKind kind, float share) {
-    const std::optional<uint32_t> number = _view.termNumber(kind, term.token);
+  void _addShare(LUXTokenKind kind, std::optional<uint32_t> number, uint32_t count, float share) {
     const uint32_t frequency = number ? _view.documentFrequency(kind, *number) : 0;
     if (frequency > 0) {
       _addList(_view.postings(kind, *number),
-               share * static_cast<float>(term.count) * _inverseFrequency(frequency));
+               share * static_cast<float>(count) * _inverseFrequency(frequency));
+    }
+  }
+
+  void _callForVector(uint32_t stem) const {
+    if (const int8_t* vector = _view.termVector(stem)) {
+      for (size_t i = 0; i < _view.stride(); i += cacheLineLength) {
+        __builtin_prefetch(vector + i);
+      }
     }
   }
 
   void _addLatent(uint32_t stem, uint32_t count) {
-    const int8_t* vector = _view.termVector(stem);
-    if (vector == nullptr) {
-      return;
+    if (const int8_t* vector = _view.termVector(stem)) {
+      _sum.resize(_view.stride());
+      const float weight = std::log2(1 + static_cast<float>(count)) * _view.termScale(stem);
+      LUXAddScaled(_sum.data(), vector, weight, _sum.size());
     }
-    _sum.resize(_view.stride());
-    const float weight = std::log2(1 + static_cast<float>(count)) * _view.termScale(stem);
-    LUXAddScaled(_sum.data(), vector, weight, _sum.size());
   }
 
   void _finishLatent() {
@@ -168,6 +196,8 @@ class Planner {
   const LUXModelView& _view;
   const LUXQueryTerms& _terms;
   LUXScoringPlan _plan;
+  // Of the terms' stems, in their order.
+  std::vector<std::optional<uint32_t>> _stemNumbers;
   std::vector<float> _sum;
   float _bound = 0;
   float _allMass = 0;

@@ -23,12 +23,16 @@ int32_t LUXPlainInnerProduct(const int8_t* a, const int8_t* b, size_t length) no
   return sum;
 }
 
-void LUXPlainInnerProducts(const int8_t* vector, const int8_t* others, size_t length, size_t count,
-                           int32_t* products) noexcept {
+namespace {
+
+void plainInnerProducts(const int8_t* vector, const int8_t* const* others, size_t length,
+                        size_t count, int32_t* products) noexcept {
   for (size_t i = 0; i < count; ++i) {
-    products[i] = LUXPlainInnerProduct(vector, others + i * length, length);
+    products[i] = LUXPlainInnerProduct(vector, others[i], length);
   }
 }
+
+}  // namespace
 
 #if defined(__x86_64__)
 
@@ -59,30 +63,35 @@ WITH_WIDE_INSTRUCTIONS int32_t wideInnerProduct(const int8_t* a, const int8_t* b
 }
 
 // Four at a time: the vector is read once for all, and their sums are finished together.
-WITH_WIDE_INSTRUCTIONS void wideInnerProducts(const int8_t* vector, const int8_t* others,
+WITH_WIDE_INSTRUCTIONS void wideInnerProducts(const int8_t* vector, const int8_t* const* others,
                                               size_t length, size_t count,
                                               int32_t* products) noexcept {
   size_t done = 0;
   for (; done + 4 <= count; done += 4) {
-    const int8_t* const other = others + done * length;
-    __m256i sums[4] = {_mm256_setzero_si256(), _mm256_setzero_si256(), _mm256_setzero_si256(),
-                       _mm256_setzero_si256()};
+    const int8_t* const first = others[done];
+    const int8_t* const second = others[done + 1];
+    const int8_t* const third = others[done + 2];
+    const int8_t* const fourth = others[done + 3];
+    __m256i sums = _mm256_setzero_si256();
+    __m256i secondSums = sums;
+    __m256i thirdSums = sums;
+    __m256i fourthSums = sums;
     for (size_t i = 0; i < length; i += LUXVectorBlock) {
       const __m256i block = _mm256_loadu_si256(reinterpret_cast<const __m256i*>(vector + i));
       const __m256i magnitudes = _mm256_abs_epi8(block);
-      for (size_t row = 0; row < 4; ++row) {
-        sums[row] =
-            _mm256_add_epi32(sums[row], blockProduct(magnitudes, block, other + row * length + i));
-      }
+      sums = _mm256_add_epi32(sums, blockProduct(magnitudes, block, first + i));
+      secondSums = _mm256_add_epi32(secondSums, blockProduct(magnitudes, block, second + i));
+      thirdSums = _mm256_add_epi32(thirdSums, blockProduct(magnitudes, block, third + i));
+      fourthSums = _mm256_add_epi32(fourthSums, blockProduct(magnitudes, block, fourth + i));
     }
-    const __m256i four =
-        _mm256_hadd_epi32(_mm256_hadd_epi32(sums[0], sums[1]), _mm256_hadd_epi32(sums[2], sums[3]));
+    const __m256i four = _mm256_hadd_epi32(_mm256_hadd_epi32(sums, secondSums),
+                                           _mm256_hadd_epi32(thirdSums, fourthSums));
     _mm_storeu_si128(
         reinterpret_cast<__m128i*>(products + done),
         _mm_add_epi32(_mm256_castsi256_si128(four), _mm256_extracti128_si256(four, 1)));
   }
   for (; done < count; ++done) {
-    products[done] = wideInnerProduct(vector, others + done * length, length);
+    products[done] = wideInnerProduct(vector, others[done], length);
   }
 }
 
@@ -93,33 +102,29 @@ bool hasWideInstructions() noexcept {
 
 }  // namespace
 
-LUXInnerProductFunction LUXFastestInnerProduct() noexcept {
-  return hasWideInstructions() ? wideInnerProduct : LUXPlainInnerProduct;
+int32_t LUXInnerProduct(const int8_t* a, const int8_t* b, size_t length) noexcept {
+  return hasWideInstructions() ? wideInnerProduct(a, b, length)
+                               : LUXPlainInnerProduct(a, b, length);
 }
 
-void LUXInnerProducts(const int8_t* vector, const int8_t* others, size_t length, size_t count,
-                      int32_t* products) noexcept {
-  if (hasWideInstructions()) {
-    wideInnerProducts(vector, others, length, count, products);
-  } else {
-    LUXPlainInnerProducts(vector, others, length, count, products);
-  }
+void LUXInnerProducts(const int8_t* vector, const int8_t* const* others, size_t length,
+                      size_t count, int32_t* products) noexcept {
+  (hasWideInstructions() ? wideInnerProducts : plainInnerProducts)(vector, others, length, count,
+                                                                   products);
 }
 
 #else
 
-void LUXInnerProducts(const int8_t* vector, const int8_t* others, size_t length, size_t count,
-                      int32_t* products) noexcept {
-  LUXPlainInnerProducts(vector, others, length, count, products);
+int32_t LUXInnerProduct(const int8_t* a, const int8_t* b, size_t length) noexcept {
+  return LUXPlainInnerProduct(a, b, length);
 }
 
-LUXInnerProductFunction LUXFastestInnerProduct() noexcept { return LUXPlainInnerProduct; }
+void LUXInnerProducts(const int8_t* vector, const int8_t* const* others, size_t length,
+                      size_t count, int32_t* products) noexcept {
+  plainInnerProducts(vector, others, length, count, products);
+}
 
 #endif
-
-int32_t LUXInnerProduct(const int8_t* a, const int8_t* b, size_t length) noexcept {
-  return LUXFastestInnerProduct()(a, b, length);
-}
 
 // Both ways of these multiply first and add then, each rounded, and so give the same.
 

@@ -9,21 +9,13 @@ inline constexpr size_t LUXVectorBlock = 32;
 
 /// The sum of a[i] * b[i]. `length` is a multiple of LUXVectorBlock, neither vector holds -128, and
 /// both are short enough (below 100,000) for the sum to fit. Exact, so the same on every machine.
-using LUXInnerProductFunction = int32_t (*)(const int8_t* a, const int8_t* b,
-                                            size_t length) noexcept;
-
-/// The quickest way that the processor has; for those who call it many times.
-LUXInnerProductFunction LUXFastestInnerProduct() noexcept;
-
-/// The products of one vector with `count` others that lie one after the other.
-void LUXInnerProducts(const int8_t* vector, const int8_t* others, size_t length, size_t count,
-                      int32_t* products) noexcept;
-
 int32_t LUXInnerProduct(const int8_t* a, const int8_t* b, size_t length) noexcept;
 
+/// The products of one vector with `count` others; quicker than one after the other.
+void LUXInnerProducts(const int8_t* vector, const int8_t* const* others, size_t length,
+                      size_t count, int32_t* products) noexcept;
+
 /// The same without any instruction that not every processor has; for tests.
-void LUXPlainInnerProducts(const int8_t* vector, const int8_t* others, size_t length, size_t count,
-                           int32_t* products) noexcept;
 int32_t LUXPlainInnerProduct(const int8_t* a, const int8_t* b, size_t length) noexcept;
 
 /// Adds weight * vector[i] to sum[i]. `length` is a multiple of LUXVectorBlock.

@@ -55,15 +55,17 @@ std::vector<LUXScoredPhrase> LUXSimilarPhrases(const LUXModelView& view, const L
   const std::span<const float> scores = view.phraseScores();
   std::vector<LUXScoredPhrase> products;
   for (const LUXScoredPage& page : LUXProfile(view, terms, scope, isCancelled)) {
+    const auto former = static_cast<std::ptrdiff_t>(products.size());
     for (const LUXModelView::Share& share : view.phrasesOfPage(page.page)) {
       // A damaged model may hold what is no number.
       if (share.number < scores.size() && share.weight > 0) {
         products.push_back({share.number, page.score * std::min(share.weight, 1.0F)});
       }
     }
+    // Each page has its phrases in order.
+    std::inplace_merge(products.begin(), products.begin() + former, products.end(),
+                       [](const auto& a, const auto& b) { return a.phrase < b.phrase; });
   }
-  std::stable_sort(products.begin(), products.end(),
-                   [](const auto& a, const auto& b) { return a.phrase < b.phrase; });
   std::vector<LUXScoredPhrase> cosines;
   for (const LUXScoredPhrase& product : products) {
     if (cosines.empty() || cosines.back().phrase != product.phrase) {
@@ -72,21 +74,25 @@ std::vector<LUXScoredPhrase> LUXSimilarPhrases(const LUXModelView& view, const L
       cosines.back().score += product.score;
     }
   }
-  std::sort(cosines.begin(), cosines.end(),
-            [&](const LUXScoredPhrase& a, const LUXScoredPhrase& b) {
-              if (a.score != b.score) {
-                return a.score > b.score;
-              }
-              const float aScore = goodness(scores[a.phrase]);
-              const float bScore = goodness(scores[b.phrase]);
-              return aScore != bScore ? aScore > bScore : a.phrase < b.phrase;
-            });
+  const auto isWorse = [&](const LUXScoredPhrase& a, const LUXScoredPhrase& b) {
+    if (a.score != b.score) {
+      return a.score < b.score;
+    }
+    const float aScore = goodness(scores[a.phrase]);
+    const float bScore = goodness(scores[b.phrase]);
+    return aScore != bScore ? aScore < bScore : a.phrase > b.phrase;
+  };
+  // A heap, since few of many are taken, and it is not known how many have to be passed over.
+  std::make_heap(cosines.begin(), cosines.end(), isWorse);
   std::unordered_set<uint32_t> keys{stemsKey(terms)};
   std::vector<LUXScoredPhrase> found;
-  for (const LUXScoredPhrase& phrase : cosines) {
-    if (found.size() == count || (isCancelled && isCancelled())) {
-      break;
+  while (!cosines.empty() && found.size() < count) {
+    if (isCancelled && isCancelled()) {
+      return {};
     }
+    std::pop_heap(cosines.begin(), cosines.end(), isWorse);
+    const LUXScoredPhrase phrase = cosines.back();
+    cosines.pop_back();
     if ((!book || view.phraseOccursInBook(phrase.phrase, *book)) &&
         keys.insert(view.phraseStemsKey(phrase.phrase)).second) {
       found.push_back({phrase.phrase, std::min(phrase.score, luxscoring::highestScore)});

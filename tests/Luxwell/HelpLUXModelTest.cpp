@@ -5,6 +5,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <cerrno>
 #include <chrono>
 #include <csignal>
@@ -16,6 +17,7 @@
 #include "host/Luxwell/LUXModelSections.h"
 #include "host/Luxwell/LUXModelView.h"
 #include "platform/Processes.h"
+#include "tests/Luxwell/LUXModelUse.h"
 #include "tests/Luxwell/LUXModelWorld.h"
 #include "tests/platform/TemporaryFolder.h"
 #include "tests/platform/TestEnvironment.h"
@@ -255,11 +257,44 @@ TEST_F(HelpLUXModelFile, AModelThatIsCutOffWhileItIsOpenIsNotRead) {
        {whole.size() - 1, whole.size() / 2, size_t{33}, size_t{1}, size_t{0}}) {
     overwrite(whole);
     ASSERT_NE(model->view(), nullptr);
+    // Two changes in one tick of the file system's clock bear the same time.
+    const auto time = std::filesystem::last_write_time(file());
     std::filesystem::resize_file(file(), length);
+    std::filesystem::last_write_time(file(), time);
     EXPECT_TRUE(model->needsBuild());
     EXPECT_EQ(model->view(), nullptr);
     model->loadLSMMap();
     EXPECT_EQ(model->allHelpbookIDs(), Names{});
+  }
+}
+
+TEST_F(HelpLUXModelFile, AViewThatIsHeldWhileTheFileIsCutOffDoesNoHarm) {
+  const auto model = open();
+  save(*model);
+  const std::string whole = bytes();
+  for (size_t length = 0; length < whole.size(); length += 61) {
+    overwrite(whole);
+    const auto view = model->view();
+    ASSERT_NE(view, nullptr);
+    std::filesystem::resize_file(file(), length);
+    tests::useModel(*view);
+    EXPECT_FALSE(view->checksumsMatch());
+  }
+}
+
+TEST_F(HelpLUXModelFile, AViewThatIsHeldWhileTheFileIsWrittenOverDoesNoHarm) {
+  const auto model = open();
+  save(*model);
+  const std::string whole = bytes();
+  for (size_t i = 0; i < whole.size(); i += 61) {
+    overwrite(whole);
+    const auto view = model->view();
+    ASSERT_NE(view, nullptr);
+    std::fstream out(file(), std::ios::binary | std::ios::in | std::ios::out);
+    out.seekp(static_cast<std::streamoff>(i));
+    out << std::string(std::min<size_t>(61, whole.size() - i), '\xFF');
+    out.close();
+    tests::useModel(*view);
   }
 }
 
@@ -339,6 +374,32 @@ TEST_F(HelpLUXModelFile, OptionsThatNobodyCanKeepAreLoggedAndLeaveTheOldModel) {
       {"Address", platform::URL::URLWithString("https://example.org/").value()}}));
   EXPECT_EQ(environment.log().messages(1).size(), 1U);
   EXPECT_EQ(model->allHelpbookIDs(), Names{"old"});
+}
+
+TEST_F(HelpLUXModelFile, ViewsMayBeTakenWhileModelsAreSaved) {
+  const auto model = open();
+  save(*model);
+  std::atomic<bool> isOver{false};
+  std::atomic<size_t> damaged{0};
+  std::vector<std::thread> readers;
+  readers.reserve(3);
+  for (int i = 0; i < 3; ++i) {
+    readers.emplace_back([&, reader = i == 0 ? model : open()] {
+      while (!isOver) {
+        const auto view = reader->view();
+        damaged += view == nullptr || !view->checksumsMatch() || reader->needsBuild() ? 1 : 0;
+        reader->activity();
+      }
+    });
+  }
+  for (int i = 0; i < 20; ++i) {
+    save(*model, "book" + std::to_string(i));
+  }
+  isOver = true;
+  for (std::thread& reader : readers) {
+    reader.join();
+  }
+  EXPECT_EQ(damaged, 0U);
 }
 
 TEST_F(HelpLUXModelFile, LeftoversOfProcessesThatHaveEndedAreDeleted) {

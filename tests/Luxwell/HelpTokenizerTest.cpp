@@ -241,6 +241,12 @@ TEST(HelpTokenizer, RightToLeftTextLosesItsPoints) {
   EXPECT_THAT(stopWords("الملف في المجلد", "Arabic"), ElementsAre("في"));
 }
 
+TEST(HelpTokenizer, LigaturesOfWholePhrasesAreOneWord) {
+  const auto result = forms("\uFDFA", "Arabic");
+  ASSERT_EQ(result.size(), 1U);
+  EXPECT_EQ(result[0].find(' '), std::string::npos);
+}
+
 TEST(HelpTokenizer, VowelSignsOfIndicScriptsStay) {
   EXPECT_THAT(forms("हिन्दी में", "Hindi"), ElementsAre("हिन्दी", "में"));
 }

@@ -242,8 +242,29 @@ TEST(LUXModelPhrases, AThresholdThatAPhraseJustReachesLetsItPass) {
   EXPECT_FALSE(textsAt(std::nextafter(pair->score, 1e9)).contains("print queue"));
 }
 
+TEST(LUXModelPhrases, OneThresholdIsForUpToTwoWordsAndTheOtherForMore) {
+  std::vector<ModelPage> pages;
+  for (const char* text : {"alone", "print queue", "clear print queue", "old slow paper tray"}) {
+    for (int i = 0; i < 4; ++i) {
+      pages.push_back({"book", text + std::to_string(i), "", text});
+    }
+  }
+  const LUXTrainingData data = dataOfPages(pages);
+  const auto textsWith = [&](double forShort, double forLong) {
+    return textsOf(LUXModelPhrases(data, 1).phrases(thresholds("book", forShort, forLong)));
+  };
+  EXPECT_EQ(textsWith(1000, 0),
+            (std::set<std::string>{"clear print queue", "old slow paper tray"}));
+  for (const std::string& text : textsWith(0, 1000)) {
+    EXPECT_LE(std::count(text.begin(), text.end(), ' '), 1) << text;
+  }
+  EXPECT_TRUE(textsWith(0, 1000).contains("alone"));
+  EXPECT_TRUE(textsWith(0, 1000).contains("print queue"));
+}
+
 TEST(LUXModelPhrases, OneBookThatIsContentIsEnough) {
   std::vector<ModelPage> pages;
+  pages.reserve(6);
   for (int i = 0; i < 6; ++i) {
     pages.push_back({i % 2 == 0 ? "one" : "two", std::to_string(i), "", "print queue"});
   }

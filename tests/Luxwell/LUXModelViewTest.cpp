@@ -70,7 +70,7 @@ class NaiveModel {
         posting.tf = kind == LUXTokenKind::bigram
                          ? posting.count / relative(.9, .6, titleLength + bodyLength,
                                                     titleAverage + bodyAverage)
-                         : 5 * count.titleCount / relative(.5, 1, titleLength, titleAverage) +
+                         : 4 * count.titleCount / relative(.5, 1, titleLength, titleAverage) +
                                count.bodyCount / relative(.9, .6, bodyLength, bodyAverage);
       }
     }
@@ -140,6 +140,7 @@ TEST(LUXModelView, PostingsAreThoseOfEachPageAlone) {
           EXPECT_NEAR(luxposting::impact(posting), impact, .51) << token;
         }
         std::vector<uint32_t> expectedPages;
+        expectedPages.reserve(expected.size());
         for (const auto& [page, tf] : expected) {
           expectedPages.push_back(page);
         }
@@ -192,6 +193,34 @@ TEST(LUXModelView, TermsThatDifferBehindTheirFirstBytesAreToldApart) {
   EXPECT_EQ(end - first, 4U);
 }
 
+TEST(LUXModelView, ManyTermsWithTheSameBeginningAreToldApart) {
+  for (const uint32_t count : {1U, 2U, 3U, 4U, 5U, 7U, 8U, 9U, 300U}) {
+    std::vector<std::string> names{"a", "samehead", "zz"};
+    for (uint32_t i = 0; i < count; ++i) {
+      names.push_back("samehead" + std::to_string(1000 + 2 * i));
+    }
+    std::vector<LUXTokenCount> tokens;
+    tokens.reserve(names.size());
+    for (const std::string& name : names) {
+      tokens.push_back({name, LUXTokenKind::stem, 0, 1});
+    }
+    LUXModelTrainer trainer("English");
+    trainer.addPage(LUXTokenCounts::withCounts(tokens), "1", std::nullopt, "book");
+    const auto view = LUXModelView::viewWithData(trainer.finish({}, 1));
+    for (const std::string& name : names) {
+      const auto number = view->termNumber(LUXTokenKind::stem, name);
+      ASSERT_TRUE(number) << name;
+      EXPECT_EQ(view->term(LUXTokenKind::stem, *number), name);
+    }
+    for (uint32_t i = 0; i <= count; ++i) {
+      const std::string between = "samehead" + std::to_string(999 + 2 * i);
+      EXPECT_FALSE(view->termNumber(LUXTokenKind::stem, between)) << between;
+    }
+    const auto [first, end] = view->termRangeWithPrefix(LUXTokenKind::stem, "samehead1");
+    EXPECT_EQ(end - first, count);
+  }
+}
+
 TEST(LUXModelView, PairsAreKnownByBothStems) {
   const auto view = tests::viewOfPages(tests::samplePages());
   const auto pair = view->termNumber(LUXTokenKind::bigram, "print queue");
@@ -202,6 +231,11 @@ TEST(LUXModelView, PairsAreKnownByBothStems) {
   EXPECT_FALSE(view->termNumber(LUXTokenKind::bigram, "print"));
   EXPECT_FALSE(view->termNumber(LUXTokenKind::bigram, "print unheard"));
   EXPECT_FALSE(view->termNumber(LUXTokenKind::bigram, " "));
+  const uint32_t print = *view->termNumber(LUXTokenKind::stem, "print");
+  const uint32_t queue = *view->termNumber(LUXTokenKind::stem, "queue");
+  EXPECT_EQ(view->pairNumber(print, queue), pair);
+  EXPECT_FALSE(view->pairNumber(queue, print));
+  EXPECT_FALSE(view->pairNumber(~uint32_t{0}, queue));
 }
 
 TEST(LUXModelView, APairThatIsNoneIsNotCounted) {
@@ -362,7 +396,8 @@ TEST(LUXModelView, EveryPageIsInTheNeighbourhoodOfItsNearestCentre) {
                     std::nullopt, "book");
   }
   const auto view = LUXModelView::viewWithData(trainer.finish({}, 2));
-  ASSERT_EQ(view->neighbourhoodCount(), 64U);
+  const size_t count = view->neighbourhoodCount();
+  ASSERT_EQ(count, 23U) << "the root of the number of pages";
   const auto nearness = [&](uint32_t a, uint32_t b) {
     double product = 0;
     for (size_t i = 0; i < view->stride(); ++i) {
@@ -372,7 +407,7 @@ TEST(LUXModelView, EveryPageIsInTheNeighbourhoodOfItsNearestCentre) {
   };
   std::vector<uint32_t> all;
   for (size_t n = 0; n < view->neighbourhoodCount(); ++n) {
-    EXPECT_EQ(view->neighbourhoodCentre(n), n * pageCount / 64);
+    EXPECT_EQ(view->neighbourhoodCentre(n), n * pageCount / count);
     const auto pages = view->pagesOfNeighbourhood(n);
     EXPECT_TRUE(std::is_sorted(pages.begin(), pages.end()));
     all.insert(all.end(), pages.begin(), pages.end());
@@ -387,12 +422,13 @@ TEST(LUXModelView, EveryPageIsInTheNeighbourhoodOfItsNearestCentre) {
   std::sort(all.begin(), all.end());
   EXPECT_EQ(std::adjacent_find(all.begin(), all.end()), all.end());
   EXPECT_FALSE(std::binary_search(all.begin(), all.end(), 77U));
-  EXPECT_TRUE(view->pagesOfNeighbourhood(64).empty());
-  EXPECT_EQ(view->neighbourhoodCentre(64), 0U);
+  EXPECT_TRUE(view->pagesOfNeighbourhood(count).empty());
+  EXPECT_EQ(view->neighbourhoodCentre(count), 0U);
 }
 
 TEST(LUXModelView, PagesThatAreAllAlikeHaveNoMeaning) {
   std::vector<ModelPage> pages;
+  pages.reserve(5);
   for (int i = 0; i < 5; ++i) {
     pages.push_back({"book", std::to_string(i), "Same title", "The same words."});
   }

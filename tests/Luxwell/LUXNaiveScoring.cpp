@@ -175,8 +175,9 @@ std::map<uint32_t, double> NaiveScoring::scores(const LUXQueryTerms& terms) cons
     }
   }
   if (!terms.onlyStopWords) {
-    for (const LUXQueryTerms::Term& bigram : terms.bigrams) {
-      const Token token{LUXTokenKind::bigram, bigram.token};
+    for (const LUXQueryTerms::Pair& bigram : terms.bigrams) {
+      const Token token{LUXTokenKind::bigram,
+                        terms.stems[bigram.first].token + ' ' + terms.stems[bigram.second].token};
       if (_frequency(token) > 0) {
         add(token, 0.2 * bigram.count * _weight(token));
       }

@@ -26,6 +26,14 @@ std::vector<std::string> tokensOf(const std::vector<LUXQueryTerms::Term>& terms)
 
 using Strings = std::vector<std::string>;
 
+Strings pairsOf(const LUXQueryTerms& terms) {
+  Strings pairs;
+  for (const LUXQueryTerms::Pair& pair : terms.bigrams) {
+    pairs.push_back(terms.stems.at(pair.first).token + ' ' + terms.stems.at(pair.second).token);
+  }
+  return pairs;
+}
+
 }  // namespace
 
 TEST(LUXQueryTerms, KeepsStemsAndFormsOfWordsThatTellPagesApart) {
@@ -50,9 +58,16 @@ TEST(LUXQueryTerms, CountsWordsThatOccurAgain) {
 }
 
 TEST(LUXQueryTerms, PairsAreBrokenByStopWordsAndPunctuation) {
-  EXPECT_EQ(tokensOf(termsOf("print queue of office, network").bigrams), (Strings{"print queue"}));
-  EXPECT_EQ(tokensOf(termsOf("office network printer").bigrams),
+  EXPECT_EQ(pairsOf(termsOf("print queue of office, network")), (Strings{"print queue"}));
+  EXPECT_EQ(pairsOf(termsOf("office network printer")),
             (Strings{"offic network", "network printer"}));
+}
+
+TEST(LUXQueryTerms, CountsPairsThatOccurAgain) {
+  const LUXQueryTerms terms = termsOf("print queue, paper tray, print queues print queue");
+  EXPECT_EQ(pairsOf(terms), (Strings{"print queue", "queue print", "paper tray"}));
+  EXPECT_EQ(terms.bigrams[0].count, 3U);
+  EXPECT_EQ(terms.bigrams[1].count, 1U);
 }
 
 TEST(LUXQueryTerms, StopWordsAloneAreKept) {
@@ -83,6 +98,18 @@ TEST(LUXQueryTerms, TheFoldedTextIsWhatIsTyped) {
   EXPECT_EQ(terms.foldedText, "how to print");
   EXPECT_EQ(terms.wordStarts, (std::vector<size_t>{0, 4, 7}));
   EXPECT_EQ(termsOf("How to ").foldedText, "how to ");
+}
+
+TEST(LUXQueryTerms, TheFoldedTextAloneIsThatOfAllTerms) {
+  for (const char* text : {"How to  Print", "the users' os.path ", "", "?", "\xFFx", "caf\u00E9s",
+                           "What's new", "\u6253\u5370 files"}) {
+    const LUXQueryTerms terms = termsOf(text);
+    const LUXQueryTerms folded = LUXQueryTerms::foldedTextOf(english(), text);
+    EXPECT_EQ(folded.foldedText, terms.foldedText) << text;
+    EXPECT_EQ(folded.wordStarts, terms.wordStarts) << text;
+    EXPECT_TRUE(folded.stems.empty());
+  }
+  EXPECT_TRUE(LUXQueryTerms::foldedTextOf(english(), std::string(10000, 'a')).foldedText.empty());
 }
 
 TEST(LUXQueryTerms, TextWithoutWordsHasNoTerms) {

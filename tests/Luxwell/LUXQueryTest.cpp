@@ -36,7 +36,7 @@ class Listener : public LUXQueryDelegate {
 };
 
 const QueryWorld& office() {
-  static const auto& world = *new QueryWorld(tests::officePages());
+  static const QueryWorld world(tests::officePages());
   return world;
 }
 
@@ -250,7 +250,7 @@ TEST(LUXQuery, ACancelledQueryDoesNotAnswer) {
 }
 
 TEST(LUXQuery, ACancelledQueryReturnsWithinTenMilliseconds) {
-  static const auto& world = *new QueryWorld(tests::randomPages(300, 9));
+  static const QueryWorld world(tests::randomPages(300, 9));
   std::string text;
   for (int i = 0; i < 1000000; ++i) {
     text += tests::vocabularyWord(static_cast<size_t>(i) % tests::vocabularySize) + ' ';
@@ -365,7 +365,7 @@ TEST(LUXQuery, HitsOutliveTheModelAndTheFile) {
 }
 
 TEST(LUXQuery, ManyQueriesRunSideBySide) {
-  static const auto& world = *new QueryWorld(tests::randomPages(300, 10));
+  static const QueryWorld world(tests::randomPages(300, 10));
   const std::string text = tests::vocabularyWord(3) + ' ' + tests::vocabularyWord(40);
   Asked first(text, world);
   const Hits expected = first.run();

@@ -40,16 +40,45 @@ TEST(LUXBest, KeepsWhatSortingEverythingWouldKeep) {
   }
 }
 
-TEST(LUXBest, TheThresholdIsTheWorstThatIsKept) {
+TEST(LUXBest, KeepsTheBestWhateverTheirScoresAreLike) {
+  std::mt19937 random(13);
+  for (const size_t size : {size_t{20}, size_t{300}, size_t{6000}}) {
+    for (const int kind : {0, 1, 2, 3}) {
+      LUXBest best(100);
+      Pairs all;
+      for (uint32_t i = 0; i < size; ++i) {
+        const float share = static_cast<float>(random() % 100000) / 100000;
+        const float score = kind == 0   ? share
+                            : kind == 1 ? share * share * share * 1e-4F
+                            : kind == 2 ? 0.5F
+                                        : 1 / (share + 1e-5F);
+        all.emplace_back(i, score);
+        best.add(i, score);
+        if (i % 150 == 149) {
+          best.raiseThreshold();
+        }
+      }
+      std::sort(all.begin(), all.end(), [](const auto& a, const auto& b) {
+        return a.second != b.second ? a.second > b.second : a.first < b.first;
+      });
+      all.resize(std::min(all.size(), size_t{100}));
+      EXPECT_EQ(sorted(best), all) << size << ' ' << kind;
+    }
+  }
+}
+
+TEST(LUXBest, TheThresholdIsReachedByAllThatAreKept) {
   LUXBest best(2);
   best.add(1, 0.5F);
-  best.settle();
+  best.raiseThreshold();
   EXPECT_EQ(best.threshold(), 0);
   best.add(2, 0.7F);
   best.add(3, 0.6F);
-  best.settle();
-  EXPECT_EQ(best.threshold(), 0.6F);
-  EXPECT_EQ(sorted(best).size(), 2U);
+  best.raiseThreshold();
+  EXPECT_LE(best.threshold(), 0.6F);
+  EXPECT_GT(best.threshold(), 0.59F);
+  best.add(4, 0.55F);
+  EXPECT_EQ(sorted(best), (Pairs{{2, 0.7F}, {3, 0.6F}}));
 }
 
 TEST(LUXBest, TakesTheHighestAndTheLowestNumbers) {
@@ -63,7 +92,7 @@ TEST(LUXBest, TakesTheHighestAndTheLowestNumbers) {
 TEST(LUXBest, NothingIsWantedAndNothingKept) {
   LUXBest best(0);
   best.add(1, 1);
-  best.settle();
+  best.raiseThreshold();
   EXPECT_TRUE(best.sorted().empty());
 }
 
@@ -82,15 +111,18 @@ TEST(LUXScoringGroups, FindsTheHighestOfEachGroup) {
   }
 }
 
-TEST(LUXScoringGroups, TellsWhichScoresLieBetweenTwo) {
+TEST(LUXScoringGroups, TellsWhichScoresReachAnother) {
   std::vector<float> scores(luxscoring::groupLength);
   for (size_t i = 0; i < scores.size(); ++i) {
-    scores[i] = static_cast<float>(i);
+    scores[i] = static_cast<float>((i * 5) % 16);
   }
-  EXPECT_EQ(luxscoring::scoresWithin(scores.data(), 3, 6), 0b111000U);
-  EXPECT_EQ(luxscoring::scoresWithin(scores.data(), 14, 100), 0xC000U);
-  EXPECT_EQ(luxscoring::scoresWithin(scores.data(), 0, 1), 1U);
-  EXPECT_EQ(luxscoring::scoresWithin(scores.data(), 6, 3), 0U);
+  for (const float least : {-1.0F, 0.0F, 3.0F, 14.5F, 15.0F, 16.0F}) {
+    uint32_t expected = 0;
+    for (size_t i = 0; i < scores.size(); ++i) {
+      expected |= (scores[i] >= least ? 1U : 0U) << i;
+    }
+    EXPECT_EQ(luxscoring::scoresReaching(scores.data(), least), expected);
+  }
 }
 
 TEST(LUXScoringGroups, FourGroupsAreFourTimesOne) {
@@ -104,10 +136,10 @@ TEST(LUXScoringGroups, FourGroupsAreFourTimesOne) {
   for (const float least : {0.0F, 0.5F, 0.9F, 1.5F}) {
     uint64_t bits = 0;
     for (size_t group = 0; group < 4; ++group) {
-      bits |= static_cast<uint64_t>(luxscoring::scoresWithin(
-                  scores.data() + group * luxscoring::groupLength, least, 0.95F))
+      bits |= static_cast<uint64_t>(luxscoring::scoresReaching(
+                  scores.data() + group * luxscoring::groupLength, least))
               << (group * luxscoring::groupLength);
     }
-    EXPECT_EQ(luxscoring::scoresWithinFourGroups(scores.data(), maxima.data(), least, 0.95F), bits);
+    EXPECT_EQ(luxscoring::scoresReachingInFourGroups(scores.data(), maxima.data(), least), bits);
   }
 }

@@ -19,12 +19,12 @@ using tests::QueryWorld;
 namespace {
 
 const QueryWorld& office() {
-  static const auto& world = *new QueryWorld(tests::officePages());
+  static const QueryWorld world(tests::officePages());
   return world;
 }
 
 const QueryWorld& randomWorld() {
-  static const auto& world = *new QueryWorld(tests::randomPages(300, 7));
+  static const QueryWorld world(tests::randomPages(300, 7));
   return world;
 }
 

@@ -19,7 +19,7 @@ using Strings = std::vector<std::string>;
 namespace {
 
 const QueryWorld& world() {
-  static const auto& made = *new QueryWorld([] {
+  static const QueryWorld made([] {
     std::vector<QueryPage> pages;
     for (int i = 0; i < 4; ++i) {
       const std::string number = std::to_string(i);
