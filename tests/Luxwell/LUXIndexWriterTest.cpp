@@ -264,6 +264,7 @@ TEST(LUXIndexWriter, AttributesNameTheLanguageAndTheThresholds) {
   const auto opened = index(pages, "German");
   const Value& attributes = opened->attributes();
   EXPECT_EQ(attributes[HelpLUXIndexAttributeLanguageKey], Value("de"));
+  EXPECT_EQ(attributes[HelpLUXIndexAttributeTokenizerVersionKey], Value(HelpTokenizer::version()));
   EXPECT_GT(attributes[HelpLUXIndexAttributeBigramThresholdKey].doubleValue(), 0)
       << "twelve phrases for a budget of four";
   EXPECT_EQ(attributes[HelpLUXIndexAttributeTrigramThresholdKey].doubleValue(), 0);
