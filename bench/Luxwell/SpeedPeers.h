@@ -28,7 +28,8 @@ std::unique_ptr<SpeedPeer> sqliteSpeedPeer(const Collection& pages,
                                            const std::filesystem::path& folder);
 
 /// Seconds that Spectra's Lanczos method takes for the truncated factorisation of the matrix of
-/// pages and stems (weights as in the model, rank 4·√pages within 50 and 300), the matrix given.
+/// pages and stems (weights as in the model, rank 4·√pages within 50 and 300), the matrix given:
+/// the better of one thread and as many as there are processors.
 double spectraSeconds(const HelpLUXIndex& index);
 
 }  // namespace quality

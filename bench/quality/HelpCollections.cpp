@@ -1,6 +1,7 @@
 #include "bench/quality/HelpCollections.h"
 
 #include <algorithm>
+#include <cctype>
 #include <cstdio>
 #include <fstream>
 #include <iterator>
@@ -127,9 +128,7 @@ Collection officeKeywords(const fs::path& root, const std::string& folder) {
 }
 
 /// DocBook's index page: nested lists of terms, each with links to the places that it names.
-Collection gimpKeywords(const fs::path& root) {
-  const fs::path book = root / "usr/share/gimp/2.0/help/en";
-  const std::string indexName = "gimp-help-index.html";
+Collection docBookKeywords(const fs::path& book, const std::string& indexName) {
   Collection collection;
   for (const BookPage& page : pagesOfBook(book)) {
     if (page.path != indexName) {
@@ -151,24 +150,38 @@ Collection gimpKeywords(const fs::path& root) {
   return collection;
 }
 
-std::string withoutSuffix(const std::string& text, const std::string& suffix) {
-  return text.ends_with(suffix) ? text.substr(0, text.size() - suffix.size()) : text;
+/// Titles begin with the number of the chapter and end with the name of the book in some books.
+std::string bareTitle(const std::string& title, const std::string& bookMark) {
+  std::string bare = bookMark.empty() ? title : title.substr(0, title.rfind(bookMark));
+  size_t end = 0;
+  bool hasDigit = false;
+  while (end < bare.size() &&
+         (std::isalnum(static_cast<unsigned char>(bare[end])) != 0 || bare[end] == '.')) {
+    hasDigit = hasDigit || std::isdigit(static_cast<unsigned char>(bare[end])) != 0;
+    ++end;
+  }
+  if (hasDigit && end > 0 && bare[end - 1] == '.') {
+    bare.erase(0, end);
+    if (bare.starts_with("\xC2\xA0")) {
+      bare.erase(0, 2);
+    }
+  }
+  return collapsed(bare);
 }
 
 /// Titles are the queries; documents have neither title nor a heading that repeats it.
-Collection titlesOfBook(const fs::path& folder, const std::string& titleSuffix,
-                        bool withDescription) {
+Collection titlesOfBook(const fs::path& folder, const std::string& bookMark) {
   Collection collection;
   Candidates candidates;
   for (BookPage& page : pagesOfBook(folder)) {
-    const std::string title = collapsed(withoutSuffix(page.page.title, titleSuffix));
+    const std::string title = bareTitle(page.page.title, bookMark);
+    const std::string fullTitle = bareTitle(page.page.title, "");
     Document document = documentOfPage(page);
     document.title.clear();
-    std::erase_if(document.blocks,
-                  [&title](const std::string& block) { return collapsed(block) == title; });
-    if (withDescription && !page.page.description.empty()) {
-      document.blocks.insert(document.blocks.begin(), page.page.description);
-    }
+    std::erase_if(document.blocks, [&](const std::string& block) {
+      const std::string bare = bareTitle(block, "");
+      return bare == title || bare == fullTitle;
+    });
     if (document.blocks.empty()) {
       continue;
     }
@@ -194,8 +207,8 @@ Collection descriptionsOfBook(const fs::path& folder) {
   return collection;
 }
 
-HelpCollectionMaker office(const std::string& name, const std::string& language,
-                           const std::string& folder) {
+HelpCollectionMaker officeMaker(const std::string& name, const std::string& language,
+                                const std::string& folder) {
   std::string package = folder;
   std::transform(package.begin(), package.end(), package.begin(),
                  [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
@@ -216,28 +229,35 @@ std::map<std::string, std::string> packageVersions(const fs::path& root) {
 }  // namespace
 
 const std::vector<HelpCollectionMaker>& helpCollectionMakers() {
+  static const fs::path office = "usr/share/libreoffice/help/en-US/text";
+  static const fs::path paint = "usr/share/gimp/2.0/help/en";
   static const fs::path desktop = "usr/share/help/C";
   static const fs::path python = "usr/share/doc/python3.11/html";
+  static const fs::path database = "usr/share/doc/postgresql-doc-15/html";
+  static const fs::path server = "usr/share/doc/apache2-doc/manual/en";
+  const auto titles = [](const fs::path& folder, const std::string& bookMark) {
+    return [=](const fs::path& root) { return titlesOfBook(root / folder, bookMark); };
+  };
+  const auto keywords = [](const fs::path& folder, const std::string& indexName) {
+    return [=](const fs::path& root) { return docBookKeywords(root / folder, indexName); };
+  };
   static const std::vector<HelpCollectionMaker> makers = {
-      office("libreoffice-keywords", "en", "en-US"),
-      {"gimp-keywords", "en", {"gimp-help-en"}, gimpKeywords},
-      {"gnome-titles",
-       "en",
-       {"gnome-user-docs"},
-       [](const fs::path& root) { return titlesOfBook(root / desktop, "", false); }},
-      {"python-titles",
-       "en",
-       {"python3.11-doc"},
-       [](const fs::path& root) {
-         return titlesOfBook(root / python, " — Python 3.11.2 documentation", false);
-       }},
+      officeMaker("libreoffice-keywords", "en", "en-US"),
+      {"gimp-keywords", "en", {"gimp-help-en"}, keywords(paint, "gimp-help-index.html")},
+      {"gnome-titles", "en", {"gnome-user-docs"}, titles(desktop, "")},
+      {"python-titles", "en", {"python3.11-doc"}, titles(python, " — Python ")},
       {"gnome-descriptions",
        "en",
        {"gnome-user-docs"},
        [](const fs::path& root) { return descriptionsOfBook(root / desktop); }},
-      office("libreoffice-keywords-de", "de", "de"),
-      office("libreoffice-keywords-fr", "fr", "fr"),
-      office("libreoffice-keywords-ja", "ja", "ja"),
+      {"postgresql-keywords", "en", {"postgresql-doc-15"}, keywords(database, "bookindex.html")},
+      {"postgresql-titles", "en", {"postgresql-doc-15"}, titles(database, "")},
+      {"apache-titles", "en", {"apache2-doc"}, titles(server, " - Apache HTTP Server")},
+      {"gimp-titles", "en", {"gimp-help-en"}, titles(paint, "")},
+      {"libreoffice-titles", "en", {"libreoffice-help-en-us"}, titles(office, "")},
+      officeMaker("libreoffice-keywords-de", "de", "de"),
+      officeMaker("libreoffice-keywords-fr", "fr", "fr"),
+      officeMaker("libreoffice-keywords-ja", "ja", "ja"),
   };
   return makers;
 }

@@ -110,9 +110,16 @@ std::string checksTable(const std::vector<Result>& results) {
       "other "
       "subjects answered | own answers lost |\n|---|---:|---:|---:|---:|\n";
   for (const Result& result : results) {
-    text += fmt::format("| {} | {} of {} | {:.1f} % | {:.1f} % | {:.1f} % |\n", result.name,
-                        result.titles.count, result.titles.total, result.everyday.foreign.percent(),
-                        result.foreign.foreign.percent(), result.foreign.lost.percent());
+    text += fmt::format("| {} ", result.name);
+    text += result.titles.total == 0
+                ? "| "
+                : fmt::format("| {} of {} ", result.titles.count, result.titles.total);
+    // The foreign questions are English.
+    text += result.language == "en"
+                ? fmt::format("| {:.1f} % | {:.1f} % ", result.everyday.foreign.percent(),
+                              result.foreign.foreign.percent())
+                : "| | ";
+    text += fmt::format("| {:.1f} % |\n", result.foreign.lost.percent());
   }
   return text;
 }
@@ -124,9 +131,12 @@ std::string suggestionsTable(const std::vector<Result>& results) {
       "phrase vectors | similar, no word shared | by phrase vectors |\n"
       "|---|---:|---:|---:|---:|---:|---:|---:|\n";
   for (const Result& result : results) {
+    const auto completion = [&result](double rank) {
+      return result.completions.count == 0 ? std::string() : shortNumber(rank);
+    };
     text += fmt::format(
         "| {} | {} | {} | {} | {} | {} | {} | {} |\n", result.name, result.completions.count,
-        shortNumber(result.completions.ours), shortNumber(result.completions.other),
+        completion(result.completions.ours), completion(result.completions.other),
         shortNumber(result.similar.ours), shortNumber(result.similar.other),
         shortNumber(result.similarOtherWords.ours), shortNumber(result.similarOtherWords.other));
   }

@@ -25,6 +25,10 @@ inline constexpr const char* HelpLUXIndexAttributeTrigramThresholdKey =
 /// String: tag of the language that the book is written in.
 inline constexpr const char* HelpLUXIndexAttributeLanguageKey = "HelpLUXIndexAttributeLanguageKey";
 
+/// Number: HelpTokenizer::version() of the tokenizer that made the tokens.
+inline constexpr const char* HelpLUXIndexAttributeTokenizerVersionKey =
+    "HelpLUXIndexAttributeTokenizerVersionKey";
+
 // Keys of HelpLUXIndex::fileProperitesForKey().
 
 /// String: the page's title, never empty.

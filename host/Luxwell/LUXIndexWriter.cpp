@@ -258,6 +258,7 @@ struct LUXIndexWriter::Implementation {
   platform::Data attributes(const LUXPhraseFinder& finder) const {
     platform::Value::Dictionary attributes;
     attributes.emplace(HelpLUXIndexAttributeLanguageKey, tokenizer->languageTag());
+    attributes.emplace(HelpLUXIndexAttributeTokenizerVersionKey, HelpTokenizer::version());
     attributes.emplace(HelpLUXIndexAttributeBigramThresholdKey,
                        LUXPhraseThreshold(finder.phrases(), 1, 2, pages.size()));
     attributes.emplace(HelpLUXIndexAttributeTrigramThresholdKey,

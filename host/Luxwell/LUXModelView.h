@@ -41,7 +41,7 @@ inline constexpr uint32_t posting(uint32_t page, uint32_t impact) noexcept {
 namespace luxmodel {
 
 /// How fast repetitions stop counting, and how much more one occurrence in a title counts.
-inline constexpr double saturation = 2.5;
+inline constexpr double saturation = 2.25;
 inline constexpr double titleWeight = 4;
 /// A field that is longer than the average has more of everything by chance: counts are divided by
 /// 1 - share + share * (length / average)^exponent. Long bodies are not that much less about their
@@ -49,7 +49,7 @@ inline constexpr double titleWeight = 4;
 inline constexpr double titleLengthShare = 0.5;
 inline constexpr double titleLengthExponent = 1;
 inline constexpr double bodyLengthShare = 0.9;
-inline constexpr double bodyLengthExponent = 0.6;
+inline constexpr double bodyLengthExponent = 0.55;
 
 /// Pages from which on there are neighbourhoods.
 inline constexpr size_t neighbourhoodPageCount = 512;

@@ -97,6 +97,10 @@ std::vector<std::shared_ptr<LUXHit>> LUXQuery::_results() const {
     return LUXHit::hitsForPhrases(
         *view, LUXSimilarPhrases(*view, terms, _requestedCount, scope, book, isCancelled));
   }
-  return LUXHit::hitsForPages(
-      *view, LUXScoring(*view).bestPages(terms, _requestedCount, scope, isCancelled));
+  const auto pages = LUXScoring(*view).bestPages(terms, _requestedCount, scope, isCancelled);
+  const bool isTitle = !pages.empty() && pages.front().score >= luxscoring::exactTitleScore;
+  if (LUXQueryHasOperators(_queryString) && !isTitle) {
+    return {};
+  }
+  return LUXHit::hitsForPages(*view, pages);
 }

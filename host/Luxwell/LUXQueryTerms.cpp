@@ -103,7 +103,38 @@ void countPairs(std::vector<LUXQueryTerms::Pair>& pairs) {
   pairs.resize(kept);
 }
 
+// Of an ASCII letter or a character beyond ASCII.
+bool isLetterOrLater(char byte) {
+  const auto value = static_cast<unsigned char>(byte);
+  return value >= 0x80 || (value >= 'a' && value <= 'z') || (value >= 'A' && value <= 'Z');
+}
+
+bool isOperatorWord(std::string_view word) {
+  const char first = word.front();
+  const bool isPrefixed = word.size() > 1 && (first == '-' || first == '!' || first == '+') &&
+                          (word[1] == '"' || word[1] == '(' || isLetterOrLater(word[1]));
+  const bool isStarred = word.size() > 1 && word.back() == '*' && first != '*';
+  return isPrefixed || isStarred || word == "|" || word == "&";
+}
+
 }  // namespace
+
+bool LUXQueryHasOperators(std::string_view text) {
+  constexpr size_t mostWords = 8;
+  constexpr std::string_view blanks = " \t\r\n";
+  if (text.size() > longestTitle) {
+    return false;
+  }
+  size_t words = 0;
+  bool found = std::count(text.begin(), text.end(), '"') >= 2;
+  for (size_t start = text.find_first_not_of(blanks); start != std::string_view::npos;) {
+    const size_t end = std::min(text.find_first_of(blanks, start), text.size());
+    ++words;
+    found = found || isOperatorWord(text.substr(start, end - start));
+    start = text.find_first_not_of(blanks, end);
+  }
+  return found && words <= mostWords;
+}
 
 LUXQueryTerms LUXQueryTerms::foldedTextOf(const HelpTokenizer& tokenizer, std::string_view text) {
   LUXQueryTerms terms;

@@ -376,8 +376,8 @@ std::vector<LUXScoredPage> LUXScoring::bestPages(const LUXQueryTerms& terms, siz
     return {};
   }
   for (LUXScoredPage& page : found) {
-    page.score =
-        std::min(stretched(plan.known * page.score, terms.stems.size()), luxscoring::highestScore);
+    page.score = std::min(stretched(plan.known * plan.known * page.score, terms.stems.size()),
+                          luxscoring::highestScore);
   }
   // Pages of which the model knows no word that the query has are no answer.
   std::erase_if(found, [](const LUXScoredPage& page) { return !(page.score > 0); });

@@ -34,7 +34,7 @@ namespace luxscoring {
 /// Share of word pairs beside single words.
 inline constexpr float bigramWeight = 0.2F;
 /// Share of words as they stand beside their stems: commands and options are no words to be bent.
-inline constexpr float formWeight = 0.1F;
+inline constexpr float formWeight = 0.15F;
 /// The most that meaning may count for, and the number of terms over which it comes up to that.
 inline constexpr float latentWeight = 0.2F;
 inline constexpr float latentTerms = 6;
@@ -44,14 +44,14 @@ inline constexpr float highestScore = 0.989F;
 /// Questions of this many terms or more seldom have all their words in one page. The score that is
 /// to them what `cutoff` is to shorter ones is moved there, the scores around it in proportion.
 inline constexpr size_t longQueryTerms = 6;
-inline constexpr float longQueryCutoff = 0.15F;
+inline constexpr float longQueryCutoff = 0.12F;
 inline constexpr float cutoff = 0.20F;
 
 }  // namespace luxscoring
 
 /// Scores the pages of one model.
 ///
-///     score = known * ((1 - w) * lexical + w * max(0, cosine))
+///     score = known² * ((1 - w) * lexical + w * max(0, cosine))
 ///
 /// `lexical` is BM25F over stems (S. Robertson, H. Zaragoza, M. Taylor, "Simple BM25 extension to
 /// multiple weighted fields", 2004) with smaller shares for pairs of stems and for words as they
@@ -63,7 +63,8 @@ inline constexpr float cutoff = 0.20F;
 /// words. A page whose title is the query has 1.
 ///
 /// A last word that is still being typed and is unknown, or known to few pages, counts as whichever
-/// words begin with it. A query of stop words alone is looked up by forms, without meaning.
+/// words begin with it; so does any other word that is unknown, but it stays half unknown. A query
+/// of stop words alone is looked up by forms, without meaning.
 ///
 /// Pages that share no word with the query can have w * cosine at most. They are looked at only
 /// where fewer pages than wanted share a word with it.

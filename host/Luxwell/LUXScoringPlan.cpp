@@ -13,10 +13,11 @@
 
 namespace {
 
-// A word that is being typed is expanded from this many bytes on (three letters, or one of a script
-// whose words are short) if no more pages than this have the word itself, to so many of the most
-// frequent words at most, chosen among so many in order.
-constexpr size_t shortestPrefix = 3;
+// A word that is being typed is expanded from this many bytes on, if no more pages than this have
+// the word itself; another word, if no page has it. It stands for so many of the most frequent
+// words at most, chosen among so many in order.
+constexpr size_t shortestUnfinished = 2;
+constexpr size_t shortestUnknown = 3;
 constexpr uint32_t fewPages = 2;
 constexpr size_t mostExpansions = 32;
 constexpr uint32_t mostConsidered = 4096;
@@ -106,10 +107,20 @@ class Planner {
     }
     const auto postings = number ? _view.postings(kind, *number) : std::span<const uint32_t>();
     const auto count = static_cast<float>(word.count);
-    if (frequency <= fewPages && word.token == _terms.unfinishedStem && _expand(postings, count)) {
+    const float weight = _inverseFrequency(frequency);
+    if (word.token == _terms.unfinishedStem) {
+      if (frequency <= fewPages && _terms.unfinishedForm.size() >= shortestUnfinished) {
+        if (const float expanded = _expand(_terms.unfinishedForm, postings, count)) {
+          _allMass += expanded;
+          return;
+        }
+      }
+    } else if (frequency == 0 && kind == LUXTokenKind::stem &&
+               word.token.size() >= shortestUnknown && _expand(word.token, postings, count) > 0) {
+      // It may be half a word, or one of another subject: then what it finds says little.
+      _allMass += weight;
       return;
     }
-    const float weight = _inverseFrequency(frequency);
     _allMass += weight;
     if (frequency > 0) {
       _knownMass += weight;
@@ -117,20 +128,16 @@ class Planner {
     }
   }
 
-  // Makes one list of all words that begin with the unfinished one: a page has of each posting the
-  // best. False when there are no such words.
-  bool _expand(std::span<const uint32_t> own, float count) {
-    const std::string& prefix = _terms.unfinishedForm;
-    if (prefix.size() < shortestPrefix) {
-      return false;
-    }
+  // Makes one list of all words that begin with a half one: a page has of each posting the best.
+  // Returns its weight; 0 when there are no such words.
+  float _expand(const std::string& prefix, std::span<const uint32_t> own, float count) {
     const auto [first, end] = _view.termRangeWithPrefix(LUXTokenKind::form, prefix);
     std::vector<std::pair<uint32_t, uint32_t>> expansions;
     for (uint32_t number = first; number < std::min(end, first + mostConsidered); ++number) {
       expansions.emplace_back(_view.documentFrequency(LUXTokenKind::form, number), number);
     }
     if (expansions.empty()) {
-      return false;
+      return 0;
     }
     if (expansions.size() > mostExpansions) {
       std::partial_sort(expansions.begin(), expansions.begin() + mostExpansions, expansions.end(),
@@ -153,12 +160,11 @@ class Planner {
               all.end());
     std::reverse(all.begin(), all.end());
     const float weight = _inverseFrequency(static_cast<uint32_t>(all.size()));
-    _allMass += weight;
     _knownMass += weight;
     // The elements of the inner vector stay where they are when the outer one grows.
     _plan.unions.push_back(std::move(all));
     _addList(_plan.unions.back(), count * weight);
-    return true;
+    return weight;
   }
 
   void _addShare(LUXTokenKind kind, std::optional<uint32_t> number, uint32_t count, float share) {

@@ -373,6 +373,7 @@ TEST(HelpTokenizer, ThreadsDoNotDisturbEachOther) {
   const std::string text = "The printers' queues: 文字列の検索 เครื่องพิมพ์ and Ｗｉｄｅ words";
   const auto expected = stems(text);
   std::vector<std::thread> threads;
+  threads.reserve(4);
   for (int i = 0; i < 4; ++i) {
     threads.emplace_back([&] {
       for (int round = 0; round < 200; ++round) {

@@ -173,6 +173,7 @@ TEST(LUXIndexWriter, CountsAreThoseOfBruteForce) {
     return result;
   };
   std::vector<LUXDocument> pages;
+  pages.reserve(40);
   for (int i = 0; i < 40; ++i) {
     pages.push_back(document(std::to_string(i), text(random() % 5),
                              {text(random() % 30), text(random() % 30)}));
@@ -257,6 +258,7 @@ TEST(LUXIndexWriter, PagesOfOneWordAndOfNoneAreTaken) {
 
 TEST(LUXIndexWriter, AttributesNameTheLanguageAndTheThresholds) {
   std::vector<LUXDocument> pages;
+  pages.reserve(4);
   for (int i = 0; i < 4; ++i) {
     pages.push_back(document(std::to_string(i), "",
                              {"paper tray", "ink jet", "print job", "wide screen", "paper tray"}));
@@ -264,6 +266,7 @@ TEST(LUXIndexWriter, AttributesNameTheLanguageAndTheThresholds) {
   const auto opened = index(pages, "German");
   const Value& attributes = opened->attributes();
   EXPECT_EQ(attributes[HelpLUXIndexAttributeLanguageKey], Value("de"));
+  EXPECT_EQ(attributes[HelpLUXIndexAttributeTokenizerVersionKey], Value(HelpTokenizer::version()));
   EXPECT_GT(attributes[HelpLUXIndexAttributeBigramThresholdKey].doubleValue(), 0)
       << "twelve phrases for a budget of four";
   EXPECT_EQ(attributes[HelpLUXIndexAttributeTrigramThresholdKey].doubleValue(), 0);
@@ -376,6 +379,7 @@ TEST(HelpLUXIndex, BytesWithTheRightChecksumAreNotTrustedEither) {
 TEST(HelpLUXIndex, ThreadsMayAskTheSameIndex) {
   const auto opened = index(example());
   std::vector<std::thread> threads;
+  threads.reserve(4);
   for (int i = 0; i < 4; ++i) {
     threads.emplace_back([&] {
       for (int round = 0; round < 100; ++round) {

@@ -68,10 +68,10 @@ class NaiveModel {
         Posting& posting = result[std::string(count.token)][page];
         posting.count = count.titleCount + count.bodyCount;
         posting.tf = kind == LUXTokenKind::bigram
-                         ? posting.count / relative(.9, .6, titleLength + bodyLength,
+                         ? posting.count / relative(.9, .55, titleLength + bodyLength,
                                                     titleAverage + bodyAverage)
                          : 4 * count.titleCount / relative(.5, 1, titleLength, titleAverage) +
-                               count.bodyCount / relative(.9, .6, bodyLength, bodyAverage);
+                               count.bodyCount / relative(.9, .55, bodyLength, bodyAverage);
       }
     }
     return result;
@@ -136,7 +136,7 @@ TEST(LUXModelView, PostingsAreThoseOfEachPageAlone) {
         for (const uint32_t posting : view->postings(kind, *number)) {
           found.push_back(luxposting::page(posting));
           const double tf = expected.at(found.back());
-          const double impact = kind == LUXTokenKind::title ? 1023 : 1023 * tf / (2.5 + tf);
+          const double impact = kind == LUXTokenKind::title ? 1023 : 1023 * tf / (2.25 + tf);
           EXPECT_NEAR(luxposting::impact(posting), impact, .51) << token;
         }
         std::vector<uint32_t> expectedPages;

@@ -76,17 +76,20 @@ double NaiveScoring::_saturated(const Page& page, const Token& token) const {
   return count / (luxmodel::saturation + count);
 }
 
-// The words that the unfinished one may become, if it is to be expanded.
-std::set<std::string> NaiveScoring::_expansions(const LUXQueryTerms& terms) const {
+// The words that a half one may become, if it is to be expanded.
+std::set<std::string> NaiveScoring::_expansions(const LUXQueryTerms& terms,
+                                                const std::string& stem) const {
   std::set<std::string> words;
-  if (terms.unfinishedForm.size() < 3 ||
-      _frequency({LUXTokenKind::stem, terms.unfinishedStem}) > 2) {
+  const bool isUnfinished = stem == terms.unfinishedStem;
+  const std::string& prefix = isUnfinished ? terms.unfinishedForm : stem;
+  if (prefix.size() < (isUnfinished ? 2U : 3U) || terms.onlyStopWords ||
+      _frequency({LUXTokenKind::stem, stem}) > (isUnfinished ? 2 : 0)) {
     return words;
   }
   for (const Page& page : _pages) {
     for (const auto& entry : page.counts) {
       const auto& [kind, word] = entry.first;
-      if (kind == LUXTokenKind::form && word.starts_with(terms.unfinishedForm)) {
+      if (kind == LUXTokenKind::form && word.starts_with(prefix)) {
         words.insert(word);
       }
     }
@@ -109,7 +112,10 @@ std::vector<double> NaiveScoring::_latent(const LUXQueryTerms& terms) const {
 }
 
 size_t NaiveScoring::pagesWithWords(const LUXQueryTerms& terms) const {
-  const auto expansions = _expansions(terms);
+  std::set<std::string> expansions;
+  for (const LUXQueryTerms::Term& stem : terms.stems) {
+    expansions.merge(_expansions(terms, stem.token));
+  }
   return static_cast<size_t>(std::count_if(_pages.begin(), _pages.end(), [&](const Page& page) {
     return page.mayBeFound &&
            (std::any_of(terms.stems.begin(), terms.stems.end(),
@@ -129,7 +135,6 @@ size_t NaiveScoring::pagesWithWords(const LUXQueryTerms& terms) const {
 std::map<uint32_t, double> NaiveScoring::scores(const LUXQueryTerms& terms) const {
   const LUXTokenKind wordKind = terms.onlyStopWords ? LUXTokenKind::form : LUXTokenKind::stem;
   const auto& words = terms.onlyStopWords ? terms.forms : terms.stems;
-  const std::set<std::string> expansions = _expansions(terms);
   double all = 0;
   double known = 0;
   double bound = 0;
@@ -143,7 +148,8 @@ std::map<uint32_t, double> NaiveScoring::scores(const LUXQueryTerms& terms) cons
     }
   };
   for (const LUXQueryTerms::Term& word : words) {
-    if (!expansions.empty() && word.token == terms.unfinishedStem) {
+    const std::set<std::string> expansions = _expansions(terms, word.token);
+    if (!expansions.empty()) {
       double having = 0;
       std::map<uint32_t, double> best;
       for (const Page& page : _pages) {
@@ -158,7 +164,7 @@ std::map<uint32_t, double> NaiveScoring::scores(const LUXQueryTerms& terms) cons
       }
       const double weight =
           std::log(1 + (static_cast<double>(_pages.size()) - having + 0.5) / (having + 0.5));
-      all += weight;
+      all += word.token == terms.unfinishedStem ? weight : _weight({wordKind, word.token});
       known += weight;
       bound += word.count * weight;
       for (const auto& [page, most] : best) {
@@ -185,7 +191,7 @@ std::map<uint32_t, double> NaiveScoring::scores(const LUXQueryTerms& terms) cons
     for (const LUXQueryTerms::Term& form : terms.forms) {
       const Token token{LUXTokenKind::form, form.token};
       if (_frequency(token) > 0) {
-        add(token, 0.1 * form.count * _weight(token));
+        add(token, 0.15 * form.count * _weight(token));
       }
     }
   }
@@ -208,9 +214,9 @@ std::map<uint32_t, double> NaiveScoring::scores(const LUXQueryTerms& terms) cons
     }
     double score = (1 - meaning) * (bound > 0 ? scored[page.number].lexical / bound : 0) +
                    meaning * std::max(0.0, cosine);
-    score *= all > 0 ? known / all : 0;
+    score *= all > 0 ? known / all * known / all : 0;
     if (terms.stems.size() >= 6) {
-      score = score < 0.15 ? score / 0.15 * 0.2 : 0.2 + (score - 0.15) / 0.85 * 0.8;
+      score = score < 0.12 ? score / 0.12 * 0.2 : 0.2 + (score - 0.12) / 0.88 * 0.8;
     }
     score = std::min(score, 0.989);
     if (page.counts.contains({LUXTokenKind::title, terms.normalizedTitle})) {

@@ -43,7 +43,7 @@ class NaiveScoring {
   double _frequency(const Token& token) const;
   double _weight(const Token& token) const;
   double _saturated(const Page& page, const Token& token) const;
-  std::set<std::string> _expansions(const LUXQueryTerms& terms) const;
+  std::set<std::string> _expansions(const LUXQueryTerms& terms, const std::string& stem) const;
   std::vector<double> _latent(const LUXQueryTerms& terms) const;
 
   const LUXModelView& _view;

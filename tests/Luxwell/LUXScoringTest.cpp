@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <functional>
 #include <map>
 #include <random>
 #include <set>
@@ -25,6 +26,12 @@ const QueryWorld& office() {
 
 const QueryWorld& randomWorld() {
   static const QueryWorld world(tests::randomPages(300, 7));
+  return world;
+}
+
+// Large enough to have neighbourhoods.
+const QueryWorld& largeWorld() {
+  static const QueryWorld world(tests::randomPages(1300, 8));
   return world;
 }
 
@@ -97,17 +104,17 @@ TEST(LUXScoring, GivesTheScoresOfTheNaiveTwin) {
 
 TEST(LUXScoring, TheBestFewAreTheFirstOfAll) {
   std::mt19937 random(12);
-  const NaiveScoring naive(randomWorld());
-  for (int i = 0; i < 300; ++i) {
+  const NaiveScoring naive(largeWorld());
+  for (int i = 0; i < 150; ++i) {
     const std::string text = randomQuery(random);
-    const auto all = best(randomWorld(), text, 1000);
-    const size_t withWords = naive.pagesWithWords(randomWorld().termsOf(text));
-    for (const size_t count : {size_t{1}, size_t{5}, size_t{20}, size_t{100}}) {
+    const auto all = best(largeWorld(), text, 2000);
+    const size_t withWords = naive.pagesWithWords(largeWorld().termsOf(text));
+    for (const size_t count : {size_t{1}, size_t{5}, size_t{20}, size_t{60}}) {
       // Only then are pages left out that share no word with the query.
       if (withWords < count) {
         continue;
       }
-      const auto few = best(randomWorld(), text, count);
+      const auto few = best(largeWorld(), text, count);
       ASSERT_EQ(few.size(), count) << text;
       size_t place = 0;
       for (const LUXScoredPage& page : few) {
@@ -120,6 +127,41 @@ TEST(LUXScoring, TheBestFewAreTheFirstOfAll) {
       }
     }
   }
+}
+
+TEST(LUXScoring, WhereFewPagesHaveAWordTheNearestInMeaningFollow) {
+  ASSERT_GT(largeWorld().view()->neighbourhoodCount(), 0U);
+  const NaiveScoring naive(largeWorld());
+  constexpr size_t count = 150;
+  size_t asked = 0;
+  size_t wanted = 0;
+  size_t met = 0;
+  for (size_t number = 300; number < tests::vocabularySize; number += 2) {
+    const std::string text = tests::vocabularyWord(number) + ' ';
+    const LUXQueryTerms terms = largeWorld().termsOf(text);
+    const size_t withWords = naive.pagesWithWords(terms);
+    if (withWords == 0 || withWords > 60) {
+      continue;
+    }
+    ++asked;
+    const auto found = best(largeWorld(), text, count);
+    const auto expected = naive.scores(terms);
+    for (const LUXScoredPage& page : found) {
+      EXPECT_NEAR(static_cast<double>(page.score), expected.at(page.page), 0.004) << text;
+    }
+    std::vector<double> scores;
+    for (const auto& [page, score] : expected) {
+      scores.push_back(score);
+    }
+    std::sort(scores.begin(), scores.end(), std::greater<>());
+    wanted += count;
+    met += static_cast<size_t>(
+        std::count_if(found.begin(), found.end(), [&](const LUXScoredPage& page) {
+          return static_cast<double>(page.score) > scores[count - 1] - 0.004;
+        }));
+  }
+  EXPECT_GT(asked, 10U);
+  EXPECT_GT(met, wanted * 8 / 10);
 }
 
 TEST(LUXScoring, AnExactTitleHasOneAndNothingElseComesNear) {
@@ -178,12 +220,21 @@ TEST(LUXScoring, AWordBeingTypedFindsTheWordsThatBeginWithIt) {
   EXPECT_EQ(firstKey(office(), "change passw"), "password.html");
 }
 
-TEST(LUXScoring, AFinishedWordIsNotExpanded) {
-  EXPECT_TRUE(best(office(), "wirele ").empty());
-  EXPECT_TRUE(best(office(), "wirele.").empty());
+TEST(LUXScoring, HalfAWordThatIsFinishedCountsForLess) {
+  const auto typed = best(office(), "wirele");
+  for (const char* text : {"wirele ", "wirele."}) {
+    const auto finished = best(office(), text);
+    ASSERT_FALSE(finished.empty()) << text;
+    EXPECT_EQ(finished[0].page, typed[0].page) << text;
+    EXPECT_LT(finished[0].score, typed[0].score) << text;
+  }
 }
 
-TEST(LUXScoring, TwoLettersAreNotExpanded) { EXPECT_TRUE(best(office(), "wi").empty()); }
+TEST(LUXScoring, TwoLettersAreExpandedWhileTheyAreTyped) {
+  EXPECT_EQ(firstKey(office(), "wi"), "wifi.html");
+  EXPECT_TRUE(best(office(), "wi ").empty());
+  EXPECT_TRUE(best(office(), "w").empty());
+}
 
 TEST(LUXScoring, AKnownWordIsNotExpanded) {
   // "print" is in many pages; "printer" shares no stem with it.

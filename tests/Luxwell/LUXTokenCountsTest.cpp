@@ -7,7 +7,6 @@
 
 using platform::Data;
 using testing::ElementsAre;
-using testing::IsEmpty;
 
 namespace {
 
