@@ -43,8 +43,8 @@ void LUXClock::sleep(platform::Seconds duration) {
     count = static_cast<size_t>(std::count_if(_sleeps.begin(), _sleeps.end(),
                                               [&](const Sleep& s) { return s.thread == thread; }));
   }
-  if (onSleep) {
-    onSleep(count);
+  if (const auto hook = onSleep.get()) {
+    hook(count);
   }
   advance(duration);
 }

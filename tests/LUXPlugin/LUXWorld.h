@@ -31,6 +31,7 @@
 #include "plugin/shelf/ZEBIndexshelf.h"
 #include "tests/platform/TemporaryFolder.h"
 #include "tests/plugin/HelpIndexWorld.h"
+#include "tests/plugin/Hook.h"
 #include "tests/plugin/front/RecordingOwner.h"
 
 namespace platform {
@@ -75,7 +76,7 @@ class LUXClock : public platform::SimulatedClock {
 
   /// Called by every sleeper, with the number of its thread's sleeps, this one among them; the time
   /// moves on when it returns. The first one gives other threads a moment.
-  std::function<void(size_t count)> onSleep;
+  Hook<void(size_t count)> onSleep;
 
  private:
   mutable std::mutex _mutex;

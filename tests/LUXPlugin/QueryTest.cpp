@@ -374,7 +374,7 @@ TEST_F(Query, usesABusyModelAsSoonAsItIsFree) {
   buildBoth();
   ASSERT_TRUE(
       world.controller->modelForGroupName("Apps", "English", true, kLUXModelActivityPreloading));
-  const auto pause = world.clock->onSleep;
+  const auto pause = world.clock->onSleep.get();
   world.clock->onSleep = [&](size_t count) {
     if (count == 300) {
       world.controller->finishedActivity(kLUXModelActivityPreloading, "Apps", "English");

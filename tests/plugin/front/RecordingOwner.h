@@ -2,7 +2,6 @@
 #pragma once
 
 #include <atomic>
-#include <functional>
 #include <map>
 #include <memory>
 #include <optional>
@@ -16,6 +15,7 @@
 #include "host/Zebrine/ZEBResult.h"
 #include "platform/ThreadSafety.h"
 #include "platform/Value.h"
+#include "tests/plugin/Hook.h"
 
 namespace tests {
 
@@ -161,7 +161,7 @@ class RecordingOwner : public ZEBPluginOwner {
   std::atomic<bool> online{true};
   std::optional<std::string> caches;
   /// Called with each message and question after it was written down; may throw.
-  std::function<void(const std::string& message)> onMessage;
+  Hook<void(const std::string& message)> onMessage;
 
  private:
   void _told(const std::string& message) {
@@ -169,8 +169,8 @@ class RecordingOwner : public ZEBPluginOwner {
       const platform::MutexLock lock(_mutex);
       _messages.push_back(message);
     }
-    if (onMessage) {
-      onMessage(message);
+    if (const auto hook = onMessage.get()) {
+      hook(message);
     }
   }
   void _asked(const std::string& question) const {
@@ -178,8 +178,8 @@ class RecordingOwner : public ZEBPluginOwner {
       const platform::MutexLock lock(_mutex);
       _questions.push_back(question);
     }
-    if (onMessage) {
-      onMessage(question);
+    if (const auto hook = onMessage.get()) {
+      hook(question);
     }
   }
 
