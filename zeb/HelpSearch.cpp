@@ -32,9 +32,7 @@ constexpr platform::Seconds removalLimit{10};
 /// Searches bound their own waits.
 constexpr platform::Seconds forever = platform::Seconds::max();
 
-platform::Clock::Instant elapsedNow() {
-  return platform::Environment::current()->clock->elapsed();
-}
+platform::Clock::Instant elapsedNow() { return platform::Environment::current()->clock->elapsed(); }
 
 std::string nameOfPage(const std::string& url) {
   const std::optional<platform::URL> parsed = platform::URL::URLWithString(url);
@@ -105,6 +103,10 @@ std::shared_ptr<ZEBQuery> makeQuery(std::string_view text, const std::vector<std
   query->setScope(bookIDs);
   query->setResultTypes(std::move(kinds));
   query->setLimit(limit);
+  if (bookIDs.empty()) {
+    // Without that, models that do not have the system's own manual would be passed over.
+    query->setOptions(platform::Value::Dictionary{{ZEBQuerySearchAllBooksOptionKey, true}});
+  }
   return query;
 }
 
@@ -399,7 +401,8 @@ std::optional<std::vector<Suggestion>> HelpSearch::similarSearches(
 std::optional<Answer> HelpSearch::lookUpAnchor(std::string_view name,
                                                const std::vector<std::string>& bookIDs) {
   const auto query = makeQuery(name, bookIDs, {ZEBHelpArticleResult}, 0);
-  query->setOptions(platform::Value::Dictionary{{ZEBQueryAnchorSearchOptionKey, true}});
+  query->setOptions(platform::Value::Dictionary{
+      {ZEBQueryAnchorSearchOptionKey, true}, {ZEBQuerySearchAllBooksOptionKey, bookIDs.empty()}});
   return _implementation->answer(query, SIZE_MAX);
 }
 

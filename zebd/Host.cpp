@@ -27,7 +27,7 @@ constexpr platform::Seconds pace{0.01};
 Host::Host(std::shared_ptr<Bookshelf> bookshelf, std::shared_ptr<Owner> owner)
     : _bookshelf(std::move(bookshelf)),
       _owner(std::move(owner)),
-      _searches(platform::DispatchQueue::concurrent(ZEBDaemonBundleID + ".searches")) {}
+      _searches(platform::DispatchQueue::serial(ZEBDaemonBundleID + ".searches")) {}
 
 Host::~Host() { _owner->setBookModifiedHandler(nullptr); }
 

@@ -36,7 +36,9 @@ class Host {
   Owner& owner() { return *_owner; }
   const std::shared_ptr<ZEBPlugin>& plugin() const { return _plugin; }
 
-  /// Begins the search on a thread of its own and returns at once. The receiver hears the end
+  /// Begins the search on a thread of the host, as soon as those before it have ended, and returns
+  /// at once: the plug-in has one search by meaning at a time, and a second would take its models
+  /// and answers. Whoever no longer wants an earlier one cancels it. The receiver hears the end
   /// whatever happens, except when the process ends before.
   void startSearch(const std::shared_ptr<ZEBQuery>& query,
                    std::shared_ptr<SearchReceiver> receiver);

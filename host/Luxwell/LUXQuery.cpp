@@ -98,7 +98,11 @@ std::vector<std::shared_ptr<LUXHit>> LUXQuery::_results() const {
         *view, LUXSimilarPhrases(*view, terms, _requestedCount, scope, book, isCancelled));
   }
   const auto pages = LUXScoring(*view).bestPages(terms, _requestedCount, scope, isCancelled);
-  const bool isTitle = !pages.empty() && pages.front().score >= luxscoring::exactTitleScore;
+  // Titles may look like searches with operators; but who puts the whole into quotation marks means
+  // a phrase, be it a title or not.
+  const bool isPhrase = _queryString.starts_with('"') && _queryString.ends_with('"');
+  const bool isTitle =
+      !isPhrase && !pages.empty() && pages.front().score >= luxscoring::exactTitleScore;
   if (LUXQueryHasOperators(_queryString) && !isTitle) {
     return {};
   }

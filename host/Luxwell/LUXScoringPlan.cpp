@@ -110,7 +110,8 @@ class Planner {
     const float weight = _inverseFrequency(frequency);
     if (word.token == _terms.unfinishedStem) {
       if (frequency <= fewPages && _terms.unfinishedForm.size() >= shortestUnfinished) {
-        if (const float expanded = _expand(_terms.unfinishedForm, postings, count)) {
+        const float expanded = _expand(_terms.unfinishedForm, postings, count);
+        if (expanded > 0) {
           _allMass += expanded;
           return;
         }

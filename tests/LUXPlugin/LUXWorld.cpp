@@ -100,6 +100,8 @@ LUXWorld::LUXWorld()
 
 LUXWorld::~LUXWorld() {
   owner->onMessage = nullptr;
+  // Preloads run on threads of their own, and need the clock to go on.
+  (void)waitUntil([&] { return owner->guards() == 0; });
   clock->onSleep = nullptr;
   finishWork();
   EXPECT_EQ(owner->guards(), 0) << "disableShutdown and enableShutdown are not balanced";

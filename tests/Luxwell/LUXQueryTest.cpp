@@ -431,3 +431,11 @@ TEST(LUXQuery, AModelThatIsDamagedWhileOpenNeitherCrashesNorHangs) {
     damaged.put(whole[at]).flush();
   }
 }
+
+TEST(LUXQuery, LeavesSearchesWithOperatorsToTheKeywordEngine) {
+  for (const char* text : {"\"wireless network\"", "wireless -password", "wireless | password",
+                           "wirel* netw*", "\"add a printer\""}) {
+    EXPECT_TRUE(Asked(text).run().empty()) << text;
+  }
+  EXPECT_FALSE(Asked("wireless \"network").run().empty());
+}

@@ -279,9 +279,9 @@ TEST_F(ProgramTest, DemonstrationSearchesWithoutAnyHelpOnTheComputer) {
   EXPECT_EQ(shown.status, 0) << shown.err;
   EXPECT_THAT(shown.out, HasSubstr("Search with words and half words"));
   EXPECT_THAT(shown.out, HasSubstr("not-connected.html"));
-  const ProgramRun searched = shell(demo + " 'hal wor'");
+  const ProgramRun searched = shell(demo + " 'opera phra'");
   EXPECT_EQ(searched.status, 0) << searched.err;
-  EXPECT_THAT(searched.out, HasSubstr(" 1. Search with words and half words"));
+  EXPECT_THAT(searched.out, HasSubstr("1. Narrow a search with operators and phrases"));
   EXPECT_EQ(shell(demo + " zebra").status, 1);
 }
 
