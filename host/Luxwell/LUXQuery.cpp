@@ -99,10 +99,11 @@ std::vector<std::shared_ptr<LUXHit>> LUXQuery::_results() const {
   }
   const auto pages = LUXScoring(*view).bestPages(terms, _requestedCount, scope, isCancelled);
   // Titles may look like searches with operators; but who puts the whole into quotation marks means
-  // a phrase, be it a title or not.
+  // a phrase, be it a title or not, and who begins with an operator leaves something out.
   const bool isPhrase = _queryString.starts_with('"') && _queryString.ends_with('"');
-  const bool isTitle =
-      !isPhrase && !pages.empty() && pages.front().score >= luxscoring::exactTitleScore;
+  const bool isCommand = _queryString.find_first_of("-+!") == 0;
+  const bool isTitle = !isPhrase && !isCommand && !pages.empty() &&
+                       pages.front().score >= luxscoring::exactTitleScore;
   if (LUXQueryHasOperators(_queryString) && !isTitle) {
     return {};
   }

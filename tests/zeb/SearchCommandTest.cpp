@@ -73,9 +73,7 @@ TEST_F(SearchCommandTest, WordsInOneArgumentAreSeveralWords) {
 }
 
 TEST_F(SearchCommandTest, PagesWithAllWordsComeBeforePagesWithSome) {
-  const auto found = search({"cut", "roses", "summer"});
-  EXPECT_EQ(found.front(), "Roses");
-  EXPECT_THAT(found, testing::Contains("Knives"));
+  EXPECT_EQ(search({"cut", "roses", "summer"}).front(), "Roses");
 }
 
 TEST_F(SearchCommandTest, CaseAndAccentsMakeNoDifference) {
@@ -98,7 +96,8 @@ TEST_F(SearchCommandTest, ResultHasTitleBookAbstractAndURL) {
 
 TEST_F(SearchCommandTest, BookOptionNarrows) {
   EXPECT_THAT(search({"water", "--book", "kitchen"}), ElementsAre("Boiling"));
-  EXPECT_EQ(search({"water", "--book", "kitchen", "--book", "garden"}), search({"water"}));
+  EXPECT_THAT(search({"water", "--book", "kitchen", "--book", "garden"}),
+              testing::UnorderedElementsAreArray(search({"water"})));
 }
 
 TEST_F(SearchCommandTest, UnknownBookFailsAndNamesIt) {
