@@ -72,6 +72,7 @@ Phrases countedByForce(const std::vector<LUXWordSequence>& pages,
 
 Phrases found(const std::vector<LUXWordSequence>& pages, const std::vector<bool>& mayStandAtEdge) {
   std::vector<const LUXWordSequence*> sequences;
+  sequences.reserve(pages.size());
   for (const LUXWordSequence& page : pages) {
     sequences.push_back(&page);
   }
