@@ -2,7 +2,6 @@
 
 #include <cstddef>
 #include <string_view>
-#include <utility>
 
 #include "host/Luxwell/LUXCompletion.h"
 #include "host/Luxwell/LUXModelView.h"
@@ -38,8 +37,9 @@ std::vector<std::shared_ptr<LUXHit>> hitsFor(std::span<const Scored> items, Fill
 
 }  // namespace
 
-std::shared_ptr<LUXHit> LUXHit::hitWithTitle(std::optional<std::string> title, float score,
-                                             std::optional<std::string> path, std::string book) {
+std::shared_ptr<LUXHit> LUXHit::hitWithTitle(const std::optional<std::string>& title, float score,
+                                             const std::optional<std::string>& path,
+                                             const std::string& book) {
   const auto block = std::make_shared<Block>(1);
   LUXHit& hit = block->hits[0];
   hit._block = block.get();

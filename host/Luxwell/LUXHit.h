@@ -20,9 +20,9 @@ struct LUXScoredPhrase;
 /// Thread-safety: immutable but for the score, which is confined to one thread.
 class LUXHit {
  public:
-  static std::shared_ptr<LUXHit> hitWithTitle(std::optional<std::string> title, float score,
-                                              std::optional<std::string> path = std::nullopt,
-                                              std::string book = {});
+  static std::shared_ptr<LUXHit> hitWithTitle(const std::optional<std::string>& title, float score,
+                                              const std::optional<std::string>& path = std::nullopt,
+                                              const std::string& book = {});
 
   /// One hit for each page of the model, in the same order.
   static std::vector<std::shared_ptr<LUXHit>> hitsForPages(const LUXModelView& view,

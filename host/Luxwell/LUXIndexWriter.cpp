@@ -57,8 +57,8 @@ class Names {
 struct Surface {
   // None for what leaves nothing when it is folded.
   uint32_t form = none;
+  // None for stop words.
   uint32_t stem = none;
-  bool isStopWord = false;
   bool isLowerCase = false;
   uint32_t count = 0;
 };
@@ -99,6 +99,8 @@ struct LUXIndexWriter::Implementation {
   std::vector<Surface> surfaces;
   Names forms;
   Names stems;
+  // By their stems, the first in the upper half.
+  std::unordered_map<uint64_t, uint32_t> bigrams;
   std::vector<HelpTokenizer::Segment> segments;
   std::string buffer;
 
@@ -108,8 +110,7 @@ struct LUXIndexWriter::Implementation {
       Surface surface;
       if (const auto word = tokenizer->wordOfSurface(text)) {
         surface.form = forms.numberOf(word->form);
-        surface.stem = stems.numberOf(word->stem);
-        surface.isStopWord = word->isStopWord;
+        surface.stem = word->isStopWord ? none : stems.numberOf(word->stem);
         surface.isLowerCase = platform::lowercaseString(text) == text;
       }
       surfaces.push_back(surface);
@@ -161,18 +162,6 @@ struct LUXIndexWriter::Implementation {
     return surfaceNames[a] < surfaceNames[b];
   }
 
-  std::vector<LUXWordSequence> formSequences() const {
-    std::vector<LUXWordSequence> sequences;
-    sequences.reserve(pages.size());
-    for (const Page& page : pages) {
-      sequences.push_back(page.sequence);
-      for (LUXWordSequence::Word& word : sequences.back().words) {
-        word.number = surfaces[word.number].form;
-      }
-    }
-    return sequences;
-  }
-
   // Forms that may begin or end a phrase: no stop words, and nothing without a letter.
   std::vector<bool> edgeForms() const {
     std::vector<bool> mayStand(forms.count());
@@ -180,63 +169,57 @@ struct LUXIndexWriter::Implementation {
       mayStand[form] = !hasNoLetter(forms[form]);
     }
     for (const Surface& surface : surfaces) {
-      if (surface.isStopWord) {
+      if (surface.form != none && surface.stem == none) {
         mayStand[surface.form] = false;
       }
     }
     return mayStand;
   }
 
-  void addWords(LUXTokenSections& tokens) const {
-    std::unordered_map<uint64_t, uint32_t> bigrams;
-    std::vector<std::string> bigramNames;
-    for (size_t number = 0; number < pages.size(); ++number) {
-      const Page& page = pages[number];
-      uint32_t before = none;
-      for (size_t at = 0; at < page.sequence.words.size(); ++at) {
-        const LUXWordSequence::Word& word = page.sequence.words[at];
-        const Surface& surface = surfaces[word.number];
-        const uint32_t inTitle = at < page.sequence.titleLength ? 1 : 0;
-        tokens.add(number, LUXTokenKind::form, surface.form, inTitle, 1 - inTitle);
-        if (surface.isStopWord) {
-          before = none;
-          continue;
-        }
-        tokens.add(number, LUXTokenKind::stem, surface.stem, inTitle, 1 - inTitle);
-        if (before != none && !word.breaksChain) {
-          const uint64_t pair = static_cast<uint64_t>(before) << 32U | surface.stem;
-          const auto [found, isNew] =
-              bigrams.emplace(pair, static_cast<uint32_t>(bigramNames.size()));
-          if (isNew) {
-            bigramNames.push_back(stems[before] + ' ' + stems[surface.stem]);
-          }
-          tokens.add(number, LUXTokenKind::bigram, found->second, inTitle, 1 - inTitle);
-        }
-        before = surface.stem;
-      }
-      for (const Whole& whole : page.wholes) {
-        const uint32_t inTitle = whole.inTitle ? 1 : 0;
-        tokens.add(number, LUXTokenKind::form, whole.form, inTitle, 1 - inTitle);
-      }
+  LUXPhraseFinder phrases() const {
+    std::vector<const LUXWordSequence*> sequences;
+    sequences.reserve(pages.size());
+    for (const Page& page : pages) {
+      sequences.push_back(&page.sequence);
     }
-    tokens.setNames(LUXTokenKind::stem, stems.all());
-    tokens.setNames(LUXTokenKind::bigram, std::move(bigramNames));
-    tokens.setNames(LUXTokenKind::form, forms.all());
+    std::vector<uint32_t> formOfSurface;
+    formOfSurface.reserve(surfaces.size());
+    for (const Surface& surface : surfaces) {
+      formOfSurface.push_back(surface.form);
+    }
+    LUXPhraseFinder finder;
+    finder.find(sequences, formOfSurface, edgeForms());
+    return finder;
   }
 
-  void addTitles(LUXTokenSections& tokens) const {
+  // Calls the sink with the stems of each pair that makes a bigram, and whether it is in the title.
+  template <typename Sink>
+  void forEachBigram(const Page& page, Sink sink) const {
+    uint32_t before = none;
+    for (size_t at = 0; at < page.sequence.words.size(); ++at) {
+      const LUXWordSequence::Word& word = page.sequence.words[at];
+      const uint32_t stem = surfaces[word.number].stem;
+      if (before != none && stem != none && !word.breaksChain) {
+        sink(static_cast<uint64_t>(before) << 32U | stem, at < page.sequence.titleLength);
+      }
+      before = stem;
+    }
+  }
+
+  // Numbers the bigrams, and returns their names.
+  std::vector<std::string> numberBigrams() {
     std::vector<std::string> names;
-    for (size_t number = 0; number < pages.size(); ++number) {
-      std::string title = tokenizer->tokenizedStringFromString(pages[number].title);
-      if (!title.empty() && title.size() <= LUXTokenTable::maximumTokenLength) {
-        tokens.add(number, LUXTokenKind::title, static_cast<uint32_t>(names.size()), 1, 0);
-        names.push_back(std::move(title));
-      }
+    for (const Page& page : pages) {
+      forEachBigram(page, [&](uint64_t pair, bool) {
+        if (bigrams.emplace(pair, static_cast<uint32_t>(names.size())).second) {
+          names.push_back(stems[pair >> 32U] + ' ' + stems[pair & 0xFFFFFFFFU]);
+        }
+      });
     }
-    tokens.setNames(LUXTokenKind::title, std::move(names));
+    return names;
   }
 
-  void addPhrases(const LUXPhraseFinder& finder, LUXTokenSections& tokens) const {
+  std::vector<std::string> phraseNames(const LUXPhraseFinder& finder) const {
     const std::vector<uint32_t> displays = displaySurfaces();
     std::vector<std::string> names;
     names.reserve(finder.phrases().size());
@@ -247,12 +230,66 @@ struct LUXIndexWriter::Implementation {
       }
       names.push_back(std::move(display));
     }
-    for (size_t number = 0; number < pages.size(); ++number) {
-      for (const LUXPhraseFinder::Count& count : finder.countsOfPages()[number]) {
-        tokens.add(number, LUXTokenKind::phrase, count.phrase, count.titleCount, count.bodyCount);
+    return names;
+  }
+
+  // By the position of the page; empty where the title is too long for a token or has no words.
+  std::vector<std::string> titleNames() const {
+    std::vector<std::string> names;
+    names.reserve(pages.size());
+    for (const Page& page : pages) {
+      names.push_back(tokenizer->tokenizedStringFromString(page.title));
+      if (names.back().size() > LUXTokenTable::maximumTokenLength) {
+        names.back().clear();
       }
     }
-    tokens.setNames(LUXTokenKind::phrase, std::move(names));
+    return names;
+  }
+
+  LUXTokenSections tokens(const LUXPhraseFinder& finder) {
+    std::vector<std::string> titles = titleNames();
+    // The titles that are tokens, and which of them is each page's.
+    std::vector<std::string> kept;
+    std::vector<uint32_t> titleOfPage(pages.size(), none);
+    for (size_t number = 0; number < pages.size(); ++number) {
+      if (!titles[number].empty()) {
+        titleOfPage[number] = static_cast<uint32_t>(kept.size());
+        kept.push_back(std::move(titles[number]));
+      }
+    }
+    LUXTokenSections sections(
+        {stems.all(), numberBigrams(), forms.all(), phraseNames(finder), std::move(kept)});
+    for (size_t number = 0; number < pages.size(); ++number) {
+      addWords(pages[number], sections);
+      for (const LUXPhraseFinder::Count& count : finder.countsOfPages()[number]) {
+        sections.add(LUXTokenKind::phrase, count.phrase, count.titleCount, count.bodyCount);
+      }
+      if (titleOfPage[number] != none) {
+        sections.add(LUXTokenKind::title, titleOfPage[number], 1, 0);
+      }
+      sections.endPage();
+    }
+    return sections;
+  }
+
+  void addWords(const Page& page, LUXTokenSections& sections) const {
+    const auto add = [&](LUXTokenKind kind, uint32_t token, bool inTitle) {
+      sections.add(kind, token, inTitle ? 1 : 0, inTitle ? 0 : 1);
+    };
+    for (size_t at = 0; at < page.sequence.words.size(); ++at) {
+      const Surface& surface = surfaces[page.sequence.words[at].number];
+      const bool inTitle = at < page.sequence.titleLength;
+      add(LUXTokenKind::form, surface.form, inTitle);
+      if (surface.stem != none) {
+        add(LUXTokenKind::stem, surface.stem, inTitle);
+      }
+    }
+    forEachBigram(page, [&](uint64_t pair, bool inTitle) {
+      add(LUXTokenKind::bigram, bigrams.at(pair), inTitle);
+    });
+    for (const Whole& whole : page.wholes) {
+      add(LUXTokenKind::form, whole.form, whole.inTitle);
+    }
   }
 
   platform::Data attributes(const LUXPhraseFinder& finder) const {
@@ -291,19 +328,14 @@ struct LUXIndexWriter::Implementation {
   platform::Data finish() {
     std::sort(pages.begin(), pages.end(),
               [](const Page& a, const Page& b) { return a.key < b.key; });
-    LUXPhraseFinder finder;
-    finder.find(formSequences(), edgeForms());
-    LUXTokenSections tokens(pages.size());
-    addWords(tokens);
-    addTitles(tokens);
-    addPhrases(finder, tokens);
-    tokens.finish();
+    const LUXPhraseFinder finder = phrases();
+    LUXTokenSections sections = tokens(finder);
     return LUXSectionedData(
                {section(HelpLUXIndex::attributesSectionType, attributes(finder)),
-                section(HelpLUXIndex::countsSectionType, tokens.countRecords().finish()),
+                section(HelpLUXIndex::countsSectionType, sections.countBytes()),
                 section(HelpLUXIndex::keysSectionType, keyRecords().finish()),
                 section(HelpLUXIndex::propertiesSectionType, propertyRecords().finish()),
-                section(HelpLUXIndex::tokensSectionType, tokens.tokenBytes())})
+                section(HelpLUXIndex::tokensSectionType, sections.tokenBytes())})
         .write();
   }
 };

@@ -16,10 +16,11 @@ struct PairHash {
 
 }  // namespace
 
-void LUXPhraseFinder::find(const std::vector<LUXWordSequence>& pages,
+void LUXPhraseFinder::find(const std::vector<const LUXWordSequence*>& pages,
+                           const std::vector<uint32_t>& wordOfNumber,
                            const std::vector<bool>& mayStandAtEdge) {
   _counts.resize(pages.size());
-  _findSingleWords(pages, mayStandAtEdge.size());
+  _findSingleWords(pages, wordOfNumber, mayStandAtEdge.size());
   _keep(pages, mayStandAtEdge);
   for (size_t length = 2; length <= LUXPhraseMaximumLength; ++length) {
     _findLonger(pages);
@@ -30,25 +31,27 @@ void LUXPhraseFinder::find(const std::vector<LUXWordSequence>& pages,
   _levels.clear();
 }
 
-void LUXPhraseFinder::_findSingleWords(const std::vector<LUXWordSequence>& pages,
+void LUXPhraseFinder::_findSingleWords(const Pages& pages,
+                                       const std::vector<uint32_t>& wordOfNumber,
                                        size_t wordCount) {
   Groups groups(wordCount);
   _positions.resize(pages.size());
   for (uint32_t page = 0; page < pages.size(); ++page) {
     std::vector<uint32_t>& positions = _positions[page];
-    positions.reserve(pages[page].words.size());
-    for (const LUXWordSequence::Word& word : pages[page].words) {
-      Group& group = groups[word.number];
-      group.first = word.number;
+    positions.reserve(pages[page]->words.size());
+    for (const LUXWordSequence::Word& place : pages[page]->words) {
+      const uint32_t word = wordOfNumber[place.number];
+      Group& group = groups[word];
+      group.first = word;
       group.pageCount += group.lastPage == page ? 0 : 1;
       group.lastPage = page;
-      positions.push_back(word.number);
+      positions.push_back(word);
     }
   }
   _levels.push_back(std::move(groups));
 }
 
-void LUXPhraseFinder::_findLonger(const std::vector<LUXWordSequence>& pages) {
+void LUXPhraseFinder::_findLonger(const Pages& pages) {
   const Groups& parts = _levels.back();
   const bool partsAreWords = _levels.size() == 1;
   const auto isFrequent = [&](uint32_t part) {
@@ -64,7 +67,7 @@ void LUXPhraseFinder::_findLonger(const std::vector<LUXWordSequence>& pages) {
       const uint32_t second = hasNext ? positions[at + 1] : none;
       positions[at] = none;
       if (!isFrequent(first) || !isFrequent(second) ||
-          (partsAreWords && pages[page].words[at + 1].breaksChain)) {
+          (partsAreWords && pages[page]->words[at + 1].breaksChain)) {
         continue;
       }
       const uint64_t key = static_cast<uint64_t>(first) << 32U | second;
@@ -92,8 +95,7 @@ uint32_t LUXPhraseFinder::_wordOf(size_t level, uint32_t group, size_t i) const 
   return group;
 }
 
-void LUXPhraseFinder::_keep(const std::vector<LUXWordSequence>& pages,
-                            const std::vector<bool>& mayStandAtEdge) {
+void LUXPhraseFinder::_keep(const Pages& pages, const std::vector<bool>& mayStandAtEdge) {
   const size_t level = _levels.size() - 1;
   const uint32_t minimum = level == 0 ? 1 : minimumPageCount;
   for (uint32_t number = 0; number < _levels[level].size(); ++number) {
@@ -122,7 +124,7 @@ void LUXPhraseFinder::_keep(const std::vector<LUXWordSequence>& pages,
       const uint32_t group = _positions[page][at];
       if (group != none && _levels[level][group].phrase != none) {
         all.push_back(_levels[level][group].phrase);
-        if (at < pages[page].titleLength) {
+        if (at < pages[page]->titleLength) {
           inTitle.push_back(all.back());
         }
       }

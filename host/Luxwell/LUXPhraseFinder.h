@@ -44,8 +44,10 @@ class LUXPhraseFinder {
 
   static constexpr uint32_t minimumPageCount = 2;
 
-  /// `mayStandAtEdge` has one entry for each word number.
-  void find(const std::vector<LUXWordSequence>& pages, const std::vector<bool>& mayStandAtEdge);
+  /// The numbers in the pages stand for words by way of `wordOfNumber`: several may be one word.
+  /// `mayStandAtEdge` has one entry for each word. The pages are not used afterwards.
+  void find(const std::vector<const LUXWordSequence*>& pages,
+            const std::vector<uint32_t>& wordOfNumber, const std::vector<bool>& mayStandAtEdge);
 
   const std::vector<LUXPhrase>& phrases() const noexcept { return _phrases; }
 
@@ -66,9 +68,12 @@ class LUXPhraseFinder {
   using Groups = std::vector<Group>;
   using Positions = std::vector<std::vector<uint32_t>>;
 
-  void _findSingleWords(const std::vector<LUXWordSequence>& pages, size_t wordCount);
-  void _findLonger(const std::vector<LUXWordSequence>& pages);
-  void _keep(const std::vector<LUXWordSequence>& pages, const std::vector<bool>& mayStandAtEdge);
+  using Pages = std::vector<const LUXWordSequence*>;
+
+  void _findSingleWords(const Pages& pages, const std::vector<uint32_t>& wordOfNumber,
+                        size_t wordCount);
+  void _findLonger(const Pages& pages);
+  void _keep(const Pages& pages, const std::vector<bool>& mayStandAtEdge);
   void _countLongerPhrases();
   uint32_t _wordOf(size_t level, uint32_t group, size_t i) const;
 

@@ -18,6 +18,9 @@ namespace {
 // words at most, chosen among so many in order.
 constexpr size_t shortestUnfinished = 2;
 constexpr size_t shortestUnknown = 3;
+// In texts of more terms than this, words that are not known are left alone: there are enough
+// others, and each costs as much as a query.
+constexpr size_t mostTermsExpanded = 32;
 constexpr uint32_t fewPages = 2;
 constexpr size_t mostExpansions = 32;
 constexpr uint32_t mostConsidered = 4096;
@@ -117,7 +120,8 @@ class Planner {
         }
       }
     } else if (frequency == 0 && kind == LUXTokenKind::stem &&
-               word.token.size() >= shortestUnknown && _expand(word.token, postings, count) > 0) {
+               _terms.stems.size() <= mostTermsExpanded && word.token.size() >= shortestUnknown &&
+               _expand(word.token, postings, count) > 0) {
       // It may be half a word, or one of another subject: then what it finds says little.
       _allMass += weight;
       return;

@@ -31,7 +31,7 @@ class ZEBAdditions : public testing::Test {
 
 // What the identifiers of two versions of one book look like.
 std::string versioned(const std::string& bookID) {
-  const std::string id = bookID + "*1.2";
+  std::string id = bookID + "*1.2";
   EXPECT_EQ(ZEBHelpBook::unversionedbookIDFromBookID(id), bookID);
   return id;
 }

@@ -148,6 +148,7 @@ TEST(LUXCompletion, ALongTextCompletesNothing) {
 
 TEST(LUXCompletion, JapaneseIsCompletedHoweverItIsDivided) {
   std::vector<QueryPage> pages;
+  pages.reserve(5);
   for (int i = 0; i < 5; ++i) {
     pages.push_back({"p" + std::to_string(i),
                      "\u5370\u5237\u8A2D\u5B9A",
@@ -160,6 +161,7 @@ TEST(LUXCompletion, JapaneseIsCompletedHoweverItIsDivided) {
 
 TEST(LUXCompletion, HebrewIsCompleted) {
   std::vector<QueryPage> pages;
+  pages.reserve(5);
   for (int i = 0; i < 5; ++i) {
     pages.push_back({"p" + std::to_string(i),
                      "\u05D4\u05D3\u05E4\u05E1\u05EA \u05DE\u05E1\u05DE\u05DB\u05D9\u05DD",

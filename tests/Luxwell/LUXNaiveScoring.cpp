@@ -83,6 +83,7 @@ std::set<std::string> NaiveScoring::_expansions(const LUXQueryTerms& terms,
   const bool isUnfinished = stem == terms.unfinishedStem;
   const std::string& prefix = isUnfinished ? terms.unfinishedForm : stem;
   if (prefix.size() < (isUnfinished ? 2U : 3U) || terms.onlyStopWords ||
+      (!isUnfinished && terms.stems.size() > 32) ||
       _frequency({LUXTokenKind::stem, stem}) > (isUnfinished ? 2 : 0)) {
     return words;
   }

@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <cmath>
 #include <map>
+#include <numeric>
 #include <random>
 #include <set>
 
@@ -70,22 +71,29 @@ Phrases countedByForce(const std::vector<LUXWordSequence>& pages,
 }
 
 Phrases found(const std::vector<LUXWordSequence>& pages, const std::vector<bool>& mayStandAtEdge) {
+  std::vector<const LUXWordSequence*> sequences;
+  sequences.reserve(pages.size());
+  for (const LUXWordSequence& page : pages) {
+    sequences.push_back(&page);
+  }
+  std::vector<uint32_t> words(mayStandAtEdge.size());
+  std::iota(words.begin(), words.end(), 0);
   LUXPhraseFinder finder;
-  finder.find(pages, mayStandAtEdge);
+  finder.find(sequences, words, mayStandAtEdge);
   Phrases all;
   std::vector<Words> names;
   for (const LUXPhrase& phrase : finder.phrases()) {
     const LUXPhraseStatistics& statistics = phrase.statistics;
-    const Words words(phrase.words.begin(), phrase.words.begin() + statistics.length);
+    const Words group(phrase.words.begin(), phrase.words.begin() + statistics.length);
     EXPECT_EQ(statistics.totalPageCount, pages.size());
-    EXPECT_EQ(all.count(words), 0U) << "a phrase comes twice";
-    all[words] = {statistics.frequency,
+    EXPECT_EQ(all.count(group), 0U) << "a phrase comes twice";
+    all[group] = {statistics.frequency,
                   statistics.pageCount,
                   statistics.titleCount,
                   statistics.longerPhraseCount,
                   statistics.longerPhraseFrequency,
                   {}};
-    names.push_back(words);
+    names.push_back(group);
   }
   EXPECT_EQ(finder.countsOfPages().size(), pages.size());
   for (size_t page = 0; page < pages.size(); ++page) {
@@ -139,9 +147,19 @@ TEST(LUXPhraseFinder, FindsWhatBruteForceFinds) {
 
 TEST(LUXPhraseFinder, NoPagesGiveNoPhrases) {
   LUXPhraseFinder finder;
-  finder.find({}, {});
+  finder.find({}, {}, {});
   EXPECT_TRUE(finder.phrases().empty());
   EXPECT_TRUE(finder.countsOfPages().empty());
+}
+
+TEST(LUXPhraseFinder, SeveralNumbersMayBeOneWord) {
+  const LUXWordSequence page = sequence({0, 1, 2});
+  const LUXWordSequence other = sequence({3, 4, 2});
+  LUXPhraseFinder finder;
+  finder.find({&page, &other}, {0, 1, 2, 0, 1}, {true, true, true});
+  ASSERT_EQ(finder.phrases().size(), 6U);
+  EXPECT_EQ(finder.phrases()[0].statistics.pageCount, 2U);
+  EXPECT_EQ(finder.phrases()[5].statistics.length, 3U);
 }
 
 TEST(LUXPhraseFinder, GroupsInOnePageAreNoPhrases) {

@@ -42,7 +42,7 @@ const QueryWorld& office() {
 
 // A query whose answer a test looks at.
 struct Asked {
-  explicit Asked(std::string text, const QueryWorld& world = office(), size_t count = 50,
+  explicit Asked(const std::string& text, const QueryWorld& world = office(), size_t count = 50,
                  std::optional<std::string> book = std::nullopt)
       : listener(std::make_shared<Listener>()),
         outside(ZEBQuery::initWithQueryString(text)),
@@ -135,6 +135,7 @@ TEST(LUXQuery, TypesNotKnownCountAsArticles) {
 
 TEST(LUXQuery, SuggestionsHaveATitleAndNoPath) {
   std::vector<QueryPage> pages;
+  pages.reserve(5);
   for (int i = 0; i < 5; ++i) {
     pages.push_back({"p" + std::to_string(i),
                      "Print queue",
@@ -372,6 +373,7 @@ TEST(LUXQuery, ManyQueriesRunSideBySide) {
   ASSERT_FALSE(expected.empty());
   std::atomic<int> different{0};
   std::vector<std::thread> threads;
+  threads.reserve(4);
   for (int thread = 0; thread < 4; ++thread) {
     threads.emplace_back([&] {
       for (int i = 0; i < 20; ++i) {

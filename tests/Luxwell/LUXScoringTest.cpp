@@ -150,6 +150,7 @@ TEST(LUXScoring, WhereFewPagesHaveAWordTheNearestInMeaningFollow) {
       EXPECT_NEAR(static_cast<double>(page.score), expected.at(page.page), 0.004) << text;
     }
     std::vector<double> scores;
+    scores.reserve(expected.size());
     for (const auto& [page, score] : expected) {
       scores.push_back(score);
     }
