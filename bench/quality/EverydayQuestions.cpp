@@ -25,7 +25,7 @@ const std::vector<std::string>& everydayQuestions() {
       "how deep is lake baikal",
       "volcano eruption iceland",
       "swimming lessons for toddlers",
-      "apple pie with cinnamon and raisins",
+      "plum cake with cinnamon and raisins",
       "why is my tomato plant wilting",
       "guitar chords for beginners",
       "how to change a flat tyre",

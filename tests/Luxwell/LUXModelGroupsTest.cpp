@@ -41,8 +41,8 @@ TEST(LUXModelGroups, WithoutAListThereIsTheDefaultGroupAlone) {
 TEST(LUXModelGroups, TheNamesAreThoseOfTheListWithTheDefaultGroupInOrder) {
   const LUXModelGroups list(Dictionary{
       {"DefaultGroup", "Middle"},
-      {"Groups", Dictionary{{"Zoo", group({})}, {"Apple", group({})}, {"Middle", group({})}}}});
-  EXPECT_EQ(list.names(), (Names{"Apple", "Middle", "Zoo"}));
+      {"Groups", Dictionary{{"Zoo", group({})}, {"Ant", group({})}, {"Middle", group({})}}}});
+  EXPECT_EQ(list.names(), (Names{"Ant", "Middle", "Zoo"}));
   EXPECT_EQ(list.defaultGroup(), "Middle");
 }
 
