@@ -101,7 +101,8 @@ std::vector<std::shared_ptr<LUXHit>> LUXQuery::_results() const {
   // Titles may look like searches with operators; but who puts the whole into quotation marks means
   // a phrase, be it a title or not, and who begins with an operator leaves something out.
   const bool isPhrase = _queryString.starts_with('"') && _queryString.ends_with('"');
-  const bool isCommand = _queryString.find_first_of("-+!") == 0;
+  const bool isCommand = _queryString.starts_with('-') || _queryString.starts_with('+') ||
+                         _queryString.starts_with('!');
   const bool isTitle = !isPhrase && !isCommand && !pages.empty() &&
                        pages.front().score >= luxscoring::exactTitleScore;
   if (LUXQueryHasOperators(_queryString) && !isTitle) {
