@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <functional>
 #include <map>
 #include <set>
 #include <unordered_map>
@@ -145,6 +146,18 @@ SuggestionRanks completions(const IndexedBook& book) {
       ++phrases[phrase].pages;
     }
   }
+  // As many as the model has, the most frequent.
+  std::vector<uint64_t> frequencies;
+  for (const auto& [phrase, counted] : phrases) {
+    if (counted.pages >= LUXPhraseMinimumPageCount) {
+      frequencies.push_back(counted.frequency);
+    }
+  }
+  std::sort(frequencies.begin(), frequencies.end(), std::greater<>());
+  const auto view = book.model()->view();
+  const size_t budget = view == nullptr ? 0 : view->phraseCount();
+  const uint64_t leastFrequency =
+      budget == 0 || budget > frequencies.size() ? 0 : frequencies[budget - 1];
   SuggestionRanks ranks;
   for (const Query& query : book.collection().queries) {
     const std::string wanted = foldedText(book, query.text);
@@ -173,7 +186,7 @@ SuggestionRanks completions(const IndexedBook& book) {
               ? 1
               : 0;
     }
-    if (before < suggestionCount) {
+    if (before < suggestionCount && known->second.frequency >= leastFrequency) {
       ranks.other += 1.0 / static_cast<double>(before + 1);
     }
   }

@@ -45,8 +45,8 @@ struct SuggestionRanks {
 };
 
 /// A query is typed up to its fourth letter: at which rank is it among the completions? Only
-/// queries that occur as a phrase in three pages or more. Other: the same phrases in order of their
-/// frequency.
+/// queries that occur as a phrase in three pages or more. Other: as many phrases as the model has,
+/// the most frequent ones, in order of their frequency.
 SuggestionRanks completions(const IndexedBook& book);
 
 /// A query is asked for similar searches: at which rank is the first suggestion that finds the

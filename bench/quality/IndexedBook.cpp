@@ -2,6 +2,7 @@
 
 #include <cstdio>
 #include <stdexcept>
+#include <utility>
 
 #include "bvmake/HelpIndexFile.h"
 #include "bvmake/Report.h"
@@ -35,6 +36,24 @@ std::shared_ptr<const HelpTokenizer> tokenizerOfIndex(const HelpLUXIndex& index)
     throw std::runtime_error("an index has no language");
   }
   return tokenizer;
+}
+
+/// What the plug-in saves a model with: the thresholds that the book gives.
+platform::Value optionsOfIndex(const HelpLUXIndex& index) {
+  platform::Value::Dictionary thresholds;
+  for (const auto& [key, attribute] :
+       {std::pair{"BigramThreshold", HelpLUXIndexAttributeBigramThresholdKey},
+        std::pair{"TrigramThreshold", HelpLUXIndexAttributeTrigramThresholdKey}}) {
+    const platform::Value& value = index.attributes()[attribute];
+    if (!value.isAbsent()) {
+      thresholds.emplace(key, value);
+    }
+  }
+  platform::Value::Dictionary books;
+  books.emplace(bookID, std::move(thresholds));
+  platform::Value::Dictionary options;
+  options.emplace("SuggestionThresholdsPerBook", std::move(books));
+  return options;
 }
 
 class LuxwellEngine : public Engine {
@@ -76,7 +95,7 @@ std::shared_ptr<HelpLUXModel> trainedModel(const HelpLUXIndex& index, const std:
     counts = index.tokenCountsForKey(key);
     model->addTokenCounts(counts, key, std::nullopt, bookID);
   }
-  if (!model->saveWithOptions(platform::Value())) {
+  if (!model->saveWithOptions(optionsOfIndex(index))) {
     throw std::runtime_error("cannot save a model in " + folder);
   }
   return model;
