@@ -12,6 +12,7 @@
 
 #include "bench/pipeline/PluginQuality.h"
 #include "bench/pipeline/PluginSpeed.h"
+#include "bench/pipeline/ProgramSpeed.h"
 #include "bench/quality/HelpCollections.h"
 
 namespace pipeline {
@@ -92,8 +93,28 @@ int run(int argc, char** argv) {
   speed->add_option("--books", speedOptions.bookCount);
   speed->add_option("--queries", speedOptions.queryCount);
 
+  CLI::App* const program = app.add_subcommand("program", "How long the command line takes");
+  std::string root;
+  std::vector<std::string> programs = {ZEB_PROGRAM};
+  size_t rounds = 30;
+  program->add_option("--root", root, "Root that packages with help books were unpacked to")
+      ->required();
+  program->add_option("--rounds", rounds);
+  program->add_option_function<std::vector<std::string>>(
+      "--beside",
+      [&programs](const std::vector<std::string>& others) {
+        programs.insert(programs.end(), others.begin(), others.end());
+      },
+      "Other builds of the program to measure in turns with this one");
+
   CLI11_PARSE(app, argc, argv);
-  if (quality->parsed()) {
+  if (program->parsed()) {
+    const WorkFolder work;
+    const fs::path caches = work.path() / "cache";
+    scanBooks(root, caches);
+    std::printf("%s\n%s", keystrokeTable(caches).c_str(),
+                processTable(programs, caches, rounds).c_str());
+  } else if (quality->parsed()) {
     measureQuality(folders, packages, only, !withoutCollections, !withoutKnownPages);
   } else {
     const WorkFolder work;
