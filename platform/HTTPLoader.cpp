@@ -187,7 +187,7 @@ bool HTTPLoader::_tellOfRedirect(const std::shared_ptr<const URLResponse>& respo
   const std::optional<URL> target =
       relative ? std::optional(relative->absoluteURL()) : std::nullopt;
   URLRequest next = request();
-  if (!target || !next.setURL(*target) || target->host().empty()) {
+  if (!target || !next.setURL(*target)) {
     client().URLProtocolDidFailWithError(*this, URLError(URLErrorBadURL, location));
     return false;
   }

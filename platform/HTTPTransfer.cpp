@@ -33,6 +33,21 @@ bool isThisMachine(const std::string& host) {
   return host == "localhost" || host == "[::1]" || host == "::1" || host.starts_with("127.");
 }
 
+constexpr std::string_view lengthField = "Content-Length";
+
+bool isLengthField(std::string_view name) {
+  constexpr HTTPFieldNameOrder before;
+  return !before(name, lengthField) && !before(lengthField, name);
+}
+
+/// libcurl reads to the end of the connection where the length is too great for it.
+bool isHonest(std::string_view name, std::string_view value) {
+  int64_t length = -1;
+  const char* const end = value.data() + value.size();
+  const auto [rest, failure] = std::from_chars(value.data(), end, length);
+  return !isLengthField(name) || (failure == std::errc() && rest == end && length >= 0);
+}
+
 }  // namespace
 
 HTTPTransfer::HTTPTransfer(URLRequest request, HTTPTransferSettings settings,
@@ -201,11 +216,11 @@ bool HTTPTransfer::Exchange::_takeField(std::string_view line) {
   _lastField = name;
   const auto [field, isNew] = _fields.emplace(name, value);
   if (isNew) {
-    return true;
+    return isHonest(name, value) || _fail(URLErrorBadServerResponse, "it gives no real length");
   }
-  if (_fields.key_comp()(name, "Content-Length") == _fields.key_comp()("Content-Length", name) &&
-      field->second != value) {
-    return _fail(URLErrorBadServerResponse, "it gives two lengths");
+  if (isLengthField(name)) {
+    // A length may be said twice, but not two lengths.
+    return field->second == value || _fail(URLErrorBadServerResponse, "it gives two lengths");
   }
   field->second.append(", ").append(value);
   return true;

@@ -11,7 +11,7 @@
 
 namespace platform {
 
-URLSessionTaskCore::URLSessionTaskCore(const std::shared_ptr<URLSession>& owner, uint64_t number,
+URLSessionTaskCore::URLSessionTaskCore(std::shared_ptr<URLSession> owner, uint64_t number,
                                        URLRequest request, URLSession::CompletionHandler handler)
     : identifier(number),
       original(std::move(request)),
@@ -19,14 +19,14 @@ URLSessionTaskCore::URLSessionTaskCore(const std::shared_ptr<URLSession>& owner,
       delegateQueue(owner->delegateQueue()),
       cookies(owner->_implementation->cookies),
       loads(DispatchQueue::serial("url-load")),
-      weakSession(owner),
       current(original),
+      session(std::move(owner)),
       completionHandler(std::move(handler)),
       hasCompletionHandler(completionHandler != nullptr) {}
 
 void URLSessionTaskCore::start(const std::shared_ptr<URLSessionDataTask>& task) {
   const std::shared_ptr<Clock> clock = Environment::current()->clock;
-  const std::shared_ptr<URLSession> owner = weakSession.lock();
+  std::shared_ptr<URLSession> owner;
   {
     const MutexLock lock(mutex);
     if (state != URLSessionDataTask::State::suspended) {
@@ -34,7 +34,7 @@ void URLSessionTaskCore::start(const std::shared_ptr<URLSessionDataTask>& task) 
     }
     state = URLSessionDataTask::State::running;
     self = task;
-    session = owner;
+    owner = session;
     transferSettings.clock = clock;
     transferSettings.resourceDeadline =
         clock->elapsed() + configuration.timeoutIntervalForResource();
@@ -42,7 +42,7 @@ void URLSessionTaskCore::start(const std::shared_ptr<URLSessionDataTask>& task) 
     transferSettings.authorityFile = configuration.certificateAuthorityFile();
     transferSettings.cookies = cookies;
   }
-  if (owner == nullptr || !owner->_implementation->admit(task)) {
+  if (!owner->_implementation->admit(task)) {
     cancel(task);
     return;
   }
@@ -51,7 +51,6 @@ void URLSessionTaskCore::start(const std::shared_ptr<URLSessionDataTask>& task) 
 }
 
 void URLSessionTaskCore::cancel(const std::shared_ptr<URLSessionDataTask>& task) {
-  const std::shared_ptr<URLSession> owner = weakSession.lock();
   std::shared_ptr<URLProtocol> left;
   {
     const MutexLock lock(mutex);
@@ -59,10 +58,7 @@ void URLSessionTaskCore::cancel(const std::shared_ptr<URLSessionDataTask>& task)
         state == URLSessionDataTask::State::canceling) {
       return;
     }
-    if (state == URLSessionDataTask::State::suspended) {
-      self = task;
-      session = owner;
-    }
+    self = task;
     state = URLSessionDataTask::State::canceling;
     left = std::exchange(protocol, nullptr);
     // Whatever is asked now is not waited for.

@@ -24,7 +24,7 @@ class URLSessionTaskCore : public URLProtocolClient,
   using Step = std::function<void()>;
   class Reply;
 
-  URLSessionTaskCore(const std::shared_ptr<URLSession>& owner, uint64_t number, URLRequest request,
+  URLSessionTaskCore(std::shared_ptr<URLSession> owner, uint64_t number, URLRequest request,
                      URLSession::CompletionHandler handler);
 
   void start(const std::shared_ptr<URLSessionDataTask>& self);
@@ -79,7 +79,6 @@ class URLSessionTaskCore : public URLProtocolClient,
   const std::shared_ptr<DispatchQueue> delegateQueue;
   const std::shared_ptr<CookieJar> cookies;
   const std::shared_ptr<DispatchQueue> loads;
-  const std::weak_ptr<URLSession> weakSession;
 
   /// Held over asking a protocol to hold back or to go on; comes before the other.
   Monitor flow;
@@ -97,8 +96,9 @@ class URLSessionTaskCore : public URLProtocolClient,
   bool waiting GUARDED_BY(mutex) = false;
   uint64_t replyNumber GUARDED_BY(mutex) = 0;
   uint64_t backlog GUARDED_BY(mutex) = 0;
-  /// Both, and with them the session, as long as the task goes on.
+  /// From the start to the completion: who let go of a task that runs has not stopped it.
   std::shared_ptr<URLSessionDataTask> self GUARDED_BY(mutex);
+  /// Up to the completion.
   std::shared_ptr<URLSession> session GUARDED_BY(mutex);
   HTTPTransferSettings transferSettings GUARDED_BY(mutex);
 
