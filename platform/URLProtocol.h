@@ -60,9 +60,9 @@ struct URLProtocolClass {
 /// on. A request that it sends must be marked (setProperty) for its own canInitWithRequest to leave
 /// alone, since every session asks the registered kinds.
 ///
-/// startLoading(), stopLoading(), suspendLoading() and resumeLoading() are called one at a time, on
-/// worker threads. The task keeps the protocol until it has ended or was stopped; the protocol
-/// keeps the client.
+/// startLoading() and stopLoading() are called one at a time, on worker threads. The task keeps the
+/// protocol until it has ended or was stopped; the protocol keeps the client, and holds no lock
+/// while it calls it.
 class URLProtocol : public std::enable_shared_from_this<URLProtocol> {
  public:
   virtual ~URLProtocol();
@@ -80,7 +80,8 @@ class URLProtocol : public std::enable_shared_from_this<URLProtocol> {
   virtual void stopLoading() = 0;
 
   /// The task's delegate lags behind with `backlogLimit` bytes: hold back until resumeLoading().
-  /// A protocol that cannot may ignore it and let its client keep the bytes.
+  /// A protocol that cannot may ignore it and let its client keep the bytes. Both are called one at
+  /// a time, on any thread, also from within calls of the client, and must not call it themselves.
   virtual void suspendLoading() {}
   virtual void resumeLoading() {}
 

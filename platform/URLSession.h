@@ -127,7 +127,7 @@ class URLSession : public std::enable_shared_from_this<URLSession> {
   const std::shared_ptr<DispatchQueue>& delegateQueue() const;
 
  private:
-  friend class URLSessionDataTask;
+  friend class URLSessionTaskCore;
   struct Implementation;
   explicit URLSession(std::unique_ptr<Implementation> implementation);
 

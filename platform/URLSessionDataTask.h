@@ -13,6 +13,7 @@
 namespace platform {
 
 class URLSession;
+class URLSessionTaskCore;
 
 /// A request on its way. Made by URLSession::dataTaskWithRequest; one that was resumed lives until
 /// it has completed, others as long as someone holds them.
@@ -48,10 +49,9 @@ class URLSessionDataTask : public std::enable_shared_from_this<URLSessionDataTas
 
  private:
   friend class URLSession;
-  struct Implementation;
-  explicit URLSessionDataTask(std::shared_ptr<Implementation> implementation);
+  explicit URLSessionDataTask(std::shared_ptr<URLSessionTaskCore> core);
 
-  const std::shared_ptr<Implementation> _implementation;
+  const std::shared_ptr<URLSessionTaskCore> _core;
 };
 
 }  // namespace platform
