@@ -63,12 +63,9 @@ void HTTPTransfer::cancel() {
   TransferThread::shared().cancel(shared_from_this());
 }
 
-void HTTPTransfer::suspend() { _suspended = true; }
+void HTTPTransfer::suspend() { ++_holds; }
 
-void HTTPTransfer::resume() {
-  _suspended = false;
-  TransferThread::shared().resume(shared_from_this());
-}
+void HTTPTransfer::resume() { TransferThread::shared().resume(shared_from_this()); }
 
 HTTPTransfer::Exchange::Exchange(HTTPTransfer& owner) : transfer(owner), handle(curl_easy_init()) {
   _renewDeadline();
@@ -151,14 +148,15 @@ void HTTPTransfer::Exchange::_renewDeadline() {
 }
 
 std::optional<Clock::Instant> HTTPTransfer::Exchange::deadline() const {
-  return _heldBack ? std::nullopt
-                   : std::optional(std::min(_idleDeadline, transfer._settings.resourceDeadline));
+  if (transfer._holds > 0) {
+    return std::nullopt;
+  }
+  return std::min(_idleDeadline, transfer._settings.resourceDeadline);
 }
 
 void HTTPTransfer::Exchange::goOn() {
-  if (_heldBack) {
-    _heldBack = false;
-    _renewDeadline();
+  _renewDeadline();
+  if (std::exchange(_heldBack, false)) {
     curl_easy_pause(handle, CURLPAUSE_CONT);
   }
 }
@@ -271,7 +269,7 @@ size_t HTTPTransfer::Exchange::_takeBody(std::string_view bytes) {
     return CURL_WRITEFUNC_ERROR;
   }
   _deliverResponse();
-  if (transfer._suspended) {
+  if (transfer._holds > 0) {
     _heldBack = true;
     return CURL_WRITEFUNC_PAUSE;
   }

@@ -65,7 +65,8 @@ class HTTPTransfer : public std::enable_shared_from_this<HTTPTransfer> {
   /// The client hears nothing more, but for a call that is under way. Before start(), nothing will
   /// come of that.
   void cancel();
-  /// No data is delivered from the next piece on, until resume(); the connection waits.
+  /// No data is delivered from the next piece on, until resume() was called as often; the
+  /// connection waits.
   void suspend();
   void resume();
 
@@ -76,7 +77,8 @@ class HTTPTransfer : public std::enable_shared_from_this<HTTPTransfer> {
   const URLRequest _request;
   const HTTPTransferSettings _settings;
   std::atomic<bool> _cancelled{false};
-  std::atomic<bool> _suspended{false};
+  /// Taken back on the transfer thread alone, where the time-out begins anew with that.
+  std::atomic<int> _holds{0};
   // Confined to the transfer thread.
   std::shared_ptr<HTTPTransferClient> _client;
   std::unique_ptr<Exchange> _exchange;

@@ -61,7 +61,7 @@ void TransferThread::cancel(std::shared_ptr<HTTPTransfer> transfer) {
 
 void TransferThread::resume(std::shared_ptr<HTTPTransfer> transfer) {
   _perform([transfer = std::move(transfer)] {
-    if (transfer->_exchange != nullptr) {
+    if (--transfer->_holds == 0 && transfer->_exchange != nullptr) {
       transfer->_exchange->goOn();
     }
   });

@@ -184,9 +184,12 @@ void URLCacheFolder::store(const URLCacheRecord& record) {
       manager->writeAtomically(_pathOfName(name), file)) {
     return;
   }
-  const MutexLock lock(_mutex);
-  _entries[name] = {file.length(), ++_useCount};
-  _usage += file.length();
+  {
+    const MutexLock lock(_mutex);
+    _entries[name] = {file.length(), 0};
+    _usage += file.length();
+  }
+  _noteUseOfName(name);
 }
 
 void URLCacheFolder::remove(const std::string& key) {

@@ -41,7 +41,7 @@ class URLSessionDataTask : public std::enable_shared_from_this<URLSessionDataTas
   std::shared_ptr<const URLResponse> response() const;
   /// Absent until the task has failed.
   std::optional<Error> error() const;
-  /// Bytes of the body that came so far.
+  /// Bytes of the body that came so far, those that wait for the delegate among them.
   uint64_t countOfBytesReceived() const;
 
   /// Number and URL; what the log shows for "%@".

@@ -166,6 +166,8 @@ void URLSessionTaskCore::addStep(const URLProtocol& teller, uint64_t length, Ste
   }
   if (length > 0) {
     adjustFlow();
+    const MutexLock lock(mutex);
+    received += length;
   }
 }
 

@@ -92,6 +92,7 @@ void URLSessionTaskCore::follow(const URLRequest& request) {
     // What the protocol has told of the redirect's own body.
     steps.clear();
     backlog = 0;
+    received = 0;
     current = request;
   }
   stopProtocol(std::move(left));
@@ -153,14 +154,12 @@ void URLSessionTaskCore::takeData(const Data& data) {
     complete(URLError(URLErrorUnknown, "a body without a head"));
     return;
   }
-  uint64_t length = 0;
   {
     const MutexLock lock(mutex);
     backlog -= std::min<uint64_t>(backlog, data.length());
-    received += data.length();
-    length = received;
   }
-  if (length > configuration.maximumBodyLength()) {
+  delivered += data.length();
+  if (delivered > configuration.maximumBodyLength()) {
     complete(URLError(URLErrorDataLengthExceedsMaximum));
     return;
   }

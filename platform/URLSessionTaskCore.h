@@ -107,6 +107,7 @@ class URLSessionTaskCore : public URLProtocolClient,
   const bool hasCompletionHandler;
   int redirects = 0;
   bool hasResponse = false;
+  uint64_t delivered = 0;
   std::string body;
   std::shared_ptr<URLCache> cache;
   std::shared_ptr<const CachedURLResponse> toBeCached;

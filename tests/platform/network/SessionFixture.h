@@ -180,15 +180,20 @@ class RecordingDelegate : public platform::URLSessionDelegate {
 class SessionTest : public ::testing::Test {
  protected:
   SessionTest() : _override(_environment(nullptr)) {}
-  explicit SessionTest(std::shared_ptr<platform::Clock> clock)
-      : _override(_environment(std::move(clock))) {}
+  explicit SessionTest(std::shared_ptr<platform::Clock> clock,
+                       std::shared_ptr<platform::FileManager> files = nullptr)
+      : _override(_environment(std::move(clock), std::move(files))) {}
 
-  platform::Environment _environment(std::shared_ptr<platform::Clock> clock) {
+  platform::Environment _environment(std::shared_ptr<platform::Clock> clock,
+                                     std::shared_ptr<platform::FileManager> files = nullptr) {
     platform::Environment environment = platform::Environment::system();
     environment.cachesDirectory = folder.path("caches");
     environment.log = log;
     if (clock != nullptr) {
       environment.clock = std::move(clock);
+    }
+    if (files != nullptr) {
+      environment.files = std::move(files);
     }
     return environment;
   }
