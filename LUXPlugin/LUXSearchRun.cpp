@@ -98,7 +98,7 @@ LUXSearchRun::Results LUXSearchRun::run(const std::vector<std::string>& ignoring
     }
   }
   _startQueries(groups, passingBackSearchedHelpbookIDs != nullptr);
-  if (_startedCount > 0 && !_query->isCancelled()) {
+  if (!_startedQueries.empty() && !_query->isCancelled()) {
     _waitForAnswers();
   }
   Results merged;
@@ -215,7 +215,7 @@ void LUXSearchRun::_startQuery(const std::string& group,
   }
   luxQuery->setQueryType(queryType);
   if (!_query->isCancelled()) {
-    ++_startedCount;
+    _startedQueries.push_back(luxQuery);
     platform::startNamedThread("query-run", [luxQuery] { luxQuery->run(); });
   }
   if (_scopeBook && queryType == LUXQueryTypeArticles) {
@@ -227,7 +227,7 @@ void LUXSearchRun::_waitForAnswers() const {
   const platform::Clock::Instant start = elapsedNow();
   while (true) {
     sleepForPoll();
-    if (_controller->_answerCount() >= _startedCount || _query->isCancelled() ||
+    if (_controller->_answerCount() >= _startedQueries.size() || _query->isCancelled() ||
         elapsedNow() - start >=
             platform::Seconds(static_cast<double>(_controller->_searchSeconds()))) {
       return;
@@ -236,6 +236,12 @@ void LUXSearchRun::_waitForAnswers() const {
 }
 
 void LUXSearchRun::_finish() {
+  if (_query->isCancelled()) {
+    // They have a copy of the host's query, which hears nothing of that.
+    for (const auto& query : _startedQueries) {
+      query->cancel();
+    }
+  }
   for (const std::string& group : _usedGroups) {
     _controller->finishedActivity(kLUXModelActivityQuerying, group, _language);
   }

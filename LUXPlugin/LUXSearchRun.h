@@ -13,8 +13,8 @@
 
 /// Finds the groups and the language of a query, gets hold of their models, starts a query in each
 /// on a thread of its own, waits for the answers and merges them. At the end, models are handed
-/// back and builds that were started and have not finished are cancelled. Thread-safety: confined
-/// to one thread.
+/// back, builds that were started and have not finished are cancelled, and so are the groups'
+/// queries when the host has cancelled its own. Thread-safety: confined to one thread.
 class LUXSearchRun {
  public:
   using Results = LUXSearchController::Results;
@@ -52,5 +52,5 @@ class LUXSearchRun {
   std::vector<std::string> _usedGroups;
   std::map<std::string, std::vector<std::string>> _bookIDsOfGroups;
   std::vector<std::shared_ptr<LUXModelBuildOperation>> _builds;
-  size_t _startedCount = 0;
+  std::vector<std::shared_ptr<LUXQuery>> _startedQueries;
 };

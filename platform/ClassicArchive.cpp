@@ -16,10 +16,6 @@ namespace {
   throw Exception(invalidArgumentException, std::string("classic archive: ") + reason);
 }
 
-[[noreturn]] void failArchive(const char* reason) {
-  throw Exception(inconsistentArchiveException, std::string("classic archive: ") + reason);
-}
-
 bool isDictionary(const ClassicArchive::Node& node) {
   return node.nodeClass == Class::dictionary || node.nodeClass == Class::mutableDictionary;
 }
@@ -27,17 +23,6 @@ bool isDictionary(const ClassicArchive::Node& node) {
 bool isContainer(const ClassicArchive::Node& node) {
   return isDictionary(node) || node.nodeClass == Class::array ||
          node.nodeClass == Class::mutableArray;
-}
-
-Value valueOfScalar(char code, const Scalar& scalar) {
-  if (const auto* real = std::get_if<double>(&scalar)) {
-    return *real;
-  }
-  const int64_t integer = std::get<int64_t>(scalar);
-  if ((code == 'c' || code == 'B') && (integer == 0 || integer == 1)) {
-    return integer == 1;
-  }
-  return code == 'Q' ? Value(static_cast<uint64_t>(integer)) : Value(integer);
 }
 
 /// Builds values from the leaves up, so that each node of the graph becomes one value.
@@ -64,7 +49,7 @@ class ValueBuilder {
         return Value::Dictionary();
       case Class::string:
         if (!isValidUTF8(node.bytes.view())) {
-          failArchive("string that is not UTF-8");
+          failArchive(notUTF8);
         }
         return node.bytes.view();
       case Class::data:
@@ -85,7 +70,7 @@ class ValueBuilder {
 
   const Value& _child(NodeIndex index) const {
     if (index == ClassicArchive::nil) {
-      failArchive("nil in a container");
+      failArchive(nilInContainer);
     }
     return _values[index];
   }
@@ -104,7 +89,7 @@ class ValueBuilder {
     for (size_t i = 0; i < node.children.size(); i += 2) {
       const std::string* key = _child(node.children[i]).stringIf();
       if (key == nullptr) {
-        failArchive("dictionary key that is not a string");
+        failArchive(keyIsNoString);
       }
       _payForKey(key->size());
       dictionary.insert_or_assign(*key, _child(node.children[i + 1]));
@@ -117,11 +102,7 @@ class ValueBuilder {
     if (type.scalarCount() != scalars.values.size()) {
       failArgument("number that does not fit its type code");
     }
-    Value::Array values;
-    values.reserve(scalars.values.size());
-    type.forEachScalar(
-        [&](char code) { values.push_back(valueOfScalar(code, scalars.values[values.size()])); });
-    return values.size() == 1 ? values.front() : Value(std::move(values));
+    return valueOfScalars(type, scalars.values);
   }
 
   const ScalarType& _type(const std::string& code) {
@@ -137,13 +118,10 @@ class ValueBuilder {
     return _types.emplace(code, std::move(*type)).first->second;
   }
 
-  /// Dictionaries copy their keys, so references to one long string would multiply it. What all
-  /// strings of the archive have together, and a little for each use, is as much as is copied.
   void _payForKey(size_t length) {
-    constexpr size_t freeBytes = 256;
-    const size_t price = length > freeBytes ? length - freeBytes : 0;
+    const size_t price = priceOfKey(length);
     if (price > _keyBytesLeft) {
-      failArchive("dictionary keys that multiply a long string");
+      failArchive(multipliesKeys);
     }
     _keyBytesLeft -= price;
   }
@@ -351,7 +329,7 @@ Value ClassicUnarchiver::decodeRootObject() {
       allowed |= named ? classSetOf(*named) : 0;
     }
   }
-  return value(decodeAllowing(_data, allowed));
+  return decodeValueAllowing(_data, allowed);
 }
 
 Data classicArchiveWithRootObject(const Value& value) {

@@ -251,4 +251,31 @@ std::optional<ScalarType> ScalarType::parse(std::string_view text, std::string& 
   return ScalarTypeParser(text).parse(problem);
 }
 
+void failArchive(const char* reason) {
+  throw Exception(inconsistentArchiveException, std::string("classic archive: ") + reason);
+}
+
+namespace {
+
+Value valueOfScalar(char code, const Scalar& scalar) {
+  if (const auto* real = std::get_if<double>(&scalar)) {
+    return *real;
+  }
+  const int64_t integer = std::get<int64_t>(scalar);
+  if ((code == 'c' || code == 'B') && (integer == 0 || integer == 1)) {
+    return integer == 1;
+  }
+  return code == 'Q' ? Value(static_cast<uint64_t>(integer)) : Value(integer);
+}
+
+}  // namespace
+
+Value valueOfScalars(const ScalarType& type, const std::vector<Scalar>& scalars) {
+  Value::Array values;
+  values.reserve(scalars.size());
+  type.forEachScalar(
+      [&](char code) { values.push_back(valueOfScalar(code, scalars[values.size()])); });
+  return values.size() == 1 ? values.front() : Value(std::move(values));
+}
+
 }  // namespace platform::classicarchive

@@ -59,8 +59,9 @@ inline constexpr ClassSet classSetOf(Class archivedClass) {
   return 1U << static_cast<uint32_t>(archivedClass);
 }
 
-/// classicarchive::decode() in which an object of a class outside `allowed` is an error as well.
-ClassicArchive decodeAllowing(const Data& data, ClassSet allowed);
+/// The same as value(decode(data)), exceptions too, but that an object of a class outside `allowed`
+/// is an error as well.
+Value decodeValueAllowing(const Data& data, ClassSet allowed);
 
 /// The nodes that `roots` lead to, each once and after all its children. Throws Exception
 /// "InvalidArgumentException" for positions out of range, cycles, and dictionaries with a key that
@@ -156,5 +157,27 @@ void ScalarType::forEachScalar(Visit visit) const {
     }
   }
 }
+
+// What the two ways to a value have in common.
+
+/// Why a graph is no value.
+inline constexpr const char* notUTF8 = "string that is not UTF-8";
+inline constexpr const char* nilInContainer = "nil in a container";
+inline constexpr const char* keyIsNoString = "dictionary key that is not a string";
+inline constexpr const char* multipliesKeys = "dictionary keys that multiply a long string";
+
+/// Throws Exception "InconsistentArchiveException".
+[[noreturn]] void failArchive(const char* reason);
+
+/// Dictionaries copy their keys, so references to one long string would multiply it. A key costs
+/// what it has more than a little; all keys together may cost as much as all strings and data of
+/// the archive have.
+inline constexpr size_t priceOfKey(size_t length) {
+  constexpr size_t freeBytes = 256;
+  return length > freeBytes ? length - freeBytes : 0;
+}
+
+/// One value, or an array of several; there are as many scalars as the type says.
+Value valueOfScalars(const ScalarType& type, const std::vector<Scalar>& scalars);
 
 }  // namespace platform::classicarchive

@@ -278,6 +278,21 @@ std::optional<std::chrono::system_clock::time_point> FileManager::modificationDa
                                                std::chrono::nanoseconds(status.st_mtim.tv_nsec));
 }
 
+std::optional<Error> FileManager::setModificationDate(
+    const std::string& path, std::chrono::system_clock::time_point date) const {
+  const auto sinceEpoch = date.time_since_epoch();
+  const auto seconds = std::chrono::floor<std::chrono::seconds>(sinceEpoch);
+  const auto rest = std::chrono::duration_cast<std::chrono::nanoseconds>(sinceEpoch - seconds);
+  const timespec times[2] = {{0, UTIME_OMIT}, {seconds.count(), rest.count()}};
+  if (nameless(path)) {
+    return posixError(ENOENT, path);
+  }
+  if (::utimensat(AT_FDCWD, path.c_str(), times, 0) != 0) {
+    return posixError(errno, path);
+  }
+  return std::nullopt;
+}
+
 std::optional<std::vector<std::string>> FileManager::namesInDirectory(
     const std::string& path) const {
   if (nameless(path)) {

@@ -56,6 +56,10 @@ class FileManager {
   virtual std::optional<std::chrono::system_clock::time_point> modificationDate(
       const std::string& path) const;
 
+  /// Sets that date.
+  virtual std::optional<Error> setModificationDate(
+      const std::string& path, std::chrono::system_clock::time_point date) const;
+
   /// The names in a folder, sorted by bytes, without "." and "..". Absent when it cannot be read.
   virtual std::optional<std::vector<std::string>> namesInDirectory(const std::string& path) const;
 };

@@ -1,5 +1,6 @@
 #include "bench/quality/Collection.h"
 
+#include <algorithm>
 #include <charconv>
 #include <cstdint>
 #include <cstdio>
@@ -126,6 +127,31 @@ Collection readCollection(const std::filesystem::path& folder) {
     }
   });
   return collection;
+}
+
+std::vector<Collection> collectionsInFolders(const std::vector<std::string>& folders) {
+  namespace fs = std::filesystem;
+  std::vector<Collection> collections;
+  for (const std::string& folder : folders) {
+    if (fs::exists(fs::path(folder) / "docs.tsv")) {
+      collections.push_back(readCollection(folder));
+      continue;
+    }
+    std::vector<fs::path> inside;
+    for (const fs::directory_entry& entry : fs::directory_iterator(folder)) {
+      if (fs::exists(entry.path() / "docs.tsv")) {
+        inside.push_back(entry.path());
+      }
+    }
+    if (inside.empty()) {
+      throw std::runtime_error("no collections in " + folder);
+    }
+    std::sort(inside.begin(), inside.end());
+    for (const fs::path& path : inside) {
+      collections.push_back(readCollection(path));
+    }
+  }
+  return collections;
 }
 
 void writeCollection(const Collection& collection, const std::filesystem::path& folder) {

@@ -42,6 +42,10 @@ struct Collection {
 /// queries without an answer. Throws std::runtime_error when a file cannot be read.
 Collection readCollection(const std::filesystem::path& folder);
 
+/// The collections of several folders, each of which is one or holds some. Throws
+/// std::runtime_error when a folder holds none, or one that cannot be read.
+std::vector<Collection> collectionsInFolders(const std::vector<std::string>& folders);
+
 /// Writes the folder that readCollection() reads. Blocks become one text.
 void writeCollection(const Collection& collection, const std::filesystem::path& folder);
 

@@ -25,28 +25,6 @@ namespace fs = std::filesystem;
 
 constexpr size_t rankingDepth = 1000;
 
-std::vector<fs::path> collectionFolders(const std::vector<std::string>& folders) {
-  std::vector<fs::path> found;
-  for (const std::string& folder : folders) {
-    if (fs::exists(fs::path(folder) / "docs.tsv")) {
-      found.emplace_back(folder);
-      continue;
-    }
-    std::vector<fs::path> inside;
-    for (const fs::directory_entry& entry : fs::directory_iterator(folder)) {
-      if (fs::exists(entry.path() / "docs.tsv")) {
-        inside.push_back(entry.path());
-      }
-    }
-    if (inside.empty()) {
-      throw std::runtime_error("no collections in " + folder);
-    }
-    std::sort(inside.begin(), inside.end());
-    found.insert(found.end(), inside.begin(), inside.end());
-  }
-  return found;
-}
-
 Measured measuredEngine(Engine& engine, const Collection& collection) {
   std::vector<Ranking> rankings;
   for (const Query& query : collection.queries) {
@@ -118,10 +96,7 @@ int run(int argc, char** argv) {
   app.add_flag("--rankings-only", rankingsOnly, "Leave out what is no ranking");
   CLI11_PARSE(app, argc, argv);
 
-  std::vector<Collection> collections;
-  for (const fs::path& folder : collectionFolders(folders)) {
-    collections.push_back(readCollection(folder));
-  }
+  std::vector<Collection> collections = collectionsInFolders(folders);
   for (const std::string& root : packages) {
     for (Collection& collection : helpCollections(root)) {
       if (!save.empty()) {

@@ -2,6 +2,7 @@
 // so must its value.
 #include <cstdint>
 #include <cstdlib>
+#include <string>
 
 #include "platform/ClassicArchive.h"
 
@@ -38,6 +39,22 @@ void checkValue(const ClassicArchive& archive, size_t root) {
   require(platform::ClassicUnarchiver(bytes).decodeRootObject() == value);
 }
 
+/// The unarchiver makes no graph, and comes to the same value or fails alike.
+void checkUnarchiver(const Data& data, const ClassicArchive& archive) {
+  Value expected;
+  std::string failure;
+  try {
+    expected = platform::classicarchive::value(archive);
+  } catch (const Exception& exception) {
+    failure = exception.reason();
+  }
+  try {
+    require(platform::ClassicUnarchiver(data).decodeRootObject() == expected && failure.empty());
+  } catch (const Exception& exception) {
+    require(exception.reason() == failure);
+  }
+}
+
 void check(const Data& data) {
   ClassicArchive archive;
   try {
@@ -46,6 +63,7 @@ void check(const Data& data) {
     require(exception.offset() <= data.length());
     return;
   }
+  checkUnarchiver(data, archive);
   const Data bytes = platform::classicarchive::encode(archive);
   const ClassicArchive again = platform::classicarchive::decode(bytes);
   require(again.nodes.size() == archive.nodes.size() && again.roots == archive.roots);

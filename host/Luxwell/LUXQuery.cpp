@@ -97,7 +97,7 @@ std::vector<std::shared_ptr<LUXHit>> LUXQuery::_results() const {
     return LUXHit::hitsForPhrases(
         *view, LUXSimilarPhrases(*view, terms, _requestedCount, scope, book, isCancelled));
   }
-  const auto pages = LUXScoring(*view).bestPages(terms, _requestedCount, scope, isCancelled);
+  auto pages = LUXScoring(*view).bestPages(terms, _requestedCount, scope, isCancelled);
   // Titles may look like searches with operators; but who puts the whole into quotation marks means
   // a phrase, be it a title or not, and who begins with an operator leaves something out.
   const bool isPhrase = _queryString.starts_with('"') && _queryString.ends_with('"');
@@ -108,5 +108,6 @@ std::vector<std::shared_ptr<LUXHit>> LUXQuery::_results() const {
   if (LUXQueryHasOperators(_queryString) && !isTitle) {
     return {};
   }
+  LUXLiftAboveCutoff(pages);
   return LUXHit::hitsForPages(*view, pages);
 }

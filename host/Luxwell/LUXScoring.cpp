@@ -383,3 +383,21 @@ std::vector<LUXScoredPage> LUXScoring::bestPages(const LUXQueryTerms& terms, siz
   std::erase_if(found, [](const LUXScoredPage& page) { return !(page.score > 0); });
   return withTitlesFirst(plan.titlePages, pages, count, std::move(found));
 }
+
+void LUXLiftAboveCutoff(std::span<LUXScoredPage> pages) {
+  using namespace luxscoring;
+  if (pages.empty() || !(pages.front().score > cutoff)) {
+    return;
+  }
+  const float best = pages.front().score;
+  const float least = best * shareAboveCutoff;
+  if (least > cutoff) {
+    return;
+  }
+  for (LUXScoredPage& page : pages.subspan(1)) {
+    const float lifted = page.score < least
+                             ? page.score * (cutoff / least)
+                             : cutoff + (page.score - least) * ((best - cutoff) / (best - least));
+    page.score = std::min(lifted, best);
+  }
+}

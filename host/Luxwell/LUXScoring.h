@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <functional>
 #include <limits>
+#include <span>
 #include <vector>
 
 #include "host/Luxwell/LUXQueryTerms.h"
@@ -46,6 +47,9 @@ inline constexpr float highestScore = 0.989F;
 inline constexpr size_t longQueryTerms = 6;
 inline constexpr float longQueryCutoff = 0.12F;
 inline constexpr float cutoff = 0.20F;
+/// Where the best page is above the cut-off, so is every page that has more than this share of its
+/// score: the cut-off tells whether a query has an answer at all, not how long the answer is.
+inline constexpr float shareAboveCutoff = 0.5F;
 
 }  // namespace luxscoring
 
@@ -86,3 +90,8 @@ class LUXScoring {
  private:
   const LUXModelView& _view;
 };
+
+/// Moves luxscoring::shareAboveCutoff of the best score to the cut-off, and all scores but the best
+/// in proportion, where the best is above the cut-off and that share of it is not. `pages` is in
+/// order of scores, and stays so.
+void LUXLiftAboveCutoff(std::span<LUXScoredPage> pages);

@@ -32,7 +32,19 @@ class NoProcesses : public platform::ProcessTable {
   }
 };
 
+/// After that a thread that is not blocked is taken to wait all the same.
+constexpr std::chrono::seconds patience{2};
+
 }  // namespace
+
+LUXClock::LUXClock(std::chrono::system_clock::time_point start) : SimulatedClock(start) {
+  onSleep = [this](size_t) { letOthersWork(); };
+}
+
+void LUXClock::letOthersWork() {
+  const std::lock_guard lock(_otherThreadsMutex);
+  _otherThreads.waitUntilBlocked(patience);
+}
 
 void LUXClock::sleep(platform::Seconds duration) {
   size_t count = 0;
@@ -75,8 +87,6 @@ LUXWorld::LUXWorld()
       files(std::make_shared<platform::FailingFileManager>()),
       owner(std::make_shared<RecordingOwner>()),
       _environment(platform::Environment::system()) {
-  // A hundredth of the time, but for pauses so long that nobody waits for a thread meanwhile.
-  clock->onSleep = [](size_t) { std::this_thread::sleep_for(std::chrono::milliseconds(1)); };
   _environment.clock = clock;
   _environment.log = log;
   _environment.files = files;

@@ -29,6 +29,7 @@
 #include "platform/WorkerThreads.h"
 #include "plugin/records/ZEBHelpindexIndex.h"
 #include "plugin/shelf/ZEBIndexshelf.h"
+#include "tests/platform/OtherThreads.h"
 #include "tests/platform/TemporaryFolder.h"
 #include "tests/plugin/HelpIndexWorld.h"
 #include "tests/plugin/Hook.h"
@@ -56,7 +57,9 @@ struct LUXPage {
   bool excludedFromSearch = false;
 };
 
-/// Simulated time that follows whoever sleeps, so that nobody waits longer than `onSleep` takes.
+/// Simulated time that follows whoever sleeps, so that nobody waits longer than `onSleep` takes. At
+/// first that is until all other threads are blocked: so nothing runs into a time-out because the
+/// machine is slow.
 class LUXClock : public platform::SimulatedClock {
  public:
   struct Sleep {
@@ -65,7 +68,7 @@ class LUXClock : public platform::SimulatedClock {
     friend bool operator==(const Sleep&, const Sleep&) = default;
   };
 
-  using SimulatedClock::SimulatedClock;
+  explicit LUXClock(std::chrono::system_clock::time_point start);
 
   void sleep(platform::Seconds duration) override;
 
@@ -74,13 +77,19 @@ class LUXClock : public platform::SimulatedClock {
   std::vector<double> sleepsOf(const std::string& thread) const;
   void forgetSleeps();
 
+  /// Waits, in real time, until all other threads of the process are blocked.
+  void letOthersWork();
+
   /// Called by every sleeper, with the number of its thread's sleeps, this one among them; the time
-  /// moves on when it returns. The first one gives other threads a moment.
+  /// moves on when it returns. Calls letOthersWork() until a test puts something else here.
   Hook<void(size_t count)> onSleep;
 
  private:
   mutable std::mutex _mutex;
   std::vector<Sleep> _sleeps;
+  // Held while one looks whether the others are blocked; those who want to look too are, then.
+  std::mutex _otherThreadsMutex;
+  OtherThreads _otherThreads;
 };
 
 /// The controller as it is, but that a test may catch answers and starts of the preload.

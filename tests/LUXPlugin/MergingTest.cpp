@@ -5,9 +5,10 @@
 
 #include <algorithm>
 #include <array>
-#include <atomic>
 #include <cctype>
 #include <cmath>
+#include <condition_variable>
+#include <mutex>
 #include <random>
 #include <sstream>
 
@@ -112,7 +113,9 @@ class Merging : public testing::Test {
     world.controller->onAnswer = [this](const auto& query, const auto&) { answer(query); };
     // Time goes on when everybody who was asked has answered.
     world.clock->onSleep = [this](size_t) {
-      LUXWorld::waitUntil([&] { return answers == expectedAnswers; });
+      std::unique_lock lock(answersMutex);
+      EXPECT_TRUE(answersChanged.wait_for(lock, std::chrono::minutes(1),
+                                          [&] { return answers == expectedAnswers; }));
     };
   }
   ~Merging() override {
@@ -154,7 +157,9 @@ class Merging : public testing::Test {
       }
       world.controller->answer(query, hits);
     }
+    const std::lock_guard lock(answersMutex);
     ++answers;
+    answersChanged.notify_all();
   }
 
   static bool isPhrases(const Case& one) {
@@ -403,8 +408,11 @@ class Merging : public testing::Test {
     }
     world.controller->useShorterTimeouts(true);
     current = one;
-    answers = 0;
-    expectedAnswers = groupsOf(one).size();
+    {
+      const std::lock_guard lock(answersMutex);
+      answers = 0;
+      expectedAnswers = groupsOf(one).size();
+    }
     world.log->clear();
     world.clock->forgetSleeps();
     world.owner->forgetMessages();
@@ -425,8 +433,11 @@ class Merging : public testing::Test {
       ZEBHelpindexSearchController::init();
   std::mt19937_64 random{20240917};
   Case current;
-  std::atomic<size_t> answers{0};
-  std::atomic<size_t> expectedAnswers{0};
+  // The threads of the queries count.
+  std::mutex answersMutex;
+  std::condition_variable answersChanged;
+  size_t answers = 0;
+  size_t expectedAnswers = 0;
 };
 
 TEST_F(Merging, ofGroupsIsWhatASlowModelSays) {

@@ -3,7 +3,6 @@
 #include <gtest/gtest.h>
 
 #include <filesystem>
-#include <thread>
 
 #include "platform/OperationQueue.h"
 #include "platform/RunLoop.h"
@@ -39,6 +38,7 @@ class PluginWithModels : public testing::Test {
   /// Lets the models catch up with the books.
   void catchUp() const {
     EXPECT_TRUE(LUXWorld::waitUntil([&] {
+      world.clock->letOthersWork();
       world.clock->advance(platform::Seconds(0.5));
       platform::RunLoop::main()->runPending();
       return models->_pendingIndexEvents().empty() &&
@@ -134,7 +134,7 @@ TEST_F(PluginWithModels, servesKeywordsAtOnceWhereModelsWereDeleted) {
   world.clock->onSleep = nullptr;  // Nobody waits in earnest for the models.
   EXPECT_THAT(titlesOf(search("soup", ZEBHelpArticleResult)), Contains("Cooking tomato soup"));
   catchUp();
-  world.clock->onSleep = [](size_t) { std::this_thread::sleep_for(std::chrono::milliseconds(1)); };
+  world.clock->onSleep = [&](size_t) { world.clock->letOthersWork(); };
   EXPECT_TRUE(LUXWorld::waitUntil([&] {
     search("soup", ZEBHelpArticleResult);
     return HelpLUXModel::modelExistsForGroupName("Apps", "English");

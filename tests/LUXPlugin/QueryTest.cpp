@@ -502,6 +502,46 @@ TEST_F(Query, cancelledWhileItWaitsForAnswersGivesItsModelsBack) {
   expectNothingLeft();
 }
 
+TEST_F(Query, cancelledWhileItWaitsForAnswersCancelsTheQueriesOfTheGroups) {
+  buildBoth();
+  std::mutex mutex;
+  std::vector<std::shared_ptr<LUXQuery>> asked;
+  world.controller->onAnswer = [&](const auto& query, const auto&) {
+    const std::lock_guard lock(mutex);
+    asked.push_back(query);
+  };
+  const auto query = LUXWorld::query("printer");
+  world.clock->onSleep = [&](size_t count) {
+    world.clock->letOthersWork();
+    if (count == 5) {
+      query->cancel();
+    }
+  };
+  world.search(query);
+  EXPECT_THAT(world.clock->sleepsOf(""), AllOf(SizeIs(5), Each(0.01)));
+  ASSERT_THAT(asked, SizeIs(2));
+  for (const auto& each : asked) {
+    EXPECT_NE(each->outsideQuery(), query);
+    EXPECT_TRUE(each->isCancelled());
+  }
+}
+
+TEST_F(Query, thatTimesOutLeavesTheQueriesOfTheGroupsRunning) {
+  buildBoth();
+  world.controller->useShorterTimeouts(true);
+  std::mutex mutex;
+  std::vector<std::shared_ptr<LUXQuery>> asked;
+  world.controller->onAnswer = [&](const auto& query, const auto&) {
+    const std::lock_guard lock(mutex);
+    asked.push_back(query);
+  };
+  world.search(LUXWorld::query("printer"));
+  ASSERT_THAT(asked, SizeIs(2));
+  for (const auto& each : asked) {
+    EXPECT_FALSE(each->isCancelled());
+  }
+}
+
 TEST_F(Query, cancelsABuildThatHasNotFinished) {
   // The queue is busy with something else for as long as the query waits.
   platform::DispatchSemaphore release(0);

@@ -212,7 +212,8 @@ TEST_F(Synchronisation, doesNotHoldThePendingTableWhileItAsksTheShelf) {
   });
   LUXWorld::waitUntil([&] { return inside.load(); });
   std::thread timer([&] { world.controller->processPendingIndexEvents(); });
-  std::this_thread::sleep_for(std::chrono::milliseconds(5));
+  // By now it waits for the shelf.
+  world.clock->letOthersWork();
   goOn = true;
   remover.join();
   timer.join();
@@ -386,7 +387,7 @@ TEST_F(Synchronisation, waitsForAllWorkOfTheShelfAndForBuilds) {
       over = true;
     });
     EXPECT_TRUE(LUXWorld::waitUntil([&] { return world.owner->guards() > 0; }));
-    std::this_thread::sleep_for(std::chrono::milliseconds(3));
+    world.clock->letOthersWork();
     EXPECT_FALSE(over);
     release.signal();
     synchroniser.join();
@@ -472,8 +473,7 @@ class LoadingAfterwards : public Synchronisation {
   bool loadsAfterRebuild() {
     tell(3);
     sync();
-    // What is not started cannot be waited for.
-    LUXWorld::waitUntil([&, tries = 0]() mutable { return loads > 0 || ++tries > 200; });
+    world.clock->letOthersWork();
     return loads > 0;
   }
 
@@ -489,7 +489,7 @@ TEST_F(LoadingAfterwards, happensOnAThreadOfItsOwn) {
 TEST_F(LoadingAfterwards, doesNotHappenWhereNothingWasRebuilt) {
   tell(1);
   sync();
-  std::this_thread::sleep_for(std::chrono::milliseconds(20));
+  world.clock->letOthersWork();
   EXPECT_EQ(loads, 0);
 }
 

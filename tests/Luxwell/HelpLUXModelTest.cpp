@@ -8,7 +8,6 @@
 #include <atomic>
 #include <cerrno>
 #include <chrono>
-#include <csignal>
 #include <filesystem>
 #include <fstream>
 #include <thread>
@@ -425,46 +424,4 @@ TEST_F(HelpLUXModelFile, LeftoversOfProcessesThatHaveEndedAreDeleted) {
   for (const std::string& name : strangers) {
     EXPECT_EQ(std::count(left.begin(), left.end(), name), 1) << name;
   }
-}
-
-TEST_F(HelpLUXModelFile, ABuildThatIsKilledAtAnyMomentLeavesAWholeModel) {
-  const std::vector<tests::ModelPage> pages = tests::randomModelPages(12, 12, 1);
-  const auto build = [&](const std::string& book) {
-    const auto model = open();
-    model->reset();
-    model->addHelpbookID(book);
-    tests::addPages(*model, pages);
-    return model->saveWithOptions({});
-  };
-  // How long it takes here, so that the children are killed before, in and after it.
-  ASSERT_TRUE(build("old"));
-  const auto start = std::chrono::steady_clock::now();
-  ASSERT_TRUE(build("old"));
-  const auto duration = std::chrono::steady_clock::now() - start;
-  size_t replaced = 0;
-  for (unsigned round = 0; round < 100; ++round) {
-    const pid_t child = ::fork();
-    if (child == 0) {
-      while (true) {
-        build("new" + std::to_string(round));
-      }
-    }
-    ASSERT_GT(child, 0);
-    // Any order of the numbers from 0 to 100 will do.
-    std::this_thread::sleep_for(duration * (round * 37 % 101) / 67);
-    ASSERT_EQ(::kill(child, SIGKILL), 0);
-    ASSERT_EQ(::waitpid(child, nullptr, 0), child);
-    const auto model = open();
-    ASSERT_FALSE(model->needsBuild()) << "round " << round;
-    model->loadLSMMap();
-    ASSERT_FALSE(model->needsBuild()) << "round " << round;
-    const Names books = model->allHelpbookIDs();
-    ASSERT_FALSE(books.empty());
-    replaced += books[0] == "new" + std::to_string(round) ? 1 : 0;
-  }
-  EXPECT_GT(replaced, 0U) << "no child lived long enough to save";
-  EXPECT_LT(replaced, 100U) << "every child lived long enough to save";
-  // What the killed left is gone with the next build.
-  save(*open(), "last");
-  EXPECT_EQ(namesInDirectory(), Names{"LUXModel"});
 }

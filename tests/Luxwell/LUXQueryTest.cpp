@@ -9,12 +9,14 @@
 #include <ctime>
 #include <filesystem>
 #include <fstream>
+#include <random>
 #include <string>
 #include <thread>
 #include <vector>
 
 #include "host/Luxwell/HelpLUXIndex.h"
 #include "host/Luxwell/LUXHit.h"
+#include "host/Luxwell/LUXScoring.h"
 #include "host/Zebrine/ZEBQuery.h"
 #include "tests/Luxwell/LUXQueryWorld.h"
 
@@ -113,6 +115,29 @@ TEST(LUXQuery, ArticlesHavePathBookAndScoreAndNoTitle) {
   for (size_t i = 1; i < hits.size(); ++i) {
     EXPECT_GE(hits[i - 1]->score(), hits[i]->score());
   }
+}
+
+TEST(LUXQuery, WhereThereIsAnAnswerPagesHalfAsGoodAreAboveTheCutOffToo) {
+  const QueryWorld world(tests::randomPages(300, 7));
+  std::mt19937 random(16);
+  size_t moved = 0;
+  for (int i = 0; i < 50; ++i) {
+    std::string text;
+    for (size_t words = 3 + random() % 8; words > 0; --words) {
+      text += tests::vocabularyWord(random() % tests::vocabularySize) + " ";
+    }
+    auto pages = LUXScoring(*world.view()).bestPages(world.termsOf(text), 50);
+    const auto before = pages;
+    LUXLiftAboveCutoff(pages);
+    moved += pages == before ? 0 : 1;
+    Asked asked(text, world);
+    const Hits& hits = asked.run();
+    ASSERT_EQ(hits.size(), pages.size());
+    for (size_t j = 0; j < hits.size(); ++j) {
+      EXPECT_EQ(hits[j]->score(), pages[j].score) << text;
+    }
+  }
+  EXPECT_GT(moved, 0U);
 }
 
 TEST(LUXQuery, ActionsAreArticlesOfALargeCount) {

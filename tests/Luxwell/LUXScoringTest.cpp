@@ -421,3 +421,62 @@ TEST(LUXScoring, SearchingTwiceGivesTheSame) {
     EXPECT_EQ(best(randomWorld(), text), best(randomWorld(), text));
   }
 }
+
+namespace {
+
+std::vector<float> lifted(const std::vector<float>& scores) {
+  std::vector<LUXScoredPage> pages;
+  for (const float score : scores) {
+    pages.push_back({static_cast<uint32_t>(pages.size()), score});
+  }
+  LUXLiftAboveCutoff(pages);
+  std::vector<float> result;
+  for (const LUXScoredPage& page : pages) {
+    EXPECT_EQ(page.page, result.size());
+    result.push_back(page.score);
+  }
+  return result;
+}
+
+}  // namespace
+
+TEST(LUXLiftAboveCutoff, PagesMoreThanHalfAsGoodAsAnAnswerAreAnswers) {
+  const std::vector<float> scores = lifted({0.25F, 0.19F, 0.13F, 0.125F, 0.12F});
+  EXPECT_FLOAT_EQ(scores[0], 0.25F);
+  EXPECT_GT(scores[1], luxscoring::cutoff);
+  EXPECT_GT(scores[2], luxscoring::cutoff);
+  EXPECT_LE(scores[3], luxscoring::cutoff);
+  EXPECT_LT(scores[4], luxscoring::cutoff);
+}
+
+TEST(LUXLiftAboveCutoff, WithoutAnAnswerNothingBecomesOne) {
+  const std::vector<float> scores = {luxscoring::cutoff, 0.19F, 0.11F};
+  EXPECT_EQ(lifted(scores), scores);
+  EXPECT_TRUE(lifted({}).empty());
+}
+
+TEST(LUXLiftAboveCutoff, ScoresStayAsTheyAreWhereHalfTheBestIsAboveTheCutOff) {
+  const std::vector<float> scores = {0.6F, 0.31F, 0.29F, 0.21F, 0.05F};
+  EXPECT_EQ(lifted(scores), scores);
+  const std::vector<float> named = {1, 0.3F, 0.1F};
+  EXPECT_EQ(lifted(named), named);
+}
+
+TEST(LUXLiftAboveCutoff, KeepsTheOrderTheBestScoreAndWhatIsEqual) {
+  std::mt19937 random(15);
+  std::uniform_real_distribution<float> score(0.001F, 0.45F);
+  for (int i = 0; i < 2000; ++i) {
+    std::vector<float> scores;
+    for (size_t count = 1 + random() % 20; count > 0; --count) {
+      scores.push_back(random() % 4 == 0 && !scores.empty() ? scores.back() : score(random));
+    }
+    std::sort(scores.rbegin(), scores.rend());
+    const std::vector<float> moved = lifted(scores);
+    EXPECT_EQ(moved[0], scores[0]);
+    for (size_t j = 1; j < scores.size(); ++j) {
+      EXPECT_GE(moved[j], scores[j]);
+      EXPECT_LE(moved[j], moved[j - 1]);
+      EXPECT_TRUE(scores[j] != scores[j - 1] || moved[j] == moved[j - 1] || j == 1);
+    }
+  }
+}

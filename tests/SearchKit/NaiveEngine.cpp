@@ -42,11 +42,11 @@ bool hasPhrase(const Words& words, const Words& patterns) {
   return false;
 }
 
-std::vector<Words> allEntries(const NaiveDocument& document) {
-  std::vector<Words> entries{document.title};
-  entries.insert(entries.end(), document.headings.begin(), document.headings.end());
-  entries.insert(entries.end(), document.body.begin(), document.body.end());
-  return entries;
+bool hasPhrase(const NaiveDocument& document, const Words& patterns) {
+  const auto has = [&](const Words& words) { return hasPhrase(words, patterns); };
+  return has(document.title) ||
+         std::any_of(document.headings.begin(), document.headings.end(), has) ||
+         std::any_of(document.body.begin(), document.body.end(), has);
 }
 
 std::string join(const Words& words, const std::string& between) {
@@ -59,7 +59,7 @@ std::string join(const Words& words, const std::string& between) {
 
 }  // namespace
 
-bool naiveMatch(const std::string& pattern, const std::string& word) {
+bool naiveMatch(std::string_view pattern, std::string_view word) {
   if (pattern.empty()) {
     return word.empty();
   }
@@ -73,9 +73,7 @@ bool naiveMatch(const std::string& pattern, const std::string& word) {
 DocumentNumbers NaiveEngine::_documentsWith(const Words& patterns) const {
   DocumentNumbers found;
   for (size_t document = 0; document < _documents.size(); ++document) {
-    const std::vector<Words> entries = allEntries(_documents[document]);
-    if (std::any_of(entries.begin(), entries.end(),
-                    [&](const Words& words) { return hasPhrase(words, patterns); })) {
+    if (hasPhrase(_documents[document], patterns)) {
       found.insert(document);
     }
   }

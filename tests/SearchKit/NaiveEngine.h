@@ -7,6 +7,7 @@
 #include <random>
 #include <set>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "SearchKit/IndexWriter.h"
@@ -61,6 +62,6 @@ class NaiveEngine {
   std::vector<NaiveDocument> _documents;
 };
 
-bool naiveMatch(const std::string& pattern, const std::string& word);
+bool naiveMatch(std::string_view pattern, std::string_view word);
 
 }  // namespace searchkit::testing

@@ -36,11 +36,13 @@ std::string quoted(const std::string& word) {
 
 class ProgramTest : public testing::Test {
  protected:
+  virtual std::string caches() const { return files.path("cache"); }
+
   /// Runs a line of shell with the caches folder and no NO_COLOR set.
   ProgramRun shell(const std::string& line) const {
     const std::string errors = files.path("stderr");
-    const std::string command = "unset NO_COLOR; ZEB_CACHE_DIR=" + quoted(files.path("cache")) +
-                                " " + line + " 2>" + quoted(errors);
+    const std::string command =
+        "unset NO_COLOR; ZEB_CACHE_DIR=" + quoted(caches()) + " " + line + " 2>" + quoted(errors);
     ProgramRun run;
     std::FILE* pipe = popen(command.c_str(), "r");
     if (pipe == nullptr) {
@@ -65,14 +67,10 @@ class ProgramTest : public testing::Test {
     return shell(line);
   }
 
-  void scanManual() const {
-    ASSERT_EQ(zeb({"scan", "--no-system", tests::shippedBook("manual")}).status, 0);
-  }
-
   /// What the program writes, all in one, when it has a terminal.
   std::string onTerminal(std::vector<std::string> arguments, const char* noColor = nullptr) const {
     arguments.insert(arguments.begin(), ZEB_PROGRAM);
-    arguments.insert(arguments.end(), {"--cache-dir", files.path("cache")});
+    arguments.insert(arguments.end(), {"--cache-dir", caches()});
     std::vector<char*> pointers;
     pointers.reserve(arguments.size() + 1);
     for (std::string& argument : arguments) {
@@ -108,9 +106,34 @@ class ProgramTest : public testing::Test {
   tests::TemporaryFolder files;
 };
 
-TEST_F(ProgramTest, ExitStatusTellsFoundNothingUsageAndFailureApart) {
+/// The programs with the manual scanned. A scan waits in earnest until the books have been quiet
+/// for a second, so there is one for all these tests, and none of them changes what it left.
+class ProgramWithABookTest : public ProgramTest {
+ protected:
+  static void SetUpTestSuite() {
+    scanned = new tests::TemporaryFolder;
+    ProgramWithABookTest first;
+    ASSERT_EQ(first.zeb({"scan", "--no-system", tests::shippedBook("manual")}).status, 0);
+  }
+  static void TearDownTestSuite() {
+    delete scanned;
+    scanned = nullptr;
+  }
+  std::string caches() const override { return scanned->path("cache"); }
+
+  static tests::TemporaryFolder* scanned;
+
+ private:
+  void TestBody() override {}
+};
+
+tests::TemporaryFolder* ProgramWithABookTest::scanned = nullptr;
+
+TEST_F(ProgramTest, ExitStatusWithoutBooksIsFailure) {
   EXPECT_EQ(zeb({"search", "half"}).status, 3);
-  scanManual();
+}
+
+TEST_F(ProgramWithABookTest, ExitStatusTellsFoundNothingAndUsageApart) {
   EXPECT_EQ(zeb({"search", "half"}).status, 0);
   EXPECT_EQ(zeb({"search", "zebra"}).status, 1);
   EXPECT_EQ(zeb({"search"}).status, 2);
@@ -125,8 +148,7 @@ TEST_F(ProgramTest, ErrorsGoToStandardErrorOnly) {
   EXPECT_EQ(run.err, "zeb: error: no book has been indexed yet; 'zeb scan' looks for some\n");
 }
 
-TEST_F(ProgramTest, PipeIsPlainAndTerminalIsColoured) {
-  scanManual();
+TEST_F(ProgramWithABookTest, PipeIsPlainAndTerminalIsColoured) {
   const ProgramRun piped = zeb({"search", "half"});
   EXPECT_THAT(piped.out, Not(HasSubstr("\033")));
   EXPECT_THAT(piped.out, HasSubstr("Search with words and half words"));
@@ -135,22 +157,19 @@ TEST_F(ProgramTest, PipeIsPlainAndTerminalIsColoured) {
   EXPECT_THAT(onTerminal({"search", "half", "--color=never"}), Not(HasSubstr("\033")));
 }
 
-TEST_F(ProgramTest, NoColorVariableCountsUnlessItIsEmpty) {
-  scanManual();
+TEST_F(ProgramWithABookTest, NoColorVariableCountsUnlessItIsEmpty) {
   EXPECT_THAT(onTerminal({"search", "half"}, "1"), Not(HasSubstr("\033")));
   EXPECT_THAT(onTerminal({"search", "half"}, ""), HasSubstr("\033[1m"));
   EXPECT_THAT(onTerminal({"search", "half", "--color=always"}, "1"), HasSubstr("\033[1m"));
 }
 
-TEST_F(ProgramTest, ArgumentsThatAreNoTextAreRepaired) {
-  scanManual();
+TEST_F(ProgramWithABookTest, ArgumentsThatAreNoTextAreRepaired) {
   const ProgramRun run = zeb({"search", "--json", "caf\xE9\xFF half"});
   EXPECT_EQ(run.status, 0);
   EXPECT_EQ(nlohmann::json::parse(run.out)["query"], "caf\xEF\xBF\xBD\xEF\xBF\xBD half");
 }
 
-TEST_F(ProgramTest, FullDiskBehindTheOutputIsAFailure) {
-  scanManual();
+TEST_F(ProgramWithABookTest, FullDiskBehindTheOutputIsAFailure) {
   const ProgramRun run = shell(quoted(ZEB_PROGRAM) + " search half >/dev/full");
   EXPECT_EQ(run.status, 3);
   EXPECT_THAT(run.err, HasSubstr("cannot write"));
@@ -199,9 +218,8 @@ TEST_F(ProgramTest, TwoScansAtOnceBothSucceedAndLeaveAWholeCatalogue) {
   EXPECT_EQ(count, 2U);
 }
 
-TEST_F(ProgramTest, IndexesAreRememberedInTheCacheFile) {
-  scanManual();
-  const std::string cache = files.path("cache/org.zeb.zebd/HelpindexCache.plist");
+TEST_F(ProgramWithABookTest, IndexesAreRememberedInTheCacheFile) {
+  const std::string cache = caches() + "/org.zeb.zebd/HelpindexCache.plist";
   ASSERT_TRUE(std::filesystem::exists(cache));
   const auto before = std::filesystem::last_write_time(cache);
   const ProgramRun run = zeb({"search", "half", "--verbose", "--verbose", "--verbose"});
@@ -218,9 +236,8 @@ TEST_F(ProgramTest, EndsAtOnceThoughBooksAreStillBeingIndexedWhenToldNotToWait) 
   EXPECT_EQ(zeb({"search", "half"}).status, 0);
 }
 
-TEST_F(ProgramTest, SearchWithoutWordsOnATerminalSearchesWhileOneTypes) {
-  scanManual();
-  std::vector<std::string> arguments = {ZEB_PROGRAM, "search", "--cache-dir", files.path("cache")};
+TEST_F(ProgramWithABookTest, SearchWithoutWordsOnATerminalSearchesWhileOneTypes) {
+  std::vector<std::string> arguments = {ZEB_PROGRAM, "search", "--cache-dir", caches()};
   std::vector<char*> pointers;
   for (std::string& argument : arguments) {
     pointers.push_back(argument.data());

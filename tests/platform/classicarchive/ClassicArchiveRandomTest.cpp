@@ -341,10 +341,34 @@ TEST(ClassicArchive, RandomGraphsAreWrittenAsByAnObviousWriter) {
   }
 }
 
+struct Outcome {
+  Value value;
+  std::string failure;
+  bool operator==(const Outcome&) const = default;
+};
+
+template <typename Decode>
+Outcome outcomeOf(const Decode& decode) {
+  try {
+    return {decode(), {}};
+  } catch (const Exception& exception) {
+    return {{}, exception.name() + ": " + exception.reason()};
+  }
+}
+
+/// The unarchiver, which makes no graph, has to come to the same value or the same exception.
+void expectSameValueWithoutAGraph(const Data& data) {
+  const Outcome expected =
+      outcomeOf([&] { return classicarchive::value(classicarchive::decode(data)); });
+  EXPECT_EQ(outcomeOf([&] { return ClassicUnarchiver(data).decodeRootObject(); }), expected)
+      << expected.failure;
+}
+
 /// Decodes what may be broken: either a graph that lives, or an exception with an offset in range.
 void expectGraphOrException(const std::string& bytes) {
   // A buffer of exactly this size, so that a sanitizer sees any read beyond it.
   const Data data = Data::adopt(std::vector<uint8_t>(bytes.begin(), bytes.end()));
+  expectSameValueWithoutAGraph(data);
   try {
     const ClassicArchive archive = classicarchive::decode(data);
     const Data again = classicarchive::encode(archive);
@@ -372,6 +396,18 @@ std::vector<std::string> sampleArchives() {
     }
   }
   return samples;
+}
+
+TEST(ClassicArchive, ValuesOfRandomGraphsAreTheSameWithoutAGraph) {
+  size_t values = 0;
+  for (uint32_t seed = 2000; seed < 3000; ++seed) {
+    SCOPED_TRACE(seed);
+    const Data data = classicarchive::encode(RandomGraphs(seed).next());
+    expectSameValueWithoutAGraph(data);
+    values += outcomeOf([&] { return ClassicUnarchiver(data).decodeRootObject(); }).failure.empty();
+  }
+  EXPECT_GT(values, 100U);
+  EXPECT_LT(values, 900U);
 }
 
 TEST(ClassicArchive, EveryTruncationIsRefusedOrAShorterArchive) {
