@@ -37,8 +37,10 @@ inline constexpr float bigramWeight = 0.2F;
 /// Share of words as they stand beside their stems: commands and options are no words to be bent.
 inline constexpr float formWeight = 0.15F;
 /// The most that meaning may count for, and the number of terms over which it comes up to that.
-inline constexpr float latentWeight = 0.25F;
+inline constexpr float latentWeight = 0.2F;
 inline constexpr float latentTerms = 6;
+/// The most that longer words count for beside a known one that is still being typed.
+inline constexpr float continuationWeight = 0.6F;
 /// Exact titles have 1; whatever else is found stays below what counts as named by the user.
 inline constexpr float exactTitleScore = 1;
 inline constexpr float highestScore = 0.989F;

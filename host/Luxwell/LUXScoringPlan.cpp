@@ -227,7 +227,8 @@ class Planner {
       return;
     }
     const auto having = static_cast<uint32_t>(others.size());
-    const float share = static_cast<float>(having) / static_cast<float>(having + frequency);
+    const float share = luxscoring::continuationWeight * static_cast<float>(having) /
+                        static_cast<float>(having + frequency);
     _plan.unions.push_back(std::move(others));
     // A page has either the word or a longer one, so that this raises no bound.
     _addPostings(_plan.unions.back(), count * share * _inverseFrequency(having));

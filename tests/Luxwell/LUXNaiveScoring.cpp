@@ -197,7 +197,7 @@ std::map<uint32_t, double> NaiveScoring::scores(const LUXQueryTerms& terms) cons
     const auto others = static_cast<double>(longer.size());
     for (const auto& [page, impact] : longer) {
       scored[page].lexical +=
-          word.count * others / (others + frequency) * _weightOfFrequency(others) * impact;
+          word.count * 0.6 * others / (others + frequency) * _weightOfFrequency(others) * impact;
     }
   }
   if (!terms.onlyStopWords) {
@@ -221,7 +221,7 @@ std::map<uint32_t, double> NaiveScoring::scores(const LUXQueryTerms& terms) cons
     norm += component * component;
   }
   const double meaning =
-      terms.onlyStopWords ? 0 : 0.25 * (1 - std::exp(-static_cast<double>(words.size()) / 6));
+      terms.onlyStopWords ? 0 : 0.2 * (1 - std::exp(-static_cast<double>(words.size()) / 6));
   std::map<uint32_t, double> scores;
   for (const Page& page : _pages) {
     if (!page.mayBeFound) {

@@ -252,9 +252,22 @@ const QueryWorld& shells() {
 }
 
 TEST(LUXScoring, AKnownWordThatIsStillBeingTypedFindsLongerOnesToo) {
-  EXPECT_EQ(firstKey(shells(), "keyboard sh"), "shortcuts.html");
+  const auto pages = best(shells(), "keyboard sh");
+  const auto rankOf = [&pages](const std::string& key) {
+    return std::find_if(pages.begin(), pages.end(),
+                        [&](const LUXScoredPage& page) { return keyOf(shells(), page) == key; }) -
+           pages.begin();
+  };
+  EXPECT_LE(rankOf("shortcuts.html"), 1);
+  EXPECT_LT(rankOf("shortcuts.html"), rankOf("layout.html"));
+  EXPECT_LT(rankOf("shortcuts.html"), rankOf("cleaning.html"));
   EXPECT_TRUE(keys(shells(), "sh").contains("shortcuts.html"));
-  EXPECT_NE(firstKey(shells(), "keyboard sh "), "shortcuts.html");
+  const auto isShortcuts = [](const LUXScoredPage& page) {
+    return keyOf(shells(), page) == "shortcuts.html";
+  };
+  const auto finished = best(shells(), "keyboard sh ");
+  EXPECT_GT(std::find_if(pages.begin(), pages.end(), isShortcuts)->score,
+            std::find_if(finished.begin(), finished.end(), isShortcuts)->score);
 }
 
 TEST(LUXScoring, PagesThatHaveTheWordItselfComeBeforeThoseWithLongerOnes) {
