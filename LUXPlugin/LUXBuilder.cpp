@@ -10,6 +10,7 @@
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "host/Zebrine/ZEBLog.h"
 #include "host/Zebrine/ZEBPluginOwner.h"
+#include "platform/AbandonedFiles.h"
 #include "platform/Applications.h"
 #include "platform/Assertion.h"
 #include "platform/Bundle.h"
@@ -113,6 +114,8 @@ void LUXSearchController::_updateModelWithParams(const LUXModelBuildParameters& 
 void LUXSearchController::_buildModel(const LUXModelBuildParameters& params) {
   const BookTable books = _copyAllBooksForLanguage(params.language);
   params.model->reset();
+  // Processes that ended in the middle of a build leave unfinished files here too.
+  platform::removeAbandonedFiles(_savedIndexDataFolder(params.model->modelDirectoryPath()));
   Value::Dictionary thresholds;
   ZEBLog(4, "Starting build of %@", params.modelGroupName);
   const std::set<std::string> members =

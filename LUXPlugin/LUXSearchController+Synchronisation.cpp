@@ -175,12 +175,15 @@ bool LUXSearchController::_synchroniseGroup(const std::string& modelGroupName,
   return processed;
 }
 
+std::string LUXSearchController::_savedIndexDataFolder(const std::string& modelPath) {
+  return platform::stringByAppendingPathComponent(modelPath, "HelpLUXIndexFile");
+}
+
 bool LUXSearchController::_saveVersionedLUXIndexData(const std::optional<platform::Data>& data,
                                                      const std::string& bookIdentifier,
                                                      const std::string& atLUXModelPath) {
   const auto files = platform::Environment::current()->files;
-  const std::string folder =
-      platform::stringByAppendingPathComponent(atLUXModelPath, "HelpLUXIndexFile");
+  const std::string folder = _savedIndexDataFolder(atLUXModelPath);
   if (!files->fileExistsAtPath(folder)) {
     if (const auto error = files->createDirectory(folder)) {
       ZEBLog(3, "Couldn't create directory %@", folder);

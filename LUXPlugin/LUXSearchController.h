@@ -187,6 +187,8 @@ class LUXSearchController : public ZEBIndexshelfObserver,
                        const LUXModelBuildParameters& params,
                        platform::Value::Dictionary& thresholds);
 
+  static std::string _savedIndexDataFolder(const std::string& modelPath);
+
   void _schedulePendingSync() REQUIRES(_pendingMonitor);
   void _synchronise();
   bool _synchroniseGroup(const std::string& modelGroupName,

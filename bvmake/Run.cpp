@@ -106,14 +106,16 @@ class Run {
       _fail(fmt::format("cannot write {}: what is there is no regular file", _options.outputPath));
       return false;
     }
-    const std::string folder = platform::stringByDeletingLastPathComponent(_options.outputPath);
-    if (!folder.empty()) {
-      if (const auto error = _files->createDirectoryWithParents(folder)) {
-        _fail(fmt::format("cannot write {}: {}", _options.outputPath, error->description));
-        return false;
-      }
+    if (const auto error = _makeOutputFolder()) {
+      _fail(fmt::format("cannot write {}: {}", _options.outputPath, error->description));
+      return false;
     }
     return true;
+  }
+
+  std::optional<platform::Error> _makeOutputFolder() {
+    const std::string folder = platform::stringByDeletingLastPathComponent(_options.outputPath);
+    return folder.empty() ? std::nullopt : _files->createDirectoryWithParents(folder);
   }
 
   void _skip(const FoundPage& found, std::string_view why) {
@@ -186,7 +188,9 @@ class Run {
     if (!file) {
       return _failToAppend(why);
     }
-    if (const auto error = _files->writeAtomically(_options.outputPath, *file)) {
+    // Somebody who removes an index removes its folder, and may do so while the next is being made.
+    if (auto error = _makeOutputFolder();
+        error || (error = _files->writeAtomically(_options.outputPath, *file))) {
       return _fail(fmt::format("cannot write {}: {}", _options.outputPath, error->description));
     }
     _outcome.outputBytes = file->length();

@@ -8,14 +8,13 @@ set(CMAKE_CXX_FLAGS_DEV "-O1 -g1" CACHE STRING "Flags of the Dev build type" FOR
 set(CMAKE_CXX_FLAGS_RELEASE "-O2 -DNDEBUG" CACHE STRING "Flags of the Release build type" FORCE)
 
 set(ZEB_SANITIZE "" CACHE STRING "Value for -fsanitize, empty for none")
-option(ZEB_THREAD_SAFETY "Turn on clang's thread-safety analysis" OFF)
 option(ZEB_FUZZ "Link fuzz targets with libFuzzer instead of the corpus replayer" OFF)
 
 find_program(ZEB_CCACHE ccache)
 if(ZEB_CCACHE)
   # Where a build lies makes no difference to what comes out, so presets and clones share results.
   set(CMAKE_CXX_COMPILER_LAUNCHER ${CMAKE_COMMAND} -E env CCACHE_NOHASHDIR=1
-      CCACHE_BASEDIR=${PROJECT_SOURCE_DIR} ${ZEB_CCACHE})
+      CCACHE_BASEDIR=${PROJECT_SOURCE_DIR} CCACHE_SLOPPINESS=pch_defines,time_macros ${ZEB_CCACHE})
 endif()
 
 add_compile_options(-Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wnon-virtual-dtor
@@ -25,7 +24,7 @@ if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU")
   add_compile_options(-Wno-error=stringop-overflow -Wno-error=array-bounds -Wno-error=restrict
                       -Wno-error=maybe-uninitialized -Wno-error=dangling-pointer)
 endif()
-if(ZEB_THREAD_SAFETY)
+if(CMAKE_CXX_COMPILER_ID MATCHES "Clang")
   add_compile_options(-Wthread-safety -Wthread-safety-beta)
 endif()
 if(ZEB_SANITIZE)

@@ -1,6 +1,7 @@
 #include "platform/OperationQueue.h"
 
 #include <algorithm>
+#include <atomic>
 #include <deque>
 #include <thread>
 #include <utility>
@@ -9,6 +10,11 @@
 #include "platform/WorkerThreads.h"
 
 namespace platform {
+namespace {
+
+std::atomic<size_t> unfinishedOperations = 0;
+
+}  // namespace
 
 // Lock order: the queue's mutex, then an operation's. Handlers of operations run without either.
 struct OperationQueue::Implementation : std::enable_shared_from_this<Implementation> {
@@ -35,6 +41,7 @@ struct OperationQueue::Implementation : std::enable_shared_from_this<Implementat
     {
       const MutexLock lock(mutex);
       entries.push_back({operation, false});
+      ++unfinishedOperations;
       notices.push_back(entries.size());
     }
     announce();
@@ -84,6 +91,7 @@ struct OperationQueue::Implementation : std::enable_shared_from_this<Implementat
       running -= found->started ? 1 : 0;
       retired = std::move(found->operation);
       entries.erase(found);
+      --unfinishedOperations;
       notices.push_back(entries.size());
       // For an observer that waits in the midst of an announcement: its thread is the one that
       // would tell the others.
@@ -203,6 +211,8 @@ size_t OperationQueue::operationCount() const {
   const MutexLock lock(_implementation->mutex);
   return _implementation->entries.size();
 }
+
+size_t OperationQueue::unfinishedOperationCount() noexcept { return unfinishedOperations; }
 
 void OperationQueue::setMaxConcurrentOperationCount(long count) {
   {

@@ -48,6 +48,9 @@ class OperationQueue : public KeyValueObservable,
   std::vector<std::shared_ptr<Operation>> operations() const;
   size_t operationCount() const;
 
+  /// How many operations wait or run in all queues of the process: zero where nothing is under way.
+  static size_t unfinishedOperationCount() noexcept;
+
   /// How many may run at once from now on; running ones are not stopped.
   void setMaxConcurrentOperationCount(long count);
   long maxConcurrentOperationCount() const;

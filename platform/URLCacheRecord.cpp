@@ -1,7 +1,10 @@
 #include "platform/URLCacheRecord.h"
 
 #include <algorithm>
-#include <cstring>
+#include <chrono>
+#include <cmath>
+#include <utility>
+#include <vector>
 
 #include "platform/Exception.h"
 #include "platform/PropertyList.h"
@@ -79,6 +82,19 @@ std::optional<HTTPHeaderFields> fieldsOfValue(const Value& value) {
     fields.insert_or_assign(name, *text);
   }
   return fields;
+}
+
+/// 2001-01-01 00:00 UTC, where property lists count from.
+constexpr std::chrono::system_clock::time_point reference{std::chrono::seconds(978307200)};
+
+// Microseconds, which a real number of seconds holds exactly enough to give them back.
+Date dateOfTime(std::chrono::system_clock::time_point time) {
+  const auto rounded = std::chrono::floor<std::chrono::microseconds>(time - reference);
+  return {static_cast<double>(rounded.count()) / 1e6};
+}
+
+std::chrono::system_clock::time_point timeOfDate(Date date) {
+  return reference + std::chrono::microseconds(std::llround(date.secondsSinceReference * 1e6));
 }
 
 std::vector<std::string> namesInList(std::string_view list) {
@@ -168,7 +184,7 @@ Data URLCacheRecord::encoded() const {
       {versionKey, valueOfText(response.HTTPVersion())},
       {fieldsKey, valueOfFields(response.allHeaderFields())},
       {variedKey, valueOfFields(variedFields)},
-      {dateKey, Date::fromTimePoint(cachedResponse->date())},
+      {dateKey, dateOfTime(cachedResponse->date())},
   };
   const Data headBytes = dataFromPropertyList(head, PropertyListFormat::binary);
   const Data& body = cachedResponse->data();
@@ -181,10 +197,16 @@ Data URLCacheRecord::encoded() const {
   append(file, 0, 8);
   file += headBytes.view();
   file += body.view();
-  std::string checksum;
-  append(checksum, checksumOf(file), 8);
-  file.replace(checksumOffset, checksum.size(), checksum);
+  repairChecksum(file);
   return Data::adopt(std::move(file));
+}
+
+void URLCacheRecord::repairChecksum(std::string& file) {
+  if (file.size() >= prefixLength) {
+    std::string checksum;
+    append(checksum, checksumOf(file), 8);
+    file.replace(checksumOffset, checksum.size(), checksum);
+  }
 }
 
 std::shared_ptr<const URLCacheRecord> URLCacheRecord::decoded(const Data& file) {
@@ -222,13 +244,10 @@ std::shared_ptr<const URLCacheRecord> URLCacheRecord::decoded(const Data& file) 
   auto record = std::make_shared<URLCacheRecord>();
   record->key = *text;
   record->variedFields = std::move(*varied);
-  const auto sinceReference = std::chrono::duration_cast<std::chrono::system_clock::duration>(
-      Seconds(date->secondsSinceReference));
-  const auto reference = std::chrono::system_clock::time_point(std::chrono::seconds(978307200));
   record->cachedResponse = std::shared_ptr<const CachedURLResponse>(new CachedURLResponse(
       URLResponse::initWithURL(*url, static_cast<int>(status), *protocol, std::move(*fields)),
       file.slice(prefixLength + headLength, bodyLength), URLCacheStoragePolicy::allowed,
-      reference + sinceReference));
+      timeOfDate(*date)));
   return record;
 }
 

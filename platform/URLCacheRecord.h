@@ -25,6 +25,9 @@ struct URLCacheRecord {
   /// `file`. Null for anything that is not whole, or not written by encoded().
   static std::shared_ptr<const URLCacheRecord> decoded(const Data& file);
   Data encoded() const;
+  /// Puts the checksum of a file right, whatever the file holds; one too short for it stays as it
+  /// is.
+  static void repairChecksum(std::string& file);
 
   /// Whether the request has the header fields that the answer was given for.
   bool matches(const URLRequest& request) const;

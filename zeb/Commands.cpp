@@ -318,12 +318,7 @@ ExitCode runCommand(const CommandLine& line, const Installation& installation, C
 
   Session session(console, Catalogue(stringByAppendingPathComponent(*folder, "books")),
                   installation, line);
-  const ExitCode code = std::visit(session, line.command);
-  if (!console.flush()) {
-    console.error("cannot write the results");
-    return ExitCode::failure;
-  }
-  return code;
+  return std::visit(session, line.command);
 }
 
 }  // namespace
@@ -333,7 +328,14 @@ ExitCode run(const std::vector<std::string>& arguments, const Installation& inst
   try {
     ExitCode code = ExitCode::success;
     const std::optional<CommandLine> line = parseCommandLine(arguments, console, code);
-    return line ? runCommand(*line, installation, console) : code;
+    if (line) {
+      code = runCommand(*line, installation, console);
+    }
+    if (!console.flush()) {
+      console.error("cannot write the results");
+      return ExitCode::failure;
+    }
+    return code;
   } catch (const std::exception& exception) {
     console.error(exception.what());
     return ExitCode::failure;

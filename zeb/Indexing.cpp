@@ -4,19 +4,41 @@
 
 #include <algorithm>
 #include <memory>
+#include <optional>
 #include <ostream>
 #include <string>
 
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBHelpBook.h"
+#include "platform/Environment.h"
+#include "platform/FileLock.h"
+#include "platform/Files.h"
 #include "zeb/BookFolder.h"
 #include "zeb/HelpSearch.h"
 
 namespace zeb {
+namespace {
+
+// An update removes indexes before it makes them anew, and must not find those gone that it has
+// made. Without a lock, where none can be had, it goes on: what then fails says so itself.
+std::optional<platform::FileLock> lockCatalogue(const Catalogue& catalogue, Console& console) {
+  (void)platform::Environment::current()->files->createDirectoryWithParents(catalogue.folder());
+  const std::string path = catalogue.folder() + ".lock";
+  std::optional<platform::FileLock> lock = platform::FileLock::tryLock(path);
+  if (!lock) {
+    console.progress("waiting for another update to end");
+    lock = platform::FileLock::lock(path);
+    console.clearProgress();
+  }
+  return lock;
+}
+
+}  // namespace
 
 IndexingCounts Update::run(const std::vector<CatalogueEntry>& books,
                            const std::vector<CatalogueEntry>& gone,
                            const Installation& installation, bool evenIfUnchanged) {
+  const std::optional<platform::FileLock> lock = lockCatalogue(_catalogue, _console);
   for (const CatalogueEntry& book : books) {
     if (!evenIfUnchanged && _isUpToDate(book)) {
       ++_counts.unchanged;

@@ -3,8 +3,10 @@
 #include <algorithm>
 #include <utility>
 
+#include "platform/RunLoop.h"
 #include "platform/Strings.h"
 #include "zeb/Console.h"
+#include "zeb/InputWatcher.h"
 #include "zebd/Host.h"
 
 namespace zeb {
@@ -165,6 +167,7 @@ void searchInteractively(HelpSearch& search, const std::vector<std::string>& boo
   SearchPrompt prompt;
   const Screen screen(terminal);
   std::shared_ptr<LiveSearch> running;
+  InputWatcher watcher(terminal.input(), [] { platform::RunLoop::main()->stop(); });
   screen.draw(prompt);
   const auto begin = [&] {
     if (running != nullptr) {
@@ -205,6 +208,7 @@ void searchInteractively(HelpSearch& search, const std::vector<std::string>& boo
             return;
         }
       }
+      watcher.resume();
     }
     screen.draw(prompt);
   }

@@ -42,6 +42,8 @@ class Terminal {
   Terminal(const Terminal&) = delete;
   Terminal& operator=(const Terminal&) = delete;
 
+  /// The descriptor that keys come from, to watch it.
+  int input() const { return _input; }
   /// Whether a key may be there. Does not wait.
   bool hasInput() const;
   /// The keys pressed so far. Kind::end when the terminal is gone.

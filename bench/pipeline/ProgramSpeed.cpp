@@ -162,10 +162,12 @@ constexpr std::array<const char*, 24> typedTexts = {
 
 }  // namespace
 
-void scanBooks(const fs::path& root, const fs::path& caches) {
-  if (runQuietly({ZEB_PROGRAM, "--cache-dir", caches.string(), "scan", "--root", root.string()}) !=
-      0) {
-    throw std::runtime_error("cannot index the books below " + root.string());
+void indexBooks(const std::vector<std::string>& folders, const fs::path& caches) {
+  std::vector<std::string> words = {ZEB_PROGRAM, "--cache-dir", caches.string(), "scan",
+                                    "--no-system"};
+  words.insert(words.end(), folders.begin(), folders.end());
+  if (runQuietly(words) != 0) {
+    throw std::runtime_error("cannot index the books");
   }
   // A model that was saved just now is opened anew for each query, for one second.
   std::this_thread::sleep_for(std::chrono::seconds(2));

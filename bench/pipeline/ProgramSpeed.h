@@ -8,9 +8,9 @@
 
 namespace pipeline {
 
-/// Has the program of this build index the books below `root` for readers of English, with `caches`
-/// as its caches folder. Throws std::runtime_error when that fails.
-void scanBooks(const std::filesystem::path& root, const std::filesystem::path& caches);
+/// Has the program of this build index the books in the folders, with `caches` as its caches
+/// folder. Throws std::runtime_error when that fails.
+void indexBooks(const std::vector<std::string>& folders, const std::filesystem::path& caches);
 
 /// The table about typing in `zeb search` on a pseudo-terminal: from the key to the screen that
 /// shows it, and to the screen that shows what it finds.

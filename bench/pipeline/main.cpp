@@ -94,11 +94,10 @@ int run(int argc, char** argv) {
   speed->add_option("--queries", speedOptions.queryCount);
 
   CLI::App* const program = app.add_subcommand("program", "How long the command line takes");
-  std::string root;
+  std::vector<std::string> bookFolders;
   std::vector<std::string> programs = {ZEB_PROGRAM};
   size_t rounds = 30;
-  program->add_option("--root", root, "Root that packages with help books were unpacked to")
-      ->required();
+  program->add_option("--books", bookFolders, "Folders of help books to search in")->required();
   program->add_option("--rounds", rounds);
   program->add_option_function<std::vector<std::string>>(
       "--beside",
@@ -111,7 +110,7 @@ int run(int argc, char** argv) {
   if (program->parsed()) {
     const WorkFolder work;
     const fs::path caches = work.path() / "cache";
-    scanBooks(root, caches);
+    indexBooks(bookFolders, caches);
     std::printf("%s\n%s", keystrokeTable(caches).c_str(),
                 processTable(programs, caches, rounds).c_str());
   } else if (quality->parsed()) {

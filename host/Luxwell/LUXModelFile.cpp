@@ -1,36 +1,17 @@
 #include "host/Luxwell/LUXModelFile.h"
 
-#include <charconv>
-#include <set>
-#include <string_view>
 #include <utility>
-#include <vector>
 
 #include "host/Luxwell/LUXModelView.h"
+#include "platform/AbandonedFiles.h"
 #include "platform/Environment.h"
 #include "platform/Files.h"
 #include "platform/MappingGuard.h"
-#include "platform/Processes.h"
 
 namespace {
 
 // Two changes of a file that follow one another this closely may bear the same time.
 constexpr platform::Seconds timeGrain{1.0};
-
-// The number of the process that was writing the temporary file of this name
-// (FileManager::writeAtomically); absent for other files.
-std::optional<int> processOfLeftover(std::string_view name) {
-  const std::string prefix = std::string(".") + LUXModelFile::fileName + ".";
-  if (!name.starts_with(prefix) || !name.ends_with(".tmp")) {
-    return std::nullopt;
-  }
-  name.remove_prefix(prefix.size());
-  int number = 0;
-  const auto [end, error] = std::from_chars(name.data(), name.data() + name.size(), number);
-  return error == std::errc() && end != name.data() + name.size() && *end == '.'
-             ? std::optional(number)
-             : std::nullopt;
-}
 
 }  // namespace
 
@@ -98,27 +79,5 @@ std::optional<platform::Error> LUXModelFile::write(const platform::Data& data) {
 }
 
 void LUXModelFile::removeLeftovers() const {
-  const auto environment = platform::Environment::current();
-  const auto names = environment->files->namesInDirectory(_directoryPath);
-  std::vector<std::pair<std::string, int>> leftovers;
-  for (const std::string& name : names.value_or(std::vector<std::string>())) {
-    if (const std::optional<int> process = processOfLeftover(name)) {
-      leftovers.emplace_back(name, *process);
-    }
-  }
-  std::vector<platform::ProcessEntry> entries;
-  if (leftovers.empty() || environment->processTable == nullptr ||
-      environment->processTable->readProcesses(entries) != 0) {
-    return;
-  }
-  std::set<int> running;
-  for (const platform::ProcessEntry& entry : entries) {
-    running.insert(entry.processID);
-  }
-  for (const auto& [name, process] : leftovers) {
-    if (!running.contains(process)) {
-      environment->files->removeItem(
-          platform::stringByAppendingPathComponent(_directoryPath, name));
-    }
-  }
+  platform::removeAbandonedFiles(_directoryPath, fileName);
 }

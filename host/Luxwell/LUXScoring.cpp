@@ -395,9 +395,11 @@ void LUXLiftAboveCutoff(std::span<LUXScoredPage> pages) {
     return;
   }
   for (LUXScoredPage& page : pages.subspan(1)) {
-    const float lifted = page.score < least
-                             ? page.score * (cutoff / least)
-                             : cutoff + (page.score - least) * ((best - cutoff) / (best - least));
-    page.score = std::min(lifted, best);
+    const float lifted =
+        page.score < least
+            ? std::min(page.score * (cutoff / least), cutoff)
+            : std::min(cutoff + (page.score - least) * ((best - cutoff) / (best - least)), best);
+    // Rounding must not change the order.
+    page.score = std::max(page.score, lifted);
   }
 }

@@ -51,7 +51,7 @@ inline constexpr float longQueryCutoff = 0.12F;
 inline constexpr float cutoff = 0.20F;
 /// Where the best page is above the cut-off, so is every page that has more than this share of its
 /// score: the cut-off tells whether a query has an answer at all, not how long the answer is.
-inline constexpr float shareAboveCutoff = 0.5F;
+inline constexpr float shareAboveCutoff = 0.3F;
 
 }  // namespace luxscoring
 

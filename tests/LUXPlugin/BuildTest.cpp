@@ -210,6 +210,49 @@ TEST_F(Build, goesOnWhereTheDataOfABookCannotBeKept) {
   EXPECT_THAT(savedBooks(), ElementsAre("org.one"));
 }
 
+TEST_F(Build, deletesWhatProcessesThatEndedInABuildHaveLeft) {
+  world.addBook("org.one", tests::kitchenPages(), "Apps");
+  build();
+  // No process runs in this world.
+  for (const char* name : {"/.LUXModel.77.0.tmp", "/HelpLUXIndexFile/.org.one.77.1.tmp"}) {
+    world.folder.write("caches/org.zeb.zebd/Models/Apps/English" + std::string(name), "half");
+  }
+  build();
+  std::vector<std::string> names;
+  for (const auto& entry :
+       std::filesystem::recursive_directory_iterator(world.modelFolder("Apps"))) {
+    names.push_back(entry.path().filename());
+  }
+  EXPECT_THAT(names, testing::UnorderedElementsAre("HelpLUXIndexFile", "org.one", "LUXModel"));
+}
+
+TEST_F(Build, takesABookThatIsRemovedMeanwhileAsItFindsIt) {
+  // At every question and message of the build, one after the other.
+  for (int at = 0;; ++at) {
+    const auto book = world.addBook("org.one", tests::kitchenPages(), "Apps");
+    world.addBook("org.two", tests::printerPages(), "Apps");
+    world.shelf->indicesForBook(book);
+    int step = 0;
+    world.owner->onMessage = [&](const std::string&) {
+      if (step++ == at) {
+        world.owner->forgetBook("org.one");
+        world.shelf->removeIndexForBookID("org.one");
+      }
+    };
+    build();
+    world.owner->onMessage = nullptr;
+    if (step <= at) {
+      break;
+    }
+    EXPECT_THAT(savedBooks(), Contains("org.two")) << at;
+    EXPECT_FALSE(saved()->needsBuild());
+    EXPECT_THAT(world.controller->_registeredModels(), IsEmpty());
+    // The news of the removal brings the model in step.
+    world.controller->_syncModelsWithIndexEvents();
+    EXPECT_THAT(savedBooks(), ElementsAre("org.two")) << at;
+  }
+}
+
 TEST_F(Build, leavesTheOldModelWhereTheNewOneCannotBeSaved) {
   world.addBook("org.one", tests::kitchenPages(), "Apps");
   build();

@@ -117,7 +117,7 @@ TEST(LUXQuery, ArticlesHavePathBookAndScoreAndNoTitle) {
   }
 }
 
-TEST(LUXQuery, WhereThereIsAnAnswerPagesHalfAsGoodAreAboveTheCutOffToo) {
+TEST(LUXQuery, WhereThereIsAnAnswerPagesNotFarBelowItAreAboveTheCutOffToo) {
   const QueryWorld world(tests::randomPages(300, 7));
   std::mt19937 random(16);
   size_t moved = 0;

@@ -453,8 +453,8 @@ std::vector<float> lifted(const std::vector<float>& scores) {
 
 }  // namespace
 
-TEST(LUXLiftAboveCutoff, PagesMoreThanHalfAsGoodAsAnAnswerAreAnswers) {
-  const std::vector<float> scores = lifted({0.25F, 0.19F, 0.13F, 0.125F, 0.12F});
+TEST(LUXLiftAboveCutoff, PagesNotFarBelowAnAnswerAreAnswers) {
+  const std::vector<float> scores = lifted({0.25F, 0.19F, 0.08F, 0.074F, 0.05F});
   EXPECT_FLOAT_EQ(scores[0], 0.25F);
   EXPECT_GT(scores[1], luxscoring::cutoff);
   EXPECT_GT(scores[2], luxscoring::cutoff);
@@ -468,8 +468,8 @@ TEST(LUXLiftAboveCutoff, WithoutAnAnswerNothingBecomesOne) {
   EXPECT_TRUE(lifted({}).empty());
 }
 
-TEST(LUXLiftAboveCutoff, ScoresStayAsTheyAreWhereHalfTheBestIsAboveTheCutOff) {
-  const std::vector<float> scores = {0.6F, 0.31F, 0.29F, 0.21F, 0.05F};
+TEST(LUXLiftAboveCutoff, ScoresStayAsTheyAreWhereThatShareOfTheBestIsAboveTheCutOff) {
+  const std::vector<float> scores = {0.8F, 0.31F, 0.29F, 0.21F, 0.05F};
   EXPECT_EQ(lifted(scores), scores);
   const std::vector<float> named = {1, 0.3F, 0.1F};
   EXPECT_EQ(lifted(named), named);

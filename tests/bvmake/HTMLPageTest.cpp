@@ -3,7 +3,6 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <chrono>
 #include <string>
 
 #include "TestSupport.h"
@@ -252,10 +251,9 @@ TEST(HTMLPage, megabytesOfTextAreRead) {
 class HostileHTMLPage : public testing::TestWithParam<std::string> {};
 
 TEST_P(HostileHTMLPage, isReadOrRefusedInTimeInProportionToItsLength) {
-  const auto start = std::chrono::steady_clock::now();
+  // A second and a half in a release build. Without limits it takes minutes to days, which the
+  // time-out of the suite ends.
   (void)readPage(PageKind::html, GetParam());
-  // A second and a half in a release build; without limits, minutes to days.
-  EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(20));
 }
 
 std::string distinctAttributes(size_t count) {

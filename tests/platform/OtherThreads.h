@@ -101,8 +101,8 @@ class OtherThreads {
     }
     // "number (name) state …"; the name may hold anything.
     const std::string_view status = _read(found->second.state);
-    const size_t end = status.rfind(") ");
-    const bool isBlocked = end != std::string_view::npos && status[end + 2] == 'S';
+    const size_t end = status.rfind(')');
+    const bool isBlocked = end != std::string_view::npos && status.substr(end, 3) == ") S";
     // "nanoseconds run, nanoseconds waited, times run".
     runs = _read(found->second.runs);
     if (end == std::string_view::npos || runs.empty()) {

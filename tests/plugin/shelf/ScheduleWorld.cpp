@@ -79,14 +79,14 @@ bool ScheduleFiles::watchedFileIsWhole() const {
   return _allowed.contains(bytes.str());
 }
 
-ScheduleTool::ScheduleTool(uint64_t seed, std::shared_ptr<ScheduleFiles> files,
-                           platform::Data output)
+ScheduleTool::ScheduleTool(uint64_t seed, std::shared_ptr<ScheduleFiles> files, Output output)
     : _die(seed), _files(std::move(files)), _output(std::move(output)) {}
 
 int ScheduleTool::launchAndWait(const std::string& path,
                                 const std::vector<std::string>& arguments) {
   const auto option = std::find(arguments.begin(), arguments.end(), "--file");
   const std::string& output = *(option + 1);
+  const platform::Data bytes = _output(output);
   switch (_die.roll(8)) {
     case 0:
       return 1;
@@ -94,7 +94,7 @@ int ScheduleTool::launchAndWait(const std::string& path,
       throw platform::Exception("LaunchException", "cannot launch " + path);
     case 2:
       ++_kills;
-      (void)_write(output, _output.slice(0, _output.length() / 2));
+      (void)_write(output, bytes.slice(0, bytes.length() / 2));
       return 128 + 9;
     case 3: {
       std::unique_lock lock(_mutex);
@@ -104,7 +104,7 @@ int ScheduleTool::launchAndWait(const std::string& path,
     default:
       break;
   }
-  const int status = _write(output, _output);
+  const int status = _write(output, bytes);
   _successes += status == 0 ? 1 : 0;
   return status;
 }

@@ -72,7 +72,10 @@ class ScheduleFiles : public platform::FileManager {
 /// hangs until it is released.
 class ScheduleTool : public platform::ProcessLauncher {
  public:
-  ScheduleTool(uint64_t seed, std::shared_ptr<ScheduleFiles> files, platform::Data output);
+  /// What it makes at a path.
+  using Output = std::function<platform::Data(const std::string& path)>;
+
+  ScheduleTool(uint64_t seed, std::shared_ptr<ScheduleFiles> files, Output output);
 
   int launchAndWait(const std::string& path, const std::vector<std::string>& arguments) override;
 
@@ -88,7 +91,7 @@ class ScheduleTool : public platform::ProcessLauncher {
 
   SharedDie _die;
   const std::shared_ptr<ScheduleFiles> _files;
-  const platform::Data _output;
+  const Output _output;
   std::mutex _mutex;
   std::condition_variable _releasedCondition;
   bool _released = false;

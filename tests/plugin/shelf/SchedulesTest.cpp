@@ -1,88 +1,11 @@
-// Thousands of randomised runs. ZEB_SEED=n replays one seed, ZEB_REPEAT times (100 unless given);
-// ZEB_SCHEDULES=n runs n seeds instead of the usual number.
+// Thousands of randomised runs of the shelf; see ScheduleRunner.h for how to replay one.
 #include <gtest/gtest.h>
 
-#include <condition_variable>
-#include <cstdio>
-#include <cstdlib>
-#include <mutex>
-#include <optional>
-#include <thread>
-
 #include "tests/plugin/shelf/Schedule.h"
-
-namespace {
-
-std::optional<uint64_t> number(const char* variable) {
-  // Read before any thread runs that could change it; none does.
-  const char* const text = std::getenv(variable);  // NOLINT(concurrency-mt-unsafe)
-  return text == nullptr ? std::nullopt : std::optional<uint64_t>(std::strtoull(text, nullptr, 10));
-}
-
-/// Stops the process, naming the seed, when a run takes so long that something must be stuck.
-class Watchdog {
- public:
-  Watchdog() : _thread([this] { _watch(); }) {}
-  ~Watchdog() {
-    {
-      const std::lock_guard lock(_mutex);
-      _over = true;
-    }
-    _changed.notify_all();
-    _thread.join();
-  }
-  Watchdog(const Watchdog&) = delete;
-  Watchdog& operator=(const Watchdog&) = delete;
-
-  void begin(uint64_t seed) {
-    const std::lock_guard lock(_mutex);
-    _seed = seed;
-    ++_runs;
-  }
-
- private:
-  void _watch() {
-    constexpr std::chrono::seconds patience{60};
-    std::unique_lock lock(_mutex);
-    while (!_over) {
-      const uint64_t before = _runs;
-      _changed.wait_for(lock, patience, [&] { return _over; });
-      if (!_over && _runs == before && _runs > 0) {
-        std::fprintf(stderr, "the schedule of ZEB_SEED=%llu is stuck\n",
-                     static_cast<unsigned long long>(_seed));
-        std::abort();
-      }
-    }
-  }
-
-  std::mutex _mutex;
-  std::condition_variable _changed;
-  uint64_t _seed = 0;
-  uint64_t _runs = 0;
-  bool _over = false;
-  std::thread _thread;
-};
-
-void runAndReport(uint64_t seed, const tests::ScheduleGround& ground, Watchdog& watchdog) {
-  watchdog.begin(seed);
-  for (const std::string& fault : tests::runSchedule(seed, ground)) {
-    ADD_FAILURE() << "ZEB_SEED=" << seed << ": " << fault;
-  }
-}
+#include "tests/plugin/shelf/ScheduleRunner.h"
 
 TEST(Schedules, leaveAWholeShelfABalancedGuardAndAReadableCacheFile) {
   const tests::ScheduleGround ground;
-  Watchdog watchdog;
-  if (const auto seed = number("ZEB_SEED")) {
-    for (uint64_t left = number("ZEB_REPEAT").value_or(100); left > 0; --left) {
-      runAndReport(*seed, ground, watchdog);
-    }
-    return;
-  }
-  const uint64_t count = number("ZEB_SCHEDULES").value_or(2000);
-  for (uint64_t seed = 1; seed <= count && !HasFailure(); ++seed) {
-    runAndReport(seed, ground, watchdog);
-  }
+  tests::runSchedules(2000, std::chrono::seconds(15),
+                      [&](uint64_t seed) { return tests::runSchedule(seed, ground); });
 }
-
-}  // namespace

@@ -1,0 +1,1 @@
+// Compiled for the precompiled header of the tests, which comes out beside it.
