@@ -6,10 +6,9 @@
 
 namespace platform {
 
-/// A lock that processes agree on by the path of a file, which is made where it is missing and stays.
-/// It ends with the object, and with the process, however that ends. Two locks of one path exclude
-/// each other within a process too.
-/// Thread-safety: confined to one thread.
+/// A lock that processes agree on by the path of a file, which is made where it is missing and
+/// stays. It ends with the object, and with the process, however that ends. Two locks of one path
+/// exclude each other within a process too. Thread-safety: confined to one thread.
 class FileLock {
  public:
   /// Takes the lock if nobody holds it; absent if somebody does, or if the file cannot be opened.

@@ -75,7 +75,6 @@ std::optional<seconds> secondsFromText(std::string_view text) {
 struct Directives {
   bool noStore = false;
   bool noCache = false;
-  bool mustRevalidate = false;
   /// Zero where it is given in a way that makes no sense.
   std::optional<seconds> maximumAge;
 };
@@ -93,8 +92,6 @@ Directives directivesOf(const HTTPHeaderFields& fields) {
       directives.noStore = true;
     } else if (equalIgnoringCase(name, "no-cache")) {
       directives.noCache = true;
-    } else if (equalIgnoringCase(name, "must-revalidate")) {
-      directives.mustRevalidate = true;
     } else if (equalIgnoringCase(name, "max-age")) {
       const seconds given = secondsFromText(value).value_or(seconds::zero());
       directives.maximumAge = std::min(directives.maximumAge.value_or(given), given);

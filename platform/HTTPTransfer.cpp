@@ -119,7 +119,8 @@ void HTTPTransfer::Exchange::_configure() {
   }
   for (const auto& [name, value] : request.allHTTPHeaderFields()) {
     // A field without a value is spelt differently, or libcurl would leave it out.
-    const std::string line = value.empty() ? name + ";" : name + ": " + value;
+    std::string line = name;
+    line.append(value.empty() ? ";" : ": ").append(value);
     _headers = curl_slist_append(_headers, line.c_str());
   }
   _configureCredential();

@@ -122,9 +122,8 @@ URLCache::URLCache(std::unique_ptr<Implementation> implementation)
     : _implementation(std::move(implementation)) {}
 URLCache::~URLCache() = default;
 
-std::shared_ptr<URLCache> URLCache::initWithMemoryCapacity(size_t memoryCapacity,
-                                                           size_t diskCapacity,
-                                                           std::optional<std::string> directory) {
+std::shared_ptr<URLCache> URLCache::initWithMemoryCapacity(
+    size_t memoryCapacity, size_t diskCapacity, const std::optional<std::string>& directory) {
   return std::shared_ptr<URLCache>(
       new URLCache(std::make_unique<Implementation>(memoryCapacity, diskCapacity, directory)));
 }

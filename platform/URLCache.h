@@ -67,9 +67,8 @@ class URLCache {
   static constexpr size_t defaultDiskCapacity = 20 << 20;
 
   /// Capacities in bytes; without `directory`, memory alone. The folder is made on the first store.
-  static std::shared_ptr<URLCache> initWithMemoryCapacity(size_t memoryCapacity,
-                                                          size_t diskCapacity,
-                                                          std::optional<std::string> directory);
+  static std::shared_ptr<URLCache> initWithMemoryCapacity(
+      size_t memoryCapacity, size_t diskCapacity, const std::optional<std::string>& directory);
   ~URLCache();
 
   /// Null when there is none: never stored, gone, or stored for other values of the header fields

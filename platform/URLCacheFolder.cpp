@@ -63,7 +63,7 @@ std::shared_ptr<const URLCacheRecord> URLCacheFolder::recordForKey(const std::st
   }
   const std::optional<Data> bytes =
       mapped->length() <= capacity() ? files()->contentsAtPath(path) : std::nullopt;
-  const auto record = bytes ? URLCacheRecord::decoded(*bytes) : nullptr;
+  auto record = bytes ? URLCacheRecord::decoded(*bytes) : nullptr;
   if (record == nullptr) {
     const MutexLock writing(_writing);
     _removeFile(name);

@@ -69,8 +69,7 @@ URLSession::~URLSession() = default;
 std::shared_ptr<URLSession> URLSession::sharedSession() {
   // Never destroyed: transfers may go on while the process ends.
   static const auto& shared = *new auto([] {
-    const auto session =
-        sessionWithConfiguration(URLSessionConfiguration::defaultSessionConfiguration());
+    auto session = sessionWithConfiguration(URLSessionConfiguration::defaultSessionConfiguration());
     session->_implementation->isShared = true;
     return session;
   }());

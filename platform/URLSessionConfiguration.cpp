@@ -8,13 +8,14 @@
 
 namespace platform {
 
-URLSessionConfiguration URLSessionConfiguration::ephemeralSessionConfiguration() {
-  URLSessionConfiguration configuration;
-  const int64_t setting = Environment::current()->userDefaults->integerForKey(maximumBodyLengthKey);
-  if (setting > 0) {
-    configuration._maximumBodyLength = static_cast<uint64_t>(setting);
+URLSessionConfiguration URLSessionConfiguration::ephemeralSessionConfiguration() { return {}; }
+
+uint64_t URLSessionConfiguration::maximumBodyLength() const {
+  if (_maximumBodyLength) {
+    return *_maximumBodyLength;
   }
-  return configuration;
+  const int64_t setting = Environment::current()->userDefaults->integerForKey(maximumBodyLengthKey);
+  return setting > 0 ? static_cast<uint64_t>(setting) : standardMaximumBodyLength;
 }
 
 URLSessionConfiguration URLSessionConfiguration::defaultSessionConfiguration() {

@@ -19,12 +19,11 @@ struct URLProtocolClass;
 /// Thread-safety: as any value, confined to one thread while it is changed.
 class URLSessionConfiguration {
  public:
-  /// Settings that the user may make, in bytes, of the user defaults: the greatest body that a
-  /// transfer may have.
+  /// A setting of the user defaults, in bytes: the greatest body that a transfer may have.
   static constexpr const char* maximumBodyLengthKey = "MaximumDownloadLength";
   static constexpr uint64_t standardMaximumBodyLength = uint64_t{256} << 20;
 
-  /// With the shared cache, the greatest body that the user's settings allow, and no cookies.
+  /// With the shared cache, and no cookies.
   static URLSessionConfiguration defaultSessionConfiguration();
   /// The same without any cache.
   static URLSessionConfiguration ephemeralSessionConfiguration();
@@ -39,8 +38,9 @@ class URLSessionConfiguration {
   void setTimeoutIntervalForResource(Seconds interval) { _timeoutIntervalForResource = interval; }
 
   /// The greatest body in bytes, after its content encoding was undone; a transfer that brings more
-  /// ends with URLErrorDataLengthExceedsMaximum.
-  uint64_t maximumBodyLength() const { return _maximumBodyLength; }
+  /// ends with URLErrorDataLengthExceedsMaximum. What the user's settings say at the time, or the
+  /// standard, until it is set.
+  uint64_t maximumBodyLength() const;
   void setMaximumBodyLength(uint64_t length) { _maximumBodyLength = length; }
 
   /// Fields for every request that has none of the name itself. They stay with the request's server
@@ -72,7 +72,8 @@ class URLSessionConfiguration {
   bool _usesSharedCache = false;
   std::shared_ptr<platform::URLCache> _cache;
   Seconds _timeoutIntervalForResource{3600};
-  uint64_t _maximumBodyLength = standardMaximumBodyLength;
+  /// Absent for what the settings say.
+  std::optional<uint64_t> _maximumBodyLength;
   HTTPHeaderFields _additionalHeaders;
   bool _shouldSetCookies = false;
   std::vector<std::shared_ptr<const URLProtocolClass>> _protocolClasses;

@@ -154,12 +154,14 @@ void URLSessionTaskCore::takeData(const Data& data) {
     complete(URLError(URLErrorUnknown, "a body without a head"));
     return;
   }
+  uint64_t limit = 0;
   {
     const MutexLock lock(mutex);
     backlog -= std::min<uint64_t>(backlog, data.length());
+    limit = transferSettings.maximumBodyLength;
   }
   delivered += data.length();
-  if (delivered > configuration.maximumBodyLength()) {
+  if (delivered > limit) {
     complete(URLError(URLErrorDataLengthExceedsMaximum));
     return;
   }

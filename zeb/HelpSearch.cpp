@@ -10,7 +10,6 @@
 #include "host/Zebrine/ZEBResult.h"
 #include "platform/Environment.h"
 #include "platform/Files.h"
-#include "platform/OperationQueue.h"
 #include "platform/Processes.h"
 #include "platform/RunLoop.h"
 #include "platform/Strings.h"
@@ -328,9 +327,7 @@ HelpSearch::Indexing HelpSearch::makeIndexes(const std::vector<std::string>& boo
         for (const std::string& bookID : _implementation->reports->take()) {
           tell(bookID);
         }
-        // What waits for a thread holds no guard yet.
-        return collector->ended() && platform::OperationQueue::unfinishedOperationCount() == 0 &&
-               _implementation->host->owner().isQuietFor(quietSpan) &&
+        return collector->ended() && _implementation->host->owner().isQuietFor(quietSpan) &&
                _implementation->reports->areQuietFor(modelSpan);
       },
       limit);

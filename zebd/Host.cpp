@@ -3,12 +3,14 @@
 #include <algorithm>
 #include <utility>
 
+#include "host/Luxwell/HelpLUXModel.h"
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "host/Zebrine/ZEBPlugin.h"
 #include "host/Zebrine/ZEBQuery.h"
 #include "platform/Environment.h"
 #include "platform/RunLoop.h"
+#include "platform/UserDefaults.h"
 #include "platform/WorkerThreads.h"
 #include "zebd/PluginLoader.h"
 
@@ -18,6 +20,9 @@ namespace {
 
 /// Indexing tools take the blanks from the ends of anchors, so no page carries this one.
 constexpr const char* anchorOfNoPage = " ";
+
+/// The setting with the group list.
+constexpr const char* modelGroupsKey = "ModelGroups";
 
 /// How soon the main thread notices what no block of its loop tells it.
 constexpr platform::Seconds pace{0.01};
@@ -33,6 +38,9 @@ Host::~Host() { _owner->setBookModifiedHandler(nullptr); }
 
 std::unique_ptr<Host> Host::start(const std::string& pluginBundlePath, OwnerSettings settings,
                                   platform::Error& error) {
+  if (const auto defaults = platform::Environment::current()->userDefaults) {
+    HelpLUXModel::setGroupList(defaults->valueForKey(modelGroupsKey));
+  }
   const auto bookshelf = std::make_shared<Bookshelf>();
   std::unique_ptr<Host> host(
       new Host(bookshelf, std::make_shared<Owner>(bookshelf, std::move(settings))));

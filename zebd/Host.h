@@ -25,7 +25,8 @@ namespace zebd {
 /// Thread-safety: internally synchronised, where a function does not say otherwise.
 class Host {
  public:
-  /// On the main thread. Null, with `error` set, when the plug-in cannot be loaded.
+  /// On the main thread. Null, with `error` set, when the plug-in cannot be loaded. Groups of
+  /// models come from the user's setting "ModelGroups" (docs/formats/group-list.md).
   static std::unique_ptr<Host> start(const std::string& pluginBundlePath, OwnerSettings settings,
                                      platform::Error& error);
   ~Host();

@@ -6,6 +6,7 @@
 #include "host/Zebrine/ZEBLog.h"
 #include "host/Zebrine/ZEBQuery.h"
 #include "platform/Environment.h"
+#include "platform/OperationQueue.h"
 #include "platform/Value.h"
 
 namespace zebd {
@@ -76,8 +77,10 @@ int64_t Owner::shutdownGuardCount() const {
 
 bool Owner::isQuietFor(platform::Seconds span) const {
   const platform::Clock::Instant now = elapsedNow();
+  // What waits for a thread holds no guard yet.
+  const bool isUnderWay = platform::OperationQueue::unfinishedOperationCount() > 0;
   const platform::MutexLock lock(_guardMutex);
-  return _guardCount == 0 && now - _quietSince >= span;
+  return !isUnderWay && _guardCount == 0 && now - _quietSince >= span;
 }
 
 void Owner::setIdleTimeOutDelay(const platform::Value& delay) {

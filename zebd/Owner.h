@@ -79,7 +79,8 @@ class Owner : public ZEBPluginOwner {
 
   /// How many guards are held now.
   int64_t shutdownGuardCount() const;
-  /// Whether no guard has been held for `span`. Work begets work, with gaps between.
+  /// Whether no guard has been held for `span`, and no operation of the process waits or runs. Work
+  /// begets work, with gaps between.
   bool isQuietFor(platform::Seconds span) const;
 
   /// What the plug-in last asked for; absent when it has not, or not with a number above 0.

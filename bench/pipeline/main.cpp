@@ -59,11 +59,10 @@ void measureQuality(const std::vector<std::string>& folders, const std::string& 
         return std::find(only.begin(), only.end(), collection.name) == only.end();
       });
     }
-    std::printf("### Collections\n\n%s\n", collectionTables(collections, work.path()).c_str());
+    std::printf("Collections:\n\n%s\n", collectionTables(collections, work.path()).c_str());
   }
   if (withKnownPages && !packages.empty()) {
-    std::printf("### Known pages in all books at once\n\n%s",
-                knownPageTable(made, packages, work.path()).c_str());
+    std::printf("Known pages:\n\n%s", knownPageTable(made, packages, work.path()).c_str());
   }
 }
 

@@ -31,6 +31,7 @@ ChildProcess::ChildProcess(const std::string& program, const std::vector<std::st
   words.push_back(program);
   words.insert(words.end(), arguments.begin(), arguments.end());
   std::vector<char*> pointers;
+  pointers.reserve(words.size() + 1);
   for (std::string& word : words) {
     pointers.push_back(word.data());
   }

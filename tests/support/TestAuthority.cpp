@@ -27,7 +27,7 @@ TestAuthority::TestAuthority()
 
 TestAuthority::Identity TestAuthority::_issue(const std::string& name,
                                               const std::string& alternativeNames, int days) const {
-  const Identity identity{_folder.path(name + ".pem"), _folder.path(name + ".key")};
+  Identity identity{_folder.path(name + ".pem"), _folder.path(name + ".key")};
   const std::string request = _folder.path(name + ".csr");
   runToEnd(openssl, {"req", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256", "-nodes",
                      "-keyout", identity.keyFile, "-out", request, "-subj", "/CN=" + name});

@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "host/Luxwell/HelpLUXModel.h"
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "host/Zebrine/ZEBPlugin.h"
@@ -17,6 +18,7 @@
 #include "platform/Exception.h"
 #include "platform/Processes.h"
 #include "platform/RunLoop.h"
+#include "platform/UserDefaults.h"
 #include "platform/WorkerThreads.h"
 #include "tests/platform/QuickClock.h"
 #include "tests/platform/TemporaryFolder.h"
@@ -263,6 +265,23 @@ TEST_F(HostTest, CancelledSearchFinishesWithoutResults) {
   host->startSearch(query, receiver);
   EXPECT_TRUE(Host::runMainLoopUntil([&] { return receiver->ended(); }, ample));
   EXPECT_THAT(receiver->titles(), IsEmpty());
+}
+
+TEST_F(HostTest, TakesTheGroupsOfModelsFromTheSettings) {
+  using Dictionary = platform::Value::Dictionary;
+  platform::Environment environment = *platform::Environment::current();
+  environment.userDefaults = platform::userDefaultsFromDictionary(
+      {{"ModelGroups",
+        Dictionary{{"Groups", Dictionary{{"Plants", Dictionary{{"Weight", 2.0}}}}}}}});
+  {
+    const platform::EnvironmentOverride override(environment);
+    EXPECT_NE(startHost(), nullptr);
+    EXPECT_THAT(HelpLUXModel::allModelGroupNames(), ElementsAre("Default", "Plants"));
+  }
+  environment.userDefaults = platform::userDefaultsFromDictionary({});
+  const platform::EnvironmentOverride override(environment);
+  EXPECT_NE(startHost(), nullptr);
+  EXPECT_THAT(HelpLUXModel::allModelGroupNames(), ElementsAre("Default"));
 }
 
 TEST_F(HostTest, GuardIsEvenAfterEverything) {

@@ -9,6 +9,7 @@
 
 #include "platform/URLProtocol.h"
 #include "platform/URLSession.h"
+#include "platform/UserDefaults.h"
 #include "tests/platform/network/SessionFixture.h"
 #include "tests/support/ChildProcess.h"
 #include "tests/support/ScriptedServer.h"
@@ -169,6 +170,28 @@ TEST_F(URLSessionAdversityTest, RepairsCarelessRedirects) {
   const Outcome silent = fetch(session, requestOf(server->URL("/silent")));
   EXPECT_EQ(silent.status(), 302);
   EXPECT_EQ(silent.body(), "no address");
+}
+
+TEST_F(URLSessionAdversityTest, TellsNoSuchHostFromNoNetwork) {
+  // A name that no name server has to be asked about.
+  const URLRequest request = requestOf("http://" + std::string(70, 'a') + "/");
+  Environment environment = *Environment::current();
+  for (const bool reachable : {true, false}) {
+    environment.networkIsReachable = [reachable] { return reachable; };
+    const EnvironmentOverride override(environment);
+    EXPECT_EQ(fetch(session, request).code(),
+              reachable ? URLErrorCannotFindHost : URLErrorNotConnectedToInternet);
+  }
+}
+
+TEST_F(URLSessionAdversityTest, TakesTheGreatestBodyFromTheSettingsOfTheMoment) {
+  const auto server = ScriptedServer::sending(httpAnswer(200, std::string(5000, 'x')));
+  EXPECT_EQ(fetch(session, requestOf(server->URL("/"))).code(), 0);
+  Environment environment = *Environment::current();
+  environment.userDefaults =
+      userDefaultsFromDictionary({{URLSessionConfiguration::maximumBodyLengthKey, 4999}});
+  const EnvironmentOverride override(environment);
+  EXPECT_EQ(fetch(session, requestOf(server->URL("/"))).code(), URLErrorDataLengthExceedsMaximum);
 }
 
 TEST_F(URLSessionAdversityTest, RefusesABodyThatIsAnnouncedTooLong) {
