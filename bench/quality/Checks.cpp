@@ -8,6 +8,7 @@
 #include <unordered_map>
 
 #include "bench/quality/IndexedBook.h"
+#include "bench/quality/Metrics.h"
 #include "host/Luxwell/HelpLUXIndex.h"
 #include "host/Luxwell/HelpLUXModel.h"
 #include "host/Luxwell/HelpTokenizer.h"
@@ -71,7 +72,52 @@ std::vector<float> vectorOf(const IndexedBook& book, const LUXModelView& view,
   return sum;
 }
 
+/// Where each character of the query's last word ends, when nothing follows that word.
+std::vector<size_t> endsInLastWord(const IndexedBook& book, const std::string& query) {
+  std::vector<HelpTokenizer::Segment> segments;
+  std::string buffer;
+  book.tokenizer().segmentsOfText(query, segments, buffer);
+  std::vector<size_t> ends;
+  if (segments.empty() || !query.ends_with(segments.back().surface)) {
+    return ends;
+  }
+  for (size_t i = query.size() - segments.back().surface.size(); i < query.size(); ++i) {
+    const bool endsHere =
+        i + 1 == query.size() || (static_cast<unsigned char>(query[i + 1]) & 0xC0U) != 0x80U;
+    if (endsHere) {
+      ends.push_back(i + 1);
+    }
+  }
+  return ends;
+}
+
 }  // namespace
+
+Typed unfinishedQueries(const IndexedBook& book) {
+  constexpr size_t fewestLetters = 4;
+  const auto engine = luxwellEngine(book);
+  Typed result;
+  for (const Query& query : book.collection().queries) {
+    const std::vector<size_t> ends = endsInLastWord(book, query.text);
+    if (ends.size() < fewestLetters) {
+      continue;
+    }
+    const auto gain = [&](size_t length) {
+      constexpr size_t depth = 10;
+      return metricsOfRanking(engine->search(query.text.substr(0, length), depth),
+                              book.collection().answers.at(query.id))
+          .ndcg10;
+    };
+    ++result.count;
+    result.whole += gain(query.text.size());
+    result.half += gain(ends[(ends.size() + 1) / 2 - 1]);
+    result.twoLetters += gain(ends[1]);
+  }
+  for (double* sum : {&result.whole, &result.half, &result.twoLetters}) {
+    *sum /= static_cast<double>(std::max<size_t>(1, result.count));
+  }
+  return result;
+}
 
 Share exactTitles(const IndexedBook& book, std::vector<std::string>* failures) {
   Share share;

@@ -34,6 +34,16 @@ struct CutOff {
 };
 CutOff cutOff(const IndexedBook& book, const std::vector<std::string>& foreignQueries);
 
+/// nDCG@10 of the queries whose last word has four letters or more.
+struct Typed {
+  size_t count = 0;
+  double whole = 0;
+  /// When the query ends in the middle of its last word, and after two letters of it.
+  double half = 0;
+  double twoLetters = 0;
+};
+Typed unfinishedQueries(const IndexedBook& book);
+
 /// Questions about cooking, gardens, sports, law, animals and so on, which no help book answers.
 const std::vector<std::string>& everydayQuestions();
 

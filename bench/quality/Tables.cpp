@@ -124,6 +124,28 @@ std::string checksTable(const std::vector<Result>& results) {
   return text;
 }
 
+std::string typingTable(const std::vector<Result>& results) {
+  std::string text =
+      "| collection | queries | whole | half of the last word | two letters of it |\n"
+      "|---|---:|---:|---:|---:|\n";
+  Typed sum;
+  const auto addRow = [&text](const std::string& name, const std::string& count,
+                              const Typed& typed) {
+    text += fmt::format("| {} | {} | {} | {} | {} |\n", name, count, shortNumber(typed.whole),
+                        shortNumber(typed.half), shortNumber(typed.twoLetters));
+  };
+  for (const Result& result : results) {
+    const Typed& typed = result.typed;
+    addRow(result.name, std::to_string(typed.count), typed);
+    const auto share = 1 / static_cast<double>(results.size());
+    sum.whole += share * typed.whole;
+    sum.half += share * typed.half;
+    sum.twoLetters += share * typed.twoLetters;
+  }
+  addRow("**mean**", "", sum);
+  return text;
+}
+
 std::string suggestionsTable(const std::vector<Result>& results) {
   std::string text =
       "| collection | phrases | completed after four letters | by frequency | similar searches | "
@@ -159,7 +181,8 @@ std::string originList(const std::vector<Result>& results) {
 
 std::string tables(const std::vector<Result>& results, bool withChecks) {
   std::string text = "### nDCG@10\n\n" + rankingTable(results) + "\n### Other measures\n\n" +
-                     otherMeasuresTable(results);
+                     otherMeasuresTable(results) + "\n### Words still being typed\n\n" +
+                     typingTable(results);
   if (withChecks) {
     text += "\n### Titles and foreign questions\n\n" + checksTable(results) +
             "\n### Suggestions\n\n" + suggestionsTable(results);

@@ -33,6 +33,7 @@ struct Result {
   size_t queryCount = 0;
   std::map<std::string, Measured> engines;
   Share titles;
+  Typed typed;
   CutOff everyday;
   CutOff foreign;
   SuggestionRanks completions;

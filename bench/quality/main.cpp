@@ -50,6 +50,7 @@ Result measuredCollection(const Collection& collection, const std::vector<std::s
   result.engines[xapianTitles] = measuredEngine(*xapianEngine(collection, 4), collection);
   result.engines[sqlite] = measuredEngine(*sqliteEngine(collection), collection);
   result.engines[bm25] = measuredEngine(*bm25Engine(book), collection);
+  result.typed = unfinishedQueries(book);
   if (withChecks) {
     std::vector<std::string> failures;
     result.titles = exactTitles(book, &failures);

@@ -47,11 +47,26 @@ std::optional<std::vector<LUXTokenCounts::Entry>> entriesOfRecord(std::string_vi
     if (number >= tokenCount || title > UINT32_MAX || body > UINT32_MAX) {
       return std::nullopt;
     }
-    entries.push_back(
-        {static_cast<uint32_t>(number), static_cast<uint32_t>(title), static_cast<uint32_t>(body)});
+    entries.push_back({static_cast<uint32_t>(number), static_cast<uint32_t>(title),
+                       static_cast<uint32_t>(body), LUXTokenCount::farDown});
     next = number + 1;
   }
   return entries;
+}
+
+// Puts into the entries where they begin; leaves them as they are when the record is not theirs.
+void addPlaces(std::string_view record, uint32_t firstWithoutPlace,
+               std::vector<LUXTokenCounts::Entry>& entries) {
+  const auto end = std::partition_point(entries.begin(), entries.end(), [&](const auto& entry) {
+    return entry.number < firstWithoutPlace;
+  });
+  if (record.size() != static_cast<size_t>(end - entries.begin())) {
+    return;
+  }
+  const uint8_t* place = bytesOf(record);
+  for (auto entry = entries.begin(); entry != end; ++entry) {
+    entry->wordsBefore = *place++;
+  }
 }
 
 }  // namespace
@@ -91,6 +106,7 @@ struct HelpLUXIndex::Lazy {
 
   std::once_flag countsOnce;
   LUXRecords counts;
+  LUXRecords places;
 
   platform::Mutex mutex;
   std::weak_ptr<const LUXTokenTable> table GUARDED_BY(mutex);
@@ -177,8 +193,10 @@ std::shared_ptr<const LUXTokenTable> HelpLUXIndex::_table() const {
 
 LUXTokenCounts HelpLUXIndex::tokenCountsForKey(std::string_view key) const {
   const std::optional<size_t> index = _documents().indexOfKey(key);
-  std::call_once(_lazy->countsOnce,
-                 [this] { _lazy->counts = recordsOfSection(_sections, countsSectionType); });
+  std::call_once(_lazy->countsOnce, [this] {
+    _lazy->counts = recordsOfSection(_sections, countsSectionType);
+    _lazy->places = recordsOfSection(_sections, placesSectionType);
+  });
   if (!index || *index >= _lazy->counts.count()) {
     return {};
   }
@@ -187,7 +205,13 @@ LUXTokenCounts HelpLUXIndex::tokenCountsForKey(std::string_view key) const {
     return {};
   }
   auto entries = entriesOfRecord(_lazy->counts[*index], table->size());
-  return entries ? LUXTokenCounts(std::move(table), std::move(*entries)) : LUXTokenCounts();
+  if (!entries) {
+    return {};
+  }
+  if (*index < _lazy->places.count()) {
+    addPlaces(_lazy->places[*index], table->startOfKind(LUXTokenKind::phrase), *entries);
+  }
+  return {std::move(table), std::move(*entries)};
 }
 
 platform::Value HelpLUXIndex::fileProperitesForKey(std::string_view key) const {

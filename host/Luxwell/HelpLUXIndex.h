@@ -44,7 +44,8 @@ inline constexpr const char* HelpDocPropertyExcludeFromSearch = "HelpDocProperty
 ///
 /// The object is a view of the bytes that it was made from and keeps them alive. Opening looks at
 /// the attributes only. A section is checked when it is first used; one that is damaged counts as
-/// not there: without keys there are no documents, without token counts every page is empty.
+/// not there: without keys there are no documents, without token counts every page is empty, and
+/// without places every token is LUXTokenCount::farDown.
 /// Thread-safety: immutable; what is made at first use is internally synchronised.
 class HelpLUXIndex {
  public:
@@ -56,8 +57,10 @@ class HelpLUXIndex {
   static constexpr uint32_t keysSectionType = 3;
   /// … their properties …
   static constexpr uint32_t propertiesSectionType = 4;
-  /// … and the tokens.
+  /// … the tokens …
   static constexpr uint32_t tokensSectionType = 5;
+  /// … and where in each document its tokens begin.
+  static constexpr uint32_t placesSectionType = 6;
 
   // Flags of a document's properties.
   static constexpr uint32_t excludedFlag = 1;

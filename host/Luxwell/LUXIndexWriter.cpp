@@ -66,7 +66,8 @@ struct Surface {
 // A name that is made of several words.
 struct Whole {
   uint32_t form = 0;
-  bool inTitle = false;
+  // Of its last word in the page.
+  size_t place = 0;
 };
 
 struct Page {
@@ -119,7 +120,7 @@ struct LUXIndexWriter::Implementation {
     return number;
   }
 
-  void addText(std::string_view text, bool isTitle, Page& page) {
+  void addText(std::string_view text, Page& page) {
     segments.clear();
     tokenizer->segmentsOfText(text, segments, buffer);
     bool breaks = true;
@@ -131,7 +132,7 @@ struct LUXIndexWriter::Implementation {
       }
       if (!segment.whole.empty() && !breaks) {
         if (const std::string form = tokenizer->formOfSurface(segment.whole); !form.empty()) {
-          page.wholes.push_back({forms.numberOf(form), isTitle});
+          page.wholes.push_back({forms.numberOf(form), page.sequence.words.size()});
         }
       }
       page.sequence.words.push_back({number, breaks});
@@ -192,7 +193,7 @@ struct LUXIndexWriter::Implementation {
     return finder;
   }
 
-  // Calls the sink with the stems of each pair that makes a bigram, and whether it is in the title.
+  // Calls the sink with the stems of each pair that makes a bigram, and the place of the second.
   template <typename Sink>
   void forEachBigram(const Page& page, Sink sink) const {
     uint32_t before = none;
@@ -200,7 +201,7 @@ struct LUXIndexWriter::Implementation {
       const LUXWordSequence::Word& word = page.sequence.words[at];
       const uint32_t stem = surfaces[word.number].stem;
       if (before != none && stem != none && !word.breaksChain) {
-        sink(static_cast<uint64_t>(before) << 32U | stem, at < page.sequence.titleLength);
+        sink(static_cast<uint64_t>(before) << 32U | stem, at);
       }
       before = stem;
     }
@@ -210,7 +211,7 @@ struct LUXIndexWriter::Implementation {
   std::vector<std::string> numberBigrams() {
     std::vector<std::string> names;
     for (const Page& page : pages) {
-      forEachBigram(page, [&](uint64_t pair, bool) {
+      forEachBigram(page, [&](uint64_t pair, size_t) {
         if (bigrams.emplace(pair, static_cast<uint32_t>(names.size())).second) {
           names.push_back(stems[pair >> 32U] + ' ' + stems[pair & 0xFFFFFFFFU]);
         }
@@ -273,22 +274,26 @@ struct LUXIndexWriter::Implementation {
   }
 
   void addWords(const Page& page, LUXTokenSections& sections) const {
-    const auto add = [&](LUXTokenKind kind, uint32_t token, bool inTitle) {
-      sections.add(kind, token, inTitle ? 1 : 0, inTitle ? 0 : 1);
+    const size_t titleLength = page.sequence.titleLength;
+    const auto add = [&](LUXTokenKind kind, uint32_t token, size_t at) {
+      if (at < titleLength) {
+        sections.add(kind, token, 1, 0, 0);
+      } else {
+        const size_t before = std::min<size_t>(at - titleLength, LUXTokenCount::farDown);
+        sections.add(kind, token, 0, 1, static_cast<uint8_t>(before));
+      }
     };
     for (size_t at = 0; at < page.sequence.words.size(); ++at) {
       const Surface& surface = surfaces[page.sequence.words[at].number];
-      const bool inTitle = at < page.sequence.titleLength;
-      add(LUXTokenKind::form, surface.form, inTitle);
+      add(LUXTokenKind::form, surface.form, at);
       if (surface.stem != none) {
-        add(LUXTokenKind::stem, surface.stem, inTitle);
+        add(LUXTokenKind::stem, surface.stem, at);
       }
     }
-    forEachBigram(page, [&](uint64_t pair, bool inTitle) {
-      add(LUXTokenKind::bigram, bigrams.at(pair), inTitle);
-    });
+    forEachBigram(
+        page, [&](uint64_t pair, size_t at) { add(LUXTokenKind::bigram, bigrams.at(pair), at); });
     for (const Whole& whole : page.wholes) {
-      add(LUXTokenKind::form, whole.form, whole.inTitle);
+      add(LUXTokenKind::form, whole.form, whole.place);
     }
   }
 
@@ -335,7 +340,8 @@ struct LUXIndexWriter::Implementation {
                 section(HelpLUXIndex::countsSectionType, sections.countBytes()),
                 section(HelpLUXIndex::keysSectionType, keyRecords().finish()),
                 section(HelpLUXIndex::propertiesSectionType, propertyRecords().finish()),
-                section(HelpLUXIndex::tokensSectionType, sections.tokenBytes())})
+                section(HelpLUXIndex::tokensSectionType, sections.tokenBytes()),
+                section(HelpLUXIndex::placesSectionType, sections.placeBytes())})
         .write();
   }
 };
@@ -354,10 +360,10 @@ void LUXIndexWriter::addDocument(const LUXDocument& document) {
   }
   Page page{
       document.key, document.title, document.description, document.excludedFromSearch, {}, {}};
-  _implementation->addText(document.title, true, page);
+  _implementation->addText(document.title, page);
   page.sequence.titleLength = page.sequence.words.size();
   for (const std::string& block : document.blocks) {
-    _implementation->addText(block, false, page);
+    _implementation->addText(block, page);
   }
   _implementation->pages.push_back(std::move(page));
 }

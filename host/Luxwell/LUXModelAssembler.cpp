@@ -42,8 +42,10 @@ double bodyLengthFactor(double length, double average) noexcept {
   return relativeLength(length, average, luxmodel::bodyLengthShare, luxmodel::bodyLengthExponent);
 }
 
-uint32_t impactOf(double count) noexcept {
-  const double share = count / (luxmodel::saturation + count);
+uint32_t impactOf(double count, uint8_t wordsBefore) noexcept {
+  const double often = count / (luxmodel::saturation + count);
+  const double early = luxmodel::earlyHalfLength / (luxmodel::earlyHalfLength + wordsBefore);
+  const double share = (often + luxmodel::earlyShare * early) / (1 + luxmodel::earlyShare);
   return std::max(1U, static_cast<uint32_t>(std::lround(luxposting::maximumImpact * share)));
 }
 
@@ -279,7 +281,8 @@ void LUXModelAssembler::_addPostings(LUXTokenKind kind) {
       const uint32_t impact =
           kind == title
               ? luxposting::maximumImpact
-              : impactOf(occurrence.titleCount * titleFactor + occurrence.bodyCount * bodyFactor);
+              : impactOf(occurrence.titleCount * titleFactor + occurrence.bodyCount * bodyFactor,
+                         occurrence.wordsBefore);
       postings[next[numbers[occurrence.token]]++] = luxposting::posting(i, impact);
     }
   }

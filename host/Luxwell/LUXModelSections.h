@@ -8,7 +8,7 @@
 #include "host/Luxwell/LUXTokenCounts.h"
 
 /// A model in the container that book data uses too.
-inline constexpr LUXContainerForm LUXModelForm{"LUXMODEL", 1, 0};
+inline constexpr LUXContainerForm LUXModelForm{"LUXMODEL", 2, 0};
 
 namespace luxmodel {
 

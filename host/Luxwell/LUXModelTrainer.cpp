@@ -13,8 +13,9 @@ constexpr uint32_t unknown = 0xFFFFFFFF;
 // A pair that is none.
 constexpr uint32_t ignored = 0xFFFFFFFE;
 
-uint16_t clamped(uint32_t count) noexcept {
-  return static_cast<uint16_t>(std::min<uint32_t>(count, std::numeric_limits<uint16_t>::max()));
+template <typename Integer>
+Integer clamped(uint32_t count) noexcept {
+  return static_cast<Integer>(std::min<uint32_t>(count, std::numeric_limits<Integer>::max()));
 }
 
 // Puts the occurrences from `from` on in order, each token once.
@@ -28,8 +29,9 @@ void merge(std::vector<LUXOccurrence>& all, size_t from) {
       continue;
     }
     if (it->token == last->token) {
-      last->titleCount = clamped(uint32_t{last->titleCount} + it->titleCount);
-      last->bodyCount = clamped(uint32_t{last->bodyCount} + it->bodyCount);
+      last->titleCount = clamped<uint8_t>(uint32_t{last->titleCount} + it->titleCount);
+      last->bodyCount = clamped<uint16_t>(uint32_t{last->bodyCount} + it->bodyCount);
+      last->wordsBefore = std::min(last->wordsBefore, it->wordsBefore);
     } else {
       *++last = *it;
     }
@@ -95,7 +97,8 @@ void LUXModelTrainer::addPage(const LUXTokenCounts& tokenCounts,
     }
     if (number != ignored && (count.titleCount > 0 || count.bodyCount > 0)) {
       _data.occurrencesOf(count.kind)
-          .all.push_back({number, clamped(count.titleCount), clamped(count.bodyCount)});
+          .all.push_back({number, clamped<uint16_t>(count.bodyCount),
+                          clamped<uint8_t>(count.titleCount), count.wordsBefore});
     }
   }
   if (keywords) {
@@ -122,10 +125,10 @@ void LUXModelTrainer::_addKeywords(const std::vector<std::string>& keywords) {
   }
   for (const HelpTokenizer::Word& word : words) {
     _data.occurrencesOf(LUXTokenKind::form)
-        .all.push_back({_data.stringsOf(LUXTokenKind::form).numberOf(word.form), 1, 0});
+        .all.push_back({_data.stringsOf(LUXTokenKind::form).numberOf(word.form), 0, 1, 0});
     if (!word.isStopWord) {
       _data.occurrencesOf(LUXTokenKind::stem)
-          .all.push_back({_data.stringsOf(LUXTokenKind::stem).numberOf(word.stem), 1, 0});
+          .all.push_back({_data.stringsOf(LUXTokenKind::stem).numberOf(word.stem), 0, 1, 0});
     }
   }
   for (const LUXTokenKind kind : {LUXTokenKind::stem, LUXTokenKind::form}) {

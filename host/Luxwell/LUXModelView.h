@@ -19,10 +19,12 @@ class LUXSectionedData;
 
 /// How much a page is worth for a term, and which page: what a list of postings consists of.
 ///
-/// The impact is round(1023 * tf / (k1 + tf)), at least 1, where tf is the page's count of the
-/// term, weighted by field and divided by the field's relative length (S. Robertson, H. Zaragoza,
-/// "The probabilistic relevance framework: BM25 and beyond", 2009); luxmodel has the constants. A
-/// query multiplies it by the term's own weight and has nothing else to compute.
+/// The impact is round(1023 * (tf / (k1 + tf) + e * early) / (1 + e)), at least 1, where tf is the
+/// page's count of the term, weighted by field and divided by the field's relative length
+/// (S. Robertson, H. Zaragoza, "The probabilistic relevance framework: BM25 and beyond", 2009), and
+/// `early` is 1 for a term that the page begins with and falls to 1/2 after h words: pages say
+/// first what they are about. luxmodel has the constants. A query multiplies it by the term's own
+/// weight and has nothing else to compute.
 namespace luxposting {
 
 inline constexpr unsigned impactBits = 10;
@@ -50,6 +52,10 @@ inline constexpr double titleLengthShare = 0.5;
 inline constexpr double titleLengthExponent = 1;
 inline constexpr double bodyLengthShare = 0.9;
 inline constexpr double bodyLengthExponent = 0.55;
+/// What it is worth beside all occurrences that a page begins with a term (e), and after how many
+/// words it is worth half of that (h).
+inline constexpr double earlyShare = 0.25;
+inline constexpr double earlyHalfLength = 30;
 
 /// Pages from which on there are neighbourhoods.
 inline constexpr size_t neighbourhoodPageCount = 512;

@@ -114,7 +114,7 @@ bool isOperatorWord(std::string_view word) {
   const bool isPrefixed = word.size() > 1 && (first == '-' || first == '!' || first == '+') &&
                           (word[1] == '"' || word[1] == '(' || isLetterOrLater(word[1]));
   const bool isStarred = word.size() > 1 && word.back() == '*' && first != '*';
-  return isPrefixed || isStarred || word == "|" || word == "&";
+  return isPrefixed || isStarred || word == "|";
 }
 
 }  // namespace

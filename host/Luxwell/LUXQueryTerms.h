@@ -13,9 +13,10 @@
 using LUXIsCancelled = std::function<bool()>;
 
 /// Whether a short text is written in the language of keyword searches: with words that must or
-/// must not occur ("-word", "!word", "+word"), alternatives ("|", "&" between blanks), unfinished
-/// words ("wor*") or phrases in double quotation marks. Such a text says exactly what is to be
-/// found, and is no question. Texts of more than eight words are questions whatever is in them.
+/// must not occur ("-word", "!word", "+word"), alternatives ("|" between blanks), unfinished words
+/// ("wor*") or phrases in double quotation marks. Such a text says exactly what is to be found, and
+/// is no question. "&" between blanks is no sign of it: people write it for "and". Texts of more
+/// than eight words are questions whatever is in them.
 bool LUXQueryHasOperators(std::string_view text);
 
 /// The terms of a text, each once with the number of times that it occurs; stems and forms in order

@@ -39,6 +39,8 @@ inline constexpr float formWeight = 0.15F;
 /// The most that meaning may count for, and the number of terms over which it comes up to that.
 inline constexpr float latentWeight = 0.2F;
 inline constexpr float latentTerms = 6;
+/// The most that longer words count for beside a known one that is still being typed.
+inline constexpr float continuationWeight = 0.6F;
 /// Exact titles have 1; whatever else is found stays below what counts as named by the user.
 inline constexpr float exactTitleScore = 1;
 inline constexpr float highestScore = 0.989F;
@@ -66,9 +68,11 @@ inline constexpr float shareAboveCutoff = 0.3F;
 /// counting as the rarest: without it queries about other subjects find something by their common
 /// words. A page whose title is the query has 1.
 ///
-/// A last word that is still being typed and is unknown, or known to few pages, counts as whichever
-/// words begin with it; so does any other word that is unknown, but it stays half unknown. A query
-/// of stop words alone is looked up by forms, without meaning.
+/// A last word that is still being typed and is unknown counts as whichever words begin with it; so
+/// does any other word that is unknown, but it stays half unknown. One that is known may still
+/// become a longer word: pages that have a longer one alone count a share of what that is worth,
+/// the share that they are of all pages with either. A query of stop words alone is looked up by
+/// forms, without meaning.
 ///
 /// Pages that share no word with the query can have w * cosine at most. They are looked at only
 /// where fewer pages than wanted share a word with it.

@@ -1,8 +1,9 @@
 #include "host/Luxwell/LUXScoringPlan.h"
 
 #include <algorithm>
+#include <array>
+#include <bit>
 #include <cmath>
-#include <functional>
 #include <limits>
 #include <optional>
 #include <utility>
@@ -13,15 +14,14 @@
 
 namespace {
 
-// A word that is being typed is expanded from this many bytes on, if no more pages than this have
-// the word itself; another word, if no page has it. It stands for so many of the most frequent
-// words at most, chosen among so many in order.
+// A word that is being typed stands for those that begin with it from this many bytes on; another
+// word, if no page has it. They are so many of the most frequent words at most, chosen among so
+// many in order. Words that more than half of the pages have are not among them.
 constexpr size_t shortestUnfinished = 2;
 constexpr size_t shortestUnknown = 3;
 // In texts of more terms than this, words that are not known are left alone: there are enough
 // others, and each costs as much as a query.
 constexpr size_t mostTermsExpanded = 32;
-constexpr uint32_t fewPages = 2;
 constexpr size_t mostExpansions = 32;
 constexpr uint32_t mostConsidered = 4096;
 
@@ -91,6 +91,10 @@ class Planner {
 
   void _addList(std::span<const uint32_t> postings, float weight) {
     _bound += weight;
+    _addPostings(postings, weight);
+  }
+
+  void _addPostings(std::span<const uint32_t> postings, float weight) {
     if (!postings.empty()) {
       // The rest of the plan is made while they come.
       const auto* const bytes = reinterpret_cast<const char*>(postings.data());
@@ -111,17 +115,17 @@ class Planner {
     const auto postings = number ? _view.postings(kind, *number) : std::span<const uint32_t>();
     const auto count = static_cast<float>(word.count);
     const float weight = _inverseFrequency(frequency);
-    if (word.token == _terms.unfinishedStem) {
-      if (frequency <= fewPages && _terms.unfinishedForm.size() >= shortestUnfinished) {
-        const float expanded = _expand(_terms.unfinishedForm, postings, count);
-        if (expanded > 0) {
-          _allMass += expanded;
-          return;
-        }
+    const bool isUnfinished =
+        word.token == _terms.unfinishedStem && _terms.unfinishedForm.size() >= shortestUnfinished;
+    if (isUnfinished && frequency == 0) {
+      const float expanded = _expand(_terms.unfinishedForm, count);
+      if (expanded > 0) {
+        _allMass += expanded;
+        return;
       }
     } else if (frequency == 0 && kind == LUXTokenKind::stem &&
                _terms.stems.size() <= mostTermsExpanded && word.token.size() >= shortestUnknown &&
-               _expand(word.token, postings, count) > 0) {
+               _expand(word.token, count) > 0) {
       // It may be half a word, or one of another subject: then what it finds says little.
       _allMass += weight;
       return;
@@ -131,45 +135,103 @@ class Planner {
       _knownMass += weight;
       _addList(postings, count * weight);
     }
+    if (isUnfinished && frequency > 0) {
+      _addContinuations(postings, frequency, count);
+    }
   }
 
-  // Makes one list of all words that begin with a half one: a page has of each posting the best.
-  // Returns its weight; 0 when there are no such words.
-  float _expand(const std::string& prefix, std::span<const uint32_t> own, float count) {
+  // The words that begin with a half one, the most frequent ones where there are many, with the
+  // number of pages that have each.
+  std::vector<std::pair<uint32_t, uint32_t>> _wordsWithPrefix(const std::string& prefix,
+                                                              bool longerOnly) const {
     const auto [first, end] = _view.termRangeWithPrefix(LUXTokenKind::form, prefix);
-    std::vector<std::pair<uint32_t, uint32_t>> expansions;
-    for (uint32_t number = first; number < std::min(end, first + mostConsidered); ++number) {
-      expansions.emplace_back(_view.documentFrequency(LUXTokenKind::form, number), number);
+    std::vector<std::pair<uint32_t, uint32_t>> words;
+    const bool isThere =
+        longerOnly && first < end && _view.term(LUXTokenKind::form, first) == prefix;
+    for (uint32_t number = first + (isThere ? 1 : 0);
+         number < std::min(end, first + mostConsidered); ++number) {
+      const uint32_t frequency = _view.documentFrequency(LUXTokenKind::form, number);
+      if (frequency <= _view.totalPageCount() / 2) {
+        words.emplace_back(frequency, number);
+      }
     }
-    if (expansions.empty()) {
-      return 0;
-    }
-    if (expansions.size() > mostExpansions) {
-      std::partial_sort(expansions.begin(), expansions.begin() + mostExpansions, expansions.end(),
+    if (words.size() > mostExpansions) {
+      std::partial_sort(words.begin(), words.begin() + mostExpansions, words.end(),
                         [](const auto& a, const auto& b) {
                           return a.first != b.first ? a.first > b.first : a.second < b.second;
                         });
-      expansions.resize(mostExpansions);
+      words.resize(mostExpansions);
     }
-    std::vector<uint32_t> all(own.begin(), own.end());
-    for (const auto& [frequency, number] : expansions) {
-      const auto postings = _view.postings(LUXTokenKind::form, number);
-      all.insert(all.end(), postings.begin(), postings.end());
+    return words;
+  }
+
+  // One list of all pages that have any of the words: a page has of each posting the best. Pages
+  // in `without` are left out.
+  std::vector<uint32_t> _pagesWithAny(const std::vector<std::pair<uint32_t, uint32_t>>& words,
+                                      std::span<const uint32_t> without) const {
+    // In steps of four, most of which stay empty.
+    std::vector<std::array<uint16_t, 4>> steps(_view.pageCount() / 4 + 1);
+    const std::span<uint16_t> impacts(steps.front().data(), 4 * steps.size());
+    for (const auto& [frequency, number] : words) {
+      for (const uint32_t posting : _view.postings(LUXTokenKind::form, number)) {
+        const uint32_t page = luxposting::page(posting);
+        if (page < impacts.size()) {
+          impacts[page] =
+              std::max(impacts[page], static_cast<uint16_t>(luxposting::impact(posting)));
+        }
+      }
     }
-    // In descending order the best posting of a page comes before its others.
-    std::sort(all.begin(), all.end(), std::greater<>());
-    all.erase(std::unique(all.begin(), all.end(),
-                          [](uint32_t a, uint32_t b) {
-                            return luxposting::page(a) == luxposting::page(b);
-                          }),
-              all.end());
-    std::reverse(all.begin(), all.end());
+    for (const uint32_t posting : without) {
+      if (luxposting::page(posting) < impacts.size()) {
+        impacts[luxposting::page(posting)] = 0;
+      }
+    }
+    std::vector<uint32_t> all;
+    for (uint32_t first = 0; first < impacts.size(); first += 4) {
+      if (std::bit_cast<uint64_t>(steps[first / 4]) == 0) {
+        continue;
+      }
+      for (uint32_t page = first; page < first + 4; ++page) {
+        if (impacts[page] > 0) {
+          all.push_back(luxposting::posting(page, impacts[page]));
+        }
+      }
+    }
+    return all;
+  }
+
+  // Puts in the place of a word that is not known those that begin with it. Returns their weight; 0
+  // when there are none.
+  float _expand(const std::string& prefix, float count) {
+    std::vector<uint32_t> all = _pagesWithAny(_wordsWithPrefix(prefix, false), {});
+    if (all.empty()) {
+      return 0;
+    }
     const float weight = _inverseFrequency(static_cast<uint32_t>(all.size()));
     _knownMass += weight;
     // The elements of the inner vector stay where they are when the outer one grows.
     _plan.unions.push_back(std::move(all));
     _addList(_plan.unions.back(), count * weight);
     return weight;
+  }
+
+  // A known word may still become a longer one: pages that have not the word but a longer one count
+  // a part of what that one is worth, the more of them there are beside those that have the word.
+  void _addContinuations(std::span<const uint32_t> own, uint32_t frequency, float count) {
+    const auto words = _wordsWithPrefix(_terms.unfinishedForm, true);
+    if (words.empty()) {
+      return;
+    }
+    std::vector<uint32_t> others = _pagesWithAny(words, own);
+    if (others.empty()) {
+      return;
+    }
+    const auto having = static_cast<uint32_t>(others.size());
+    const float share = luxscoring::continuationWeight * static_cast<float>(having) /
+                        static_cast<float>(having + frequency);
+    _plan.unions.push_back(std::move(others));
+    // A page has either the word or a longer one, so that this raises no bound.
+    _addPostings(_plan.unions.back(), count * share * _inverseFrequency(having));
   }
 
   void _addShare(LUXTokenKind kind, std::optional<uint32_t> number, uint32_t count, float share) {

@@ -33,7 +33,7 @@ struct LUXContainerForm {
 };
 
 /// One book's semantic data.
-inline constexpr LUXContainerForm LUXIndexForm{"LUXINDEX", 1, 1};
+inline constexpr LUXContainerForm LUXIndexForm{"LUXINDEX", 1, 2};
 
 /// Sections in order of type, each type once. docs/formats/lux-index.md describes the bytes.
 ///

@@ -146,13 +146,15 @@ LUXTokenCounts LUXTokenCounts::withCounts(const std::vector<LUXTokenCount>& coun
     Entry& entry = kinds[static_cast<size_t>(count.kind)][count.token];
     entry.titleCount += count.titleCount;
     entry.bodyCount += count.bodyCount;
+    entry.wordsBefore = std::min(entry.wordsBefore, count.wordsBefore);
   }
   std::array<std::vector<std::string>, LUXTokenKindCount> tokens;
   std::vector<Entry> entries;
   for (size_t kind = 0; kind < kinds.size(); ++kind) {
     for (const auto& [token, entry] : kinds[kind]) {
       tokens[kind].emplace_back(token);
-      entries.push_back({static_cast<uint32_t>(entries.size()), entry.titleCount, entry.bodyCount});
+      entries.push_back({static_cast<uint32_t>(entries.size()), entry.titleCount, entry.bodyCount,
+                         entry.wordsBefore});
     }
   }
   return {LUXTokenTable::withTokens(tokens), std::move(entries)};
@@ -161,5 +163,5 @@ LUXTokenCounts LUXTokenCounts::withCounts(const std::vector<LUXTokenCount>& coun
 LUXTokenCount LUXTokenCounts::operator[](size_t i) const noexcept {
   const Entry& entry = (*_entries)[i];
   const LUXTokenTable::Token token = _table->tokenAt(entry.number);
-  return {token.token, token.kind, entry.titleCount, entry.bodyCount};
+  return {token.token, token.kind, entry.titleCount, entry.bodyCount, entry.wordsBefore};
 }

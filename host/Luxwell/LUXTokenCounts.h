@@ -32,12 +32,18 @@ inline constexpr size_t LUXTokenKindCount = 5;
 
 /// One token of a page. `token` lives as long as the table that it comes from.
 struct LUXTokenCount {
+  /// The most that `wordsBefore` says: so far down or farther, or nobody knows.
+  static constexpr uint8_t farDown = 255;
+
   std::string_view token;
   LUXTokenKind kind = LUXTokenKind::stem;
   /// In the page's title.
   uint32_t titleCount = 0;
   /// Everywhere else.
   uint32_t bodyCount = 0;
+  /// How many words of the page, its title left out, come before the last word of the token's first
+  /// occurrence; 0 for a token of the title. Known of stems, bigrams and forms.
+  uint8_t wordsBefore = farDown;
 
   friend bool operator==(const LUXTokenCount&, const LUXTokenCount&) = default;
 };
@@ -88,6 +94,7 @@ class LUXTokenCounts {
     uint32_t number = 0;
     uint32_t titleCount = 0;
     uint32_t bodyCount = 0;
+    uint8_t wordsBefore = LUXTokenCount::farDown;
   };
 
   /// No tokens.
@@ -96,7 +103,7 @@ class LUXTokenCounts {
   LUXTokenCounts(std::shared_ptr<const LUXTokenTable> table, std::vector<Entry> entries);
 
   /// Counts with a table of their own, in any order; the counts of a token that occurs twice are
-  /// added.
+  /// added, and it begins where the earlier one does.
   static LUXTokenCounts withCounts(const std::vector<LUXTokenCount>& counts);
 
   size_t size() const noexcept { return _entries->size(); }

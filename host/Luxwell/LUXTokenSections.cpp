@@ -32,18 +32,24 @@ void LUXTokenSections::endPage() {
   std::sort(_page.begin(), _page.end(),
             [](const auto& a, const auto& b) { return a.number < b.number; });
   std::string& bytes = _records.beginRecord();
+  std::string& places = _places.beginRecord();
+  const uint32_t firstWithoutPlace = _table->startOfKind(LUXTokenKind::phrase);
   uint32_t next = 0;
   for (size_t i = 0; i < _page.size();) {
     LUXTokenCounts::Entry sum = _page[i];
     for (++i; i < _page.size() && _page[i].number == sum.number; ++i) {
       sum.titleCount += _page[i].titleCount;
       sum.bodyCount += _page[i].bodyCount;
+      sum.wordsBefore = std::min(sum.wordsBefore, _page[i].wordsBefore);
     }
     const bool isPlain = sum.titleCount == 0 && sum.bodyCount == 1;
     appendVarnumber(bytes, static_cast<uint64_t>(sum.number - next) << 1U | (isPlain ? 0U : 1U));
     if (!isPlain) {
       appendVarnumber(bytes, sum.titleCount);
       appendVarnumber(bytes, sum.bodyCount);
+    }
+    if (sum.number < firstWithoutPlace) {
+      places.push_back(static_cast<char>(sum.wordsBefore));
     }
     next = sum.number + 1;
   }

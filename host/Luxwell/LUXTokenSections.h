@@ -21,17 +21,21 @@ class LUXTokenSections {
   /// The names of each kind's tokens, by the caller's numbers; tokens of one name become one.
   explicit LUXTokenSections(Names names);
 
-  /// Adds to the counts of a token in the page that is being written.
-  void add(LUXTokenKind kind, uint32_t token, uint32_t titleCount, uint32_t bodyCount) {
-    _page.push_back({_numbers[static_cast<size_t>(kind)][token], titleCount, bodyCount});
+  /// Adds to the counts of a token in the page that is being written; it begins at the least of the
+  /// places that it is added with.
+  void add(LUXTokenKind kind, uint32_t token, uint32_t titleCount, uint32_t bodyCount,
+           uint8_t wordsBefore = LUXTokenCount::farDown) {
+    _page.push_back(
+        {_numbers[static_cast<size_t>(kind)][token], titleCount, bodyCount, wordsBefore});
   }
 
   /// Writes the page to which add() has added; the next one begins.
   void endPage();
 
-  /// The bytes of the two sections, when all pages are written.
+  /// The bytes of the three sections, when all pages are written.
   platform::Data tokenBytes() const { return _table->sectionBytes(); }
   platform::Data countBytes() { return _records.finish(); }
+  platform::Data placeBytes() { return _places.finish(); }
 
  private:
   /// By kind and the caller's number, the number in the table.
@@ -39,4 +43,5 @@ class LUXTokenSections {
   std::shared_ptr<const LUXTokenTable> _table;
   std::vector<LUXTokenCounts::Entry> _page;
   LUXRecordsWriter _records;
+  LUXRecordsWriter _places;
 };

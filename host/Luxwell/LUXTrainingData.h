@@ -14,11 +14,13 @@
 
 class HelpTokenizer;
 
-/// A token of a page, by number. Counts stop at what sixteen bits hold.
+/// A token of a page, by number. Counts stop at what their bits hold: there are many of these.
 struct LUXOccurrence {
   uint32_t token = 0;
-  uint16_t titleCount = 0;
   uint16_t bodyCount = 0;
+  uint8_t titleCount = 0;
+  /// See LUXTokenCount.
+  uint8_t wordsBefore = LUXTokenCount::farDown;
 
   uint32_t count() const noexcept { return uint32_t{titleCount} + bodyCount; }
 };

@@ -11,6 +11,7 @@
 
 #include "host/Luxwell/HelpLUXIndex.h"
 #include "host/Luxwell/HelpTokenizer.h"
+#include "host/Luxwell/LUXRecords.h"
 #include "platform/Exception.h"
 #include "platform/PropertyList.h"
 
@@ -187,6 +188,55 @@ TEST(LUXIndexWriter, CountsAreThoseOfBruteForce) {
   }
 }
 
+// By kind and token.
+using Places = std::map<std::pair<LUXTokenKind, std::string>, uint8_t>;
+
+Places placesOf(const HelpLUXIndex& opened, std::string_view key) {
+  const LUXTokenCounts counts = opened.tokenCountsForKey(key);
+  Places places;
+  for (size_t i = 0; i < counts.size(); ++i) {
+    places[std::pair(counts[i].kind, std::string(counts[i].token))] = counts[i].wordsBefore;
+  }
+  return places;
+}
+
+TEST(LUXIndexWriter, TokensKnowHowManyWordsComeBeforeThem) {
+  const auto opened = index({document(
+      "a", "Print queues", {"The jobs of os.path wait.", "Jobs wait in the queue, wait."})});
+  const Places places = placesOf(*opened, "a");
+  const auto place = [&](LUXTokenKind kind, const char* token) {
+    return static_cast<int>(places.at(std::pair(kind, std::string(token))));
+  };
+  using enum LUXTokenKind;
+  EXPECT_EQ(place(form, "the"), 0);
+  EXPECT_EQ(place(form, "jobs"), 1);
+  EXPECT_EQ(place(stem, "job"), 1);
+  EXPECT_EQ(place(form, "os"), 3);
+  EXPECT_EQ(place(form, "os.path"), 4);
+  EXPECT_EQ(place(bigram, "path wait"), 5);
+  EXPECT_EQ(place(stem, "wait"), 5);
+  EXPECT_EQ(place(bigram, "job wait"), 7);
+  // In the title, wherever else.
+  EXPECT_EQ(place(stem, "queue"), 0);
+  EXPECT_EQ(place(form, "queue"), 10);
+  // Nobody asks where phrases and titles are.
+  EXPECT_EQ(place(phrase, "jobs"), LUXTokenCount::farDown);
+  EXPECT_EQ(place(title, "print queue"), LUXTokenCount::farDown);
+}
+
+TEST(LUXIndexWriter, PlacesEndWhereAByteEnds) {
+  std::string text;
+  for (int i = 0; i < 400; ++i) {
+    text += "word" + std::to_string(i) + " ";
+  }
+  const Places places = placesOf(*index({document("a", "", {text})}), "a");
+  using enum LUXTokenKind;
+  EXPECT_EQ(places.at(std::pair(stem, "word254")), 254);
+  EXPECT_EQ(places.at(std::pair(stem, "word255")), 255);
+  EXPECT_EQ(places.at(std::pair(stem, "word256")), 255);
+  EXPECT_EQ(places.at(std::pair(stem, "word399")), 255);
+}
+
 TEST(LUXIndexWriter, PhrasesAreThereFromTwoPagesOnAndWordsAlways) {
   const auto opened = index({document("a", "", {"paper tray", "ink cartridge"}),
                              document("b", "", {"the paper tray of it"})});
@@ -308,6 +358,37 @@ TEST(HelpLUXIndex, SectionsThatAreMissingCountAsEmpty) {
     if (missing == 4) {
       EXPECT_EQ(opened->fileProperitesForKey("a.html"), Value(Value::Dictionary{}));
     }
+  }
+}
+
+TEST(HelpLUXIndex, WithoutPlacesEveryTokenIsFarDown) {
+  const auto sections = LUXSectionedData::read(written(example()));
+  ASSERT_TRUE(sections);
+  for (const bool areWrong : {false, true}) {
+    std::vector<LUXSection> rest;
+    for (const LUXSection& section : sections->sections()) {
+      if (section.type != HelpLUXIndex::placesSectionType) {
+        rest.push_back(section);
+      }
+    }
+    if (areWrong) {
+      // Records of the wrong length.
+      LUXRecordsWriter records;
+      for (int i = 0; i < 3; ++i) {
+        records.beginRecord() += "x";
+      }
+      rest.push_back(
+          LUXSection::sectionWithBytes(HelpLUXIndex::placesSectionType, records.finish()));
+    }
+    const auto opened = HelpLUXIndex::initWithVersionedData(LUXSectionedData(rest).write());
+    ASSERT_NE(opened, nullptr);
+    const Places places = placesOf(*opened, "a.html");
+    EXPECT_FALSE(places.empty());
+    for (const auto& [token, place] : places) {
+      EXPECT_EQ(place, LUXTokenCount::farDown) << token.second;
+    }
+    EXPECT_EQ(countsOf(*opened, "a.html"),
+              countsOf(*HelpLUXIndex::initWithVersionedData(written(example())), "a.html"));
   }
 }
 

@@ -120,8 +120,8 @@ LUXTrainingData dataOfPages(const std::vector<ModelPage>& pages) {
       if (count.kind == LUXTokenKind::phrase) {
         data.occurrencesOf(count.kind)
             .all.push_back({data.stringsOf(count.kind).numberOf(count.token),
-                            static_cast<uint16_t>(count.titleCount),
-                            static_cast<uint16_t>(count.bodyCount)});
+                            static_cast<uint16_t>(count.bodyCount),
+                            static_cast<uint8_t>(count.titleCount)});
       }
     }
     for (LUXOccurrences& occurrences : data.occurrences) {

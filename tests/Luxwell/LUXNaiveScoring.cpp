@@ -24,7 +24,7 @@ NaiveScoring::NaiveScoring(const QueryWorld& world) : _view(*world.view()) {
     page.number = page.mayBeFound ? number->second : 0;
     for (size_t token = 0; token < counts.size(); ++token) {
       const LUXTokenCount count = counts[token];
-      page.counts[{count.kind, std::string(count.token)}] = {count.titleCount, count.bodyCount};
+      page.counts[{count.kind, std::string(count.token)}] = count;
       page.lengths[count.kind].first += count.titleCount;
       page.lengths[count.kind].second += count.bodyCount;
     }
@@ -45,17 +45,21 @@ double NaiveScoring::_frequency(const Token& token) const {
       _pages.begin(), _pages.end(), [&](const Page& page) { return page.counts.contains(token); }));
 }
 
-double NaiveScoring::_weight(const Token& token) const {
-  const double frequency = _frequency(token);
+double NaiveScoring::_weightOfFrequency(double frequency) const {
   return std::log(1 + (static_cast<double>(_pages.size()) - frequency + 0.5) / (frequency + 0.5));
 }
 
-double NaiveScoring::_saturated(const Page& page, const Token& token) const {
+double NaiveScoring::_weight(const Token& token) const {
+  return _weightOfFrequency(_frequency(token));
+}
+
+double NaiveScoring::_impact(const Page& page, const Token& token) const {
   const auto counts = page.counts.find(token);
   if (counts == page.counts.end()) {
     return 0;
   }
-  const auto [titleCount, bodyCount] = counts->second;
+  const double titleCount = counts->second.titleCount;
+  const double bodyCount = counts->second.bodyCount;
   const auto [titleLength, bodyLength] = page.lengths.at(token.first);
   const auto [averageTitle, averageBody] = _averages.at(token.first);
   const auto relative = [](double length, double average, double share, double exponent) {
@@ -73,29 +77,45 @@ double NaiveScoring::_saturated(const Page& page, const Token& token) const {
             bodyCount / relative(bodyLength, averageBody, luxmodel::bodyLengthShare,
                                  luxmodel::bodyLengthExponent);
   }
-  return count / (luxmodel::saturation + count);
+  const double early = 30.0 / (30 + counts->second.wordsBefore);
+  return (count / (luxmodel::saturation + count) + 0.25 * early) / 1.25;
 }
 
-// The words that a half one may become, if it is to be expanded.
+// The words that a half one may become: those that begin with it and are in no more than half of
+// the pages.
 std::set<std::string> NaiveScoring::_expansions(const LUXQueryTerms& terms,
                                                 const std::string& stem) const {
   std::set<std::string> words;
   const bool isUnfinished = stem == terms.unfinishedStem;
   const std::string& prefix = isUnfinished ? terms.unfinishedForm : stem;
   if (prefix.size() < (isUnfinished ? 2U : 3U) || terms.onlyStopWords ||
-      (!isUnfinished && terms.stems.size() > 32) ||
-      _frequency({LUXTokenKind::stem, stem}) > (isUnfinished ? 2 : 0)) {
+      (!isUnfinished && (terms.stems.size() > 32 || _frequency({LUXTokenKind::stem, stem}) > 0))) {
     return words;
   }
   for (const Page& page : _pages) {
     for (const auto& entry : page.counts) {
       const auto& [kind, word] = entry.first;
-      if (kind == LUXTokenKind::form && word.starts_with(prefix)) {
+      if (kind == LUXTokenKind::form && word.starts_with(prefix) &&
+          2 * _frequency(entry.first) <= static_cast<double>(_view.totalPageCount())) {
         words.insert(word);
       }
     }
   }
   return words;
+}
+
+// The pages that have any of the forms, with the best that they have.
+std::map<uint32_t, double> NaiveScoring::_pagesWithAny(const std::set<std::string>& forms) const {
+  std::map<uint32_t, double> best;
+  for (const Page& page : _pages) {
+    for (const std::string& form : forms) {
+      const double impact = _impact(page, {LUXTokenKind::form, form});
+      if (page.mayBeFound && impact > 0) {
+        best[page.number] = std::max(best[page.number], impact);
+      }
+    }
+  }
+  return best;
 }
 
 std::vector<double> NaiveScoring::_latent(const LUXQueryTerms& terms) const {
@@ -144,41 +164,40 @@ std::map<uint32_t, double> NaiveScoring::scores(const LUXQueryTerms& terms) cons
     bound += weight;
     for (const Page& page : _pages) {
       if (page.mayBeFound) {
-        scored[page.number].lexical += weight * _saturated(page, token);
+        scored[page.number].lexical += weight * _impact(page, token);
       }
     }
   };
   for (const LUXQueryTerms::Term& word : words) {
-    const std::set<std::string> expansions = _expansions(terms, word.token);
-    if (!expansions.empty()) {
-      double having = 0;
-      std::map<uint32_t, double> best;
-      for (const Page& page : _pages) {
-        double most = _saturated(page, {wordKind, word.token});
-        for (const std::string& form : expansions) {
-          most = std::max(most, _saturated(page, {LUXTokenKind::form, form}));
-        }
-        if (page.mayBeFound && most > 0) {
-          ++having;
-          best[page.number] = most;
-        }
-      }
-      const double weight =
-          std::log(1 + (static_cast<double>(_pages.size()) - having + 0.5) / (having + 0.5));
-      all += word.token == terms.unfinishedStem ? weight : _weight({wordKind, word.token});
+    const Token token{wordKind, word.token};
+    const double frequency = _frequency(token);
+    std::map<uint32_t, double> longer = _pagesWithAny(_expansions(terms, word.token));
+    if (frequency == 0 && !longer.empty()) {
+      const double weight = _weightOfFrequency(static_cast<double>(longer.size()));
+      all += word.token == terms.unfinishedStem ? weight : _weight(token);
       known += weight;
       bound += word.count * weight;
-      for (const auto& [page, most] : best) {
-        scored[page].lexical += word.count * weight * most;
+      for (const auto& [page, impact] : longer) {
+        scored[page].lexical += word.count * weight * impact;
       }
       continue;
     }
-    const Token token{wordKind, word.token};
     const double weight = _weight(token);
     all += weight;
-    if (_frequency(token) > 0) {
-      known += weight;
-      add(token, word.count * weight);
+    if (frequency == 0) {
+      continue;
+    }
+    known += weight;
+    add(token, word.count * weight);
+    for (const Page& page : _pages) {
+      if (page.mayBeFound && page.counts.contains(token)) {
+        longer.erase(page.number);
+      }
+    }
+    const auto others = static_cast<double>(longer.size());
+    for (const auto& [page, impact] : longer) {
+      scored[page].lexical +=
+          word.count * 0.6 * others / (others + frequency) * _weightOfFrequency(others) * impact;
     }
   }
   if (!terms.onlyStopWords) {

@@ -31,7 +31,7 @@ class NaiveScoring {
   struct Page {
     bool mayBeFound = false;
     uint32_t number = 0;
-    std::map<Token, std::pair<double, double>> counts;
+    std::map<Token, LUXTokenCount> counts;
     std::map<LUXTokenKind, std::pair<double, double>> lengths;
   };
   struct Scored {
@@ -41,9 +41,11 @@ class NaiveScoring {
   };
 
   double _frequency(const Token& token) const;
+  double _weightOfFrequency(double frequency) const;
   double _weight(const Token& token) const;
-  double _saturated(const Page& page, const Token& token) const;
+  double _impact(const Page& page, const Token& token) const;
   std::set<std::string> _expansions(const LUXQueryTerms& terms, const std::string& stem) const;
+  std::map<uint32_t, double> _pagesWithAny(const std::set<std::string>& forms) const;
   std::vector<double> _latent(const LUXQueryTerms& terms) const;
 
   const LUXModelView& _view;

@@ -477,5 +477,7 @@ TEST(LUXQuery, LeavesSearchesWithOperatorsToTheKeywordEngine) {
                            "wirel* netw*", "\"add a printer\""}) {
     EXPECT_TRUE(Asked(text).run().empty()) << text;
   }
-  EXPECT_FALSE(Asked("wireless \"network").run().empty());
+  for (const char* text : {"wireless \"network", "wireless & password"}) {
+    EXPECT_FALSE(Asked(text).run().empty()) << text;
+  }
 }

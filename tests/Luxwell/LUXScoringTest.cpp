@@ -237,11 +237,74 @@ TEST(LUXScoring, TwoLettersAreExpandedWhileTheyAreTyped) {
   EXPECT_TRUE(best(office(), "w").empty());
 }
 
-TEST(LUXScoring, AKnownWordIsNotExpanded) {
-  // "print" is in many pages; "printer" shares no stem with it.
-  const auto pages = best(office(), "print");
-  const auto finished = best(office(), "print ");
-  EXPECT_EQ(pages, finished);
+// "sh" is a word of its own, and the beginning of others.
+const QueryWorld& shells() {
+  static const QueryWorld world({
+      {"shortcuts.html", "Keyboard shortcuts", {"Press a shortcut on the keyboard."}},
+      {"layout.html", "Keyboard layout", {"Choose a layout for the keyboard."}},
+      {"cleaning.html", "Keyboard care", {"Clean the keyboard, and clean the keyboard again."}},
+      {"shell.html", "The command sh", {"Start sh from the command line."}},
+      {"script.html", "Commands in files", {"Files of commands begin with the name of sh."}},
+      {"mouse.html", "The mouse", {"Press a button of the mouse."}},
+      {"screen.html", "The screen", {"Turn on the screen."}},
+  });
+  return world;
+}
+
+TEST(LUXScoring, AKnownWordThatIsStillBeingTypedFindsLongerOnesToo) {
+  const auto pages = best(shells(), "keyboard sh");
+  const auto rankOf = [&pages](const std::string& key) {
+    return std::find_if(pages.begin(), pages.end(),
+                        [&](const LUXScoredPage& page) { return keyOf(shells(), page) == key; }) -
+           pages.begin();
+  };
+  EXPECT_LE(rankOf("shortcuts.html"), 1);
+  EXPECT_LT(rankOf("shortcuts.html"), rankOf("layout.html"));
+  EXPECT_LT(rankOf("shortcuts.html"), rankOf("cleaning.html"));
+  EXPECT_TRUE(keys(shells(), "sh").contains("shortcuts.html"));
+  const auto isShortcuts = [](const LUXScoredPage& page) {
+    return keyOf(shells(), page) == "shortcuts.html";
+  };
+  const auto finished = best(shells(), "keyboard sh ");
+  EXPECT_GT(std::find_if(pages.begin(), pages.end(), isShortcuts)->score,
+            std::find_if(finished.begin(), finished.end(), isShortcuts)->score);
+}
+
+TEST(LUXScoring, PagesThatHaveTheWordItselfComeBeforeThoseWithLongerOnes) {
+  const auto pages = best(shells(), "sh");
+  ASSERT_GE(pages.size(), 3U);
+  EXPECT_EQ(keyOf(shells(), pages[0]), "shell.html");
+  EXPECT_EQ(keyOf(shells(), pages[1]), "script.html");
+  EXPECT_LT(pages[2].score, pages[1].score);
+  // Longer words take nothing from the pages that have the word.
+  const auto finished = best(shells(), "sh ");
+  EXPECT_EQ(finished[0], pages[0]);
+  EXPECT_EQ(finished[1], pages[1]);
+}
+
+TEST(LUXScoring, InflectionsOfAKnownWordAreNoLongerWords) {
+  const auto pages = best(office(), "wireless passwords");
+  EXPECT_EQ(pages, best(office(), "wireless passwords "));
+}
+
+TEST(LUXScoring, HalfWordsDoNotStandForWordsThatMostPagesHave) {
+  // "the" is in all pages and would bring them all.
+  EXPECT_TRUE(best(shells(), "th").empty());
+}
+
+TEST(LUXScoring, PagesThatBeginWithAWordComeBeforeThoseThatNameItLater) {
+  const std::string filling =
+      "A page may say many things about windows, panels, menus, icons and other things, about "
+      "files and folders and about people, before it comes to what comes last of all of it. ";
+  const QueryWorld world({
+      {"later.html", "One", {filling + filling + "Encryption of disks."}},
+      {"first.html", "Two", {"Encryption of disks. " + filling + filling}},
+      {"other.html", "Three", {filling + filling}},
+  });
+  EXPECT_EQ(firstKey(world, "encryption "), "first.html");
+  const auto pages = best(world, "encryption ");
+  ASSERT_EQ(pages.size(), 2U);
+  EXPECT_GT(pages[0].score, pages[1].score);
 }
 
 TEST(LUXScoring, StopWordsAloneAreLookedUpAsTheyStand) {

@@ -144,6 +144,14 @@ TEST(LUXTokenCounts, WithCountsSortsAndAdds) {
   EXPECT_EQ(counts.tokenNumber(2), 2U);
 }
 
+TEST(LUXTokenCounts, ATokenThatOccursTwiceBeginsWhereTheEarlierOneDoes) {
+  const LUXTokenCounts counts = LUXTokenCounts::withCounts({{"print", LUXTokenKind::stem, 0, 1, 9},
+                                                            {"print", LUXTokenKind::stem, 0, 1, 4},
+                                                            {"queue", LUXTokenKind::stem, 0, 1}});
+  EXPECT_EQ(counts[0].wordsBefore, 4);
+  EXPECT_EQ(counts[1].wordsBefore, LUXTokenCount::farDown);
+}
+
 TEST(LUXTokenCounts, CopiesShareAndKeepTheTable) {
   LUXTokenCounts copy;
   {

@@ -61,7 +61,7 @@ TEST(LUXSectionedData, HasTheDocumentedBytes) {
   std::string expected = "LUXINDEX";
   expected.resize(32 + 32);
   put(expected, 8, 1, 2);
-  put(expected, 10, 1, 2);
+  put(expected, 10, 2, 2);
   put(expected, 12, 1, 4);
   put(expected, 16, 73, 8);
   put(expected, 32, 1, 4);
