@@ -231,7 +231,8 @@ TEST_F(SearchCommandTest, IndexCutOffAnywhereNeverHarmsTheOtherBooksAndIsMadeAga
     const Outcome run = world.zeb({"search", "mow"});
     EXPECT_EQ(run.code, ExitCode::success) << size;
     EXPECT_THAT(run.out, HasSubstr("Lawn")) << size;
-    EXPECT_EQ(world.zeb({"index", world.files().path("kitchen")}).code, ExitCode::success);
+    const Outcome indexed = world.zeb({"index", world.files().path("kitchen")});
+    EXPECT_EQ(indexed.code, ExitCode::success) << indexed.err;
     EXPECT_EQ(world.zeb({"search", "boiling"}).code, ExitCode::success) << size;
   }
 }
