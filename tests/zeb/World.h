@@ -31,7 +31,7 @@ inline zeb::Installation installation() { return {ZEB_PLUGIN_BUNDLE, ZEB_TOOL}; 
 class World {
  public:
   /// Time passes `pace` times as fast as the machine's.
-  explicit World(double pace = 40) : _environment(_madeEnvironment(pace)) {}
+  explicit World(double pace = 25) : _environment(_madeEnvironment(pace)) {}
 
   const TemporaryFolder& files() const { return _files; }
   std::string cacheFolder() const { return _files.path("cache"); }
