@@ -120,10 +120,42 @@ std::optional<CatalogueEntry> entryForFolder(const std::string& folder,
   return entry;
 }
 
+namespace {
+
+/// The book of which only index and exact-match list come to this machine.
+std::shared_ptr<ZEBHelpBook> remoteBookOfEntry(const CatalogueEntry& entry) {
+  const std::shared_ptr<ZEBHelpBook> book =
+      ZEBHelpBook::bookWithID(entry.bookID, entry.type, entry.folder);
+  if (book == nullptr) {
+    return nullptr;
+  }
+  book->setTitle(entry.title);
+  book->setLocalization(entry.language);
+  book->setCatalogueURL(platform::URL::URLWithString(*entry.catalogueURL));
+  book->setRemoteURL(platform::URL::URLWithString(entry.pagesURL.value_or("")));
+  if (const std::optional<std::string> root = ZEBGeneratedRoot()) {
+    const std::string list =
+        ZEBGeneratedFilePath(*root, book->bookID(), entry.language, ZEBExactMatchListExtension);
+    book->setExactMatchPath(isFile(list) ? std::optional(list) : std::nullopt);
+  }
+  return book;
+}
+
+}  // namespace
+
 std::shared_ptr<ZEBHelpBook> bookOfEntry(const CatalogueEntry& entry) {
+  if (entry.isRemote()) {
+    return remoteBookOfEntry(entry);
+  }
   if (hasInformationList(entry.folder)) {
     std::shared_ptr<ZEBHelpBook> described = ZEBHelpBook::initWithPath(entry.folder);
-    return described != nullptr && described->bookID() == entry.bookID ? described : nullptr;
+    if (described == nullptr || described->bookID() != entry.bookID) {
+      return nullptr;
+    }
+    if (entry.catalogueURL) {
+      described->setCatalogueURL(platform::URL::URLWithString(*entry.catalogueURL));
+    }
+    return described;
   }
   std::shared_ptr<ZEBHelpBook> book =
       ZEBHelpBook::bookWithID(entry.bookID, entry.type, entry.folder);

@@ -26,6 +26,8 @@ constexpr const char* folderKey = "folder";
 constexpr const char* accessPageKey = "accessPage";
 constexpr const char* languageKey = "language";
 constexpr const char* fingerprintKey = "fingerprint";
+constexpr const char* catalogueURLKey = "catalogueURL";
+constexpr const char* pagesURLKey = "pagesURL";
 
 /// Paths are bytes, strings of a property list are text: a path that is no printable text is kept
 /// as data.
@@ -52,7 +54,7 @@ std::optional<std::string> pathFromValue(const Value& value) {
 }
 
 Value propertyList(const CatalogueEntry& entry) {
-  return Value::Dictionary{
+  Value::Dictionary list = {
       {bookIDKey, entry.bookID},
       {titleKey, entry.title},
       {typeKey, entry.type},
@@ -61,6 +63,13 @@ Value propertyList(const CatalogueEntry& entry) {
       {languageKey, entry.language},
       {fingerprintKey, entry.fingerprint},
   };
+  if (entry.catalogueURL) {
+    list[catalogueURLKey] = *entry.catalogueURL;
+  }
+  if (entry.pagesURL) {
+    list[pagesURLKey] = *entry.pagesURL;
+  }
+  return list;
 }
 
 std::optional<CatalogueEntry> entryFromPropertyList(const Value& list) {
@@ -80,10 +89,14 @@ std::optional<CatalogueEntry> entryFromPropertyList(const Value& list) {
   entry.accessPagePath = *accessPage;
   entry.language = list[languageKey].stringValue().value_or("");
   entry.fingerprint = list[fingerprintKey].stringValue().value_or("");
+  entry.catalogueURL = list[catalogueURLKey].stringValue();
+  entry.pagesURL = list[pagesURLKey].stringValue();
   return entry;
 }
 
 }  // namespace
+
+bool CatalogueEntry::isRemote() const { return type == ZEBHelpBookType4 && catalogueURL; }
 
 std::string Catalogue::_entryPath(std::string_view bookID) const {
   return platform::stringByAppendingPathComponent(_folder,

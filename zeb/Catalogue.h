@@ -27,6 +27,14 @@ struct CatalogueEntry {
   std::string language;
   /// What the folder looked like when it was entered; see folderFingerprint().
   std::string fingerprint;
+  /// Of a book from a server, and of an installed one that is renewed from there: where the
+  /// publisher's catalogue is.
+  std::optional<std::string> catalogueURL;
+  /// Where the server has the book's pages.
+  std::optional<std::string> pagesURL;
+
+  /// Whether nothing of the book but its index is on this machine.
+  bool isRemote() const;
 
   friend bool operator==(const CatalogueEntry&, const CatalogueEntry&) = default;
 };

@@ -21,7 +21,8 @@ constexpr char wordMark = '\xFF';
 
 bool isCommand(std::string_view argument) {
   static constexpr std::string_view commands[] = {"search", "suggest", "similar", "anchor",
-                                                  "books",  "models",  "index",   "scan"};
+                                                  "books",  "models",  "index",   "scan",
+                                                  "add",    "remove",  "publish"};
   return std::find(std::begin(commands), std::end(commands), argument) != std::end(commands);
 }
 
@@ -63,6 +64,9 @@ struct Parser {
   CLI::App* books = nullptr;
   CLI::App* index = nullptr;
   CLI::App* scan = nullptr;
+  CLI::App* add = nullptr;
+  CLI::App* remove = nullptr;
+  CLI::App* publish = nullptr;
 
   CommandLine common;
   std::string cacheFolder;
@@ -73,12 +77,16 @@ struct Parser {
   BooksCommand booksCommand;
   IndexCommand indexCommand;
   ScanCommand scanCommand;
+  AddCommand addCommand;
+  RemoveCommand removeCommand;
+  PublishCommand publishCommand;
   bool noInstalledBooks = false;
   bool noWait = false;
 
  private:
   CLI::App* _addCommand(const std::string& name, const std::string& description);
   CLI::App* _addSuggestCommand(const std::string& name, const std::string& description);
+  void _addCommandsForRemoteBooks();
 };
 
 CLI::App* Parser::_addCommand(const std::string& name, const std::string& description) {
@@ -175,6 +183,39 @@ Parser::Parser() {
       ->allow_extra_args(false)
       ->option_text("TAG");
   scan->add_flag("--force", scanCommand.evenIfUnchanged, "Index unchanged books, too");
+
+  _addCommandsForRemoteBooks();
+}
+
+void Parser::_addCommandsForRemoteBooks() {
+  add = _addCommand("add", "Subscribe to books on a web server");
+  add->add_option("url", addCommand.url, "Address of the publisher's catalogue")
+      ->required()
+      ->option_text("URL");
+  add->add_option("--book", addCommand.books, "Only this book; may be repeated")
+      ->allow_extra_args(false)
+      ->option_text("ID");
+  add->add_option("--language", addCommand.languages, "Preferred language; may be repeated")
+      ->allow_extra_args(false)
+      ->option_text("TAG");
+
+  remove = _addCommand("remove", "Forget books, or all books of a catalogue");
+  remove->add_option("names", removeCommand.names, "Identifiers, or addresses of catalogues")
+      ->required()
+      ->option_text("ID_OR_URL...");
+
+  publish = _addCommand("publish", "Write books into a folder for a web server");
+  publish->add_option("folders", publishCommand.folders, "Help books, or folders of help pages")
+      ->required()
+      ->option_text("FOLDER...");
+  publish->add_option("--site", publishCommand.site, "The folder to serve; made when needed")
+      ->required()
+      ->option_text("DIR");
+  publish->add_option("--book-id", publishCommand.bookIDs, "Identifier of the book; one a folder")
+      ->allow_extra_args(false)
+      ->option_text("ID");
+  publish->add_option("--language", publishCommand.language, "Language of folders that do not say")
+      ->option_text("TAG");
 }
 
 void unmark(std::vector<std::string>& arguments) {
@@ -233,6 +274,20 @@ std::optional<CommandLine> parseCommandLine(const std::vector<std::string>& argu
     unmark(parser.indexCommand.folders);
     unmark(parser.indexCommand.bookIDs);
     line.command = parser.indexCommand;
+  } else if (parser.add->parsed()) {
+    parser.addCommand.url = unmarked(parser.addCommand.url);
+    unmark(parser.addCommand.books);
+    unmark(parser.addCommand.languages);
+    line.command = parser.addCommand;
+  } else if (parser.remove->parsed()) {
+    unmark(parser.removeCommand.names);
+    line.command = parser.removeCommand;
+  } else if (parser.publish->parsed()) {
+    unmark(parser.publishCommand.folders);
+    unmark(parser.publishCommand.bookIDs);
+    parser.publishCommand.site = unmarked(parser.publishCommand.site);
+    parser.publishCommand.language = unmarked(parser.publishCommand.language);
+    line.command = parser.publishCommand;
   } else {
     unmark(parser.scanCommand.folders);
     unmark(parser.scanCommand.languages);

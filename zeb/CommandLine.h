@@ -79,9 +79,33 @@ struct ScanCommand {
   bool evenIfUnchanged = false;
 };
 
+/// Subscribes to a publisher's catalogue.
+struct AddCommand {
+  std::string url;
+  /// Only these of its books; all where there is none.
+  std::vector<std::string> books;
+  /// In place of the user's; best first.
+  std::vector<std::string> languages;
+};
+
+struct RemoveCommand {
+  /// Identifiers of books, and URLs of catalogues.
+  std::vector<std::string> names;
+};
+
+/// Writes books into a folder for a web server.
+struct PublishCommand {
+  std::vector<std::string> folders;
+  /// None, or one a folder.
+  std::vector<std::string> bookIDs;
+  std::string site;
+  /// Of folders that do not say themselves.
+  std::string language;
+};
+
 struct CommandLine {
   std::variant<SearchCommand, SuggestCommand, AnchorCommand, BooksCommand, ModelsCommand,
-               IndexCommand, ScanCommand>
+               IndexCommand, ScanCommand, AddCommand, RemoveCommand, PublishCommand>
       command;
   ColorMode color = ColorMode::automatic;
   /// The caches folder, for indexes and the catalogue, when the user names one.

@@ -25,6 +25,8 @@
 #include "zeb/Models.h"
 #include "zeb/Output.h"
 #include "zeb/Paths.h"
+#include "zeb/Publishing.h"
+#include "zeb/RemoteBooks.h"
 #include "zeb/Scan.h"
 
 namespace zeb {
@@ -56,6 +58,13 @@ class Session {
   ExitCode operator()(const ScanCommand& command) {
     return scan(command, _catalogue, _installation, _waiting, _console, _verbosity);
   }
+  ExitCode operator()(const AddCommand& command) {
+    return addBooks(command, _catalogue, _installation, _waiting, _console);
+  }
+  ExitCode operator()(const RemoveCommand& command) {
+    return removeBooks(command, _catalogue, _installation, _console);
+  }
+  ExitCode operator()(const PublishCommand& command);
 
  private:
   /// Asks the search and shows what it says; absent when the search broke off, else whether
@@ -67,6 +76,8 @@ class Session {
   bool _knowsBooks(const std::vector<CatalogueEntry>& entries,
                    const std::vector<std::string>& bookIDs);
   void _makeMissingIndexes(HelpSearch& search, const std::vector<std::string>& bookIDs);
+  bool _hasIdentifierForEach(const std::vector<std::string>& folders,
+                             const std::vector<std::string>& bookIDs);
   std::optional<bool> _show(const std::string& asked, const std::optional<Answer>& answer,
                             bool json);
 
@@ -258,10 +269,18 @@ ExitCode Session::operator()(const BooksCommand& command) {
   return books.empty() ? ExitCode::nothingFound : ExitCode::success;
 }
 
+bool Session::_hasIdentifierForEach(const std::vector<std::string>& folders,
+                                    const std::vector<std::string>& bookIDs) {
+  if (bookIDs.empty() || bookIDs.size() == folders.size()) {
+    return true;
+  }
+  _console.error(fmt::format("{} folders, but {} --book-id: give one for each, or none",
+                             folders.size(), bookIDs.size()));
+  return false;
+}
+
 ExitCode Session::operator()(const IndexCommand& command) {
-  if (!command.bookIDs.empty() && command.bookIDs.size() != command.folders.size()) {
-    _console.error(fmt::format("{} folders, but {} --book-id: give one for each, or none",
-                               command.folders.size(), command.bookIDs.size()));
+  if (!_hasIdentifierForEach(command.folders, command.bookIDs)) {
     return ExitCode::usage;
   }
   bool succeeded = true;
@@ -280,6 +299,20 @@ ExitCode Session::operator()(const IndexCommand& command) {
   const IndexingCounts counts =
       Update(_catalogue, _waiting, _console).run(books, {}, _installation, true);
   return succeeded && counts.failed == 0 ? ExitCode::success : ExitCode::failure;
+}
+
+ExitCode Session::operator()(const PublishCommand& command) {
+  if (!_hasIdentifierForEach(command.folders, command.bookIDs)) {
+    return ExitCode::usage;
+  }
+  bool succeeded = true;
+  Publishing publishing(absolutePath(command.site), _console);
+  for (size_t i = 0; i < command.folders.size(); ++i) {
+    const auto bookID = command.bookIDs.empty() ? std::nullopt : std::optional(command.bookIDs[i]);
+    succeeded =
+        publishing.publish(absolutePath(command.folders[i]), bookID, command.language) && succeeded;
+  }
+  return succeeded ? ExitCode::success : ExitCode::failure;
 }
 
 std::optional<std::string> cacheFolder(const CommandLine& line) {

@@ -16,6 +16,7 @@
 #include "platform/ThreadSafety.h"
 #include "platform/URL.h"
 #include "zeb/BookFolder.h"
+#include "zeb/RemoteBooks.h"
 #include "zebd/Host.h"
 
 namespace zeb {
@@ -275,6 +276,7 @@ std::unique_ptr<HelpSearch> HelpSearch::start(const std::vector<CatalogueEntry>&
     settings.userHelpCachesDirectoryPath =
         platform::stringByAppendingPathComponent(*caches, ZEBDaemonBundleID);
   }
+  forgetKnownIndicesWhenDue(entries);
   auto implementation = std::make_unique<Implementation>();
   implementation->host = Host::start(installation.pluginBundlePath, std::move(settings), error);
   if (implementation->host == nullptr) {
@@ -350,6 +352,17 @@ HelpSearch::Indexing HelpSearch::makeIndexes(const std::vector<std::string>& boo
   }
   indexing.missing.assign(waiting.begin(), waiting.end());
   return indexing;
+}
+
+bool HelpSearch::fetchIndexes(const std::vector<std::string>& bookIDs, platform::Seconds limit) {
+  const auto collector = std::make_shared<Collector>();
+  _implementation->host->registerBooks(bookIDs, collector);
+  return Host::runMainLoopUntil(
+      [&] {
+        return collector->ended() && _implementation->host->owner().isQuietFor(quietSpan) &&
+               _implementation->reports->areQuietFor(modelSpan);
+      },
+      limit);
 }
 
 bool HelpSearch::removeIndexes(const std::vector<std::string>& bookIDs) {

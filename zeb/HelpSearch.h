@@ -94,6 +94,10 @@ class HelpSearch {
   Indexing makeIndexes(const std::vector<std::string>& bookIDs, platform::Seconds limit,
                        const Progress& progress);
 
+  /// Has the indexes of remote books fetched, those that are there already compared with their
+  /// servers', and waits until the plug-in is quiet or `limit` has passed; returns whether it is.
+  bool fetchIndexes(const std::vector<std::string>& bookIDs, platform::Seconds limit);
+
   /// Has indexes forgotten that are no longer those of their books' pages. Returns whether the
   /// plug-in has done so for all.
   bool removeIndexes(const std::vector<std::string>& bookIDs);

@@ -17,7 +17,6 @@
 #include "zeb/HelpSearch.h"
 
 namespace zeb {
-namespace {
 
 // An update removes indexes before it makes them anew, and must not find those gone that it has
 // made. Without a lock, where none can be had, it goes on: what then fails says so itself.
@@ -33,13 +32,16 @@ std::optional<platform::FileLock> lockCatalogue(const Catalogue& catalogue, Cons
   return lock;
 }
 
-}  // namespace
-
 IndexingCounts Update::run(const std::vector<CatalogueEntry>& books,
                            const std::vector<CatalogueEntry>& gone,
                            const Installation& installation, bool evenIfUnchanged) {
   const std::optional<platform::FileLock> lock = lockCatalogue(_catalogue, _console);
-  for (const CatalogueEntry& book : books) {
+  for (CatalogueEntry book : books) {
+    const std::optional<CatalogueEntry> former = _catalogue.entry(book.bookID);
+    if (former && book.type == ZEBHelpBookType3) {
+      // The folder does not say that the user subscribed.
+      book.catalogueURL = former->catalogueURL;
+    }
     if (!evenIfUnchanged && _isUpToDate(book)) {
       ++_counts.unchanged;
     } else {

@@ -2,9 +2,11 @@
 #pragma once
 
 #include <cstddef>
+#include <optional>
 #include <string>
 #include <vector>
 
+#include "platform/FileLock.h"
 #include "zeb/Catalogue.h"
 #include "zeb/CommandLine.h"
 #include "zeb/Console.h"
@@ -23,6 +25,10 @@ struct IndexingCounts {
   /// In the catalogue, to be indexed by a later command.
   size_t left = 0;
 };
+
+/// Has the catalogue to itself among programs, as long as the result lives; waits for that, saying
+/// so on the console. Absent where no lock can be had.
+std::optional<platform::FileLock> lockCatalogue(const Catalogue& catalogue, Console& console);
 
 /// One bringing up to date. Runs the main loop; confined to the main thread.
 class Update {

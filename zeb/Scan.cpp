@@ -15,6 +15,7 @@
 #include "zeb/Indexing.h"
 #include "zeb/Languages.h"
 #include "zeb/Paths.h"
+#include "zeb/RemoteBooks.h"
 
 namespace zeb {
 
@@ -84,6 +85,9 @@ void addInstalledBooks(const ScanCommand& command, BookList& books) {
 std::vector<CatalogueEntry> addKnownBooks(const Catalogue& catalogue, BookList& books) {
   std::vector<CatalogueEntry> gone;
   for (const CatalogueEntry& entry : catalogue.entries()) {
+    if (entry.isRemote()) {
+      continue;
+    }
     bool isDirectory = false;
     if (!platform::Environment::current()->files->fileExistsAtPath(entry.folder, &isDirectory) ||
         !isDirectory) {
@@ -128,6 +132,10 @@ ExitCode scan(const ScanCommand& command, const Catalogue& catalogue,
   console.clearProgress();
   console.out() << fmt::format("{} indexed, {} unchanged, {} forgotten, {} failed", counts.indexed,
                                counts.unchanged, counts.forgotten, failedCount);
+  if (const size_t remoteCount = refreshRemoteBooks(catalogue, installation, waiting, console);
+      remoteCount > 0) {
+    console.out() << fmt::format(", {} on servers", remoteCount);
+  }
   if (counts.left > 0) {
     console.out() << fmt::format(", {} still to be indexed", counts.left);
   }

@@ -80,8 +80,12 @@ inline const std::string ZEBDaemonBundleID = "org.zeb.zebd";
 inline const std::string ZEBKestrelBundleID = "org.zeb.kestrel";
 
 // Files and folders.
+/// Among the user's help caches, the plug-in's memory of which index is whose; it may be deleted.
+inline const std::string ZEBKnownIndicesFileName = "HelpindexCache.plist";
 /// Extension of help-index files, without the dot.
 inline const std::string ZEBHelpindexExtension = "helpindex";
+/// Extension of exact-match lists that were downloaded, without the first dot.
+inline const std::string ZEBExactMatchListExtension = "exactmatch.plist";
 /// Folder of generated indexes within the daemon's caches folder.
 inline const std::string ZEBGeneratedIndexDirectory = "GeneratedIndexes";
 

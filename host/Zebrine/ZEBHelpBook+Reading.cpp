@@ -25,6 +25,7 @@ constexpr const char* indexFilesKey = "ZEBBookIndexFiles";
 constexpr const char* exactMatchFileKey = "ZEBBookExactMatchFile";
 constexpr const char* suggestionsFileKey = "ZEBBookSuggestionsFile";
 constexpr const char* remoteRootKey = "ZEBBookRemoteRoot";
+constexpr const char* catalogueKey = "ZEBBookCatalogue";
 constexpr const char* usesExternalViewerKey = "ZEBBookUsesExternalViewer";
 constexpr const char* appIdentifierKey = "ZEBBookAppIdentifier";
 constexpr const char* appVersionKey = "ZEBBookAppVersion";
@@ -181,8 +182,8 @@ std::vector<std::string> languagesIn(const platform::Environment& environment,
   return languages;
 }
 
-std::optional<platform::URL> remoteRoot(Information& information) {
-  const std::optional<std::string> string = information.string(remoteRootKey);
+std::optional<platform::URL> remoteAddress(Information& information, const char* key) {
+  const std::optional<std::string> string = information.string(key);
   if (!string) {
     return std::nullopt;
   }
@@ -265,7 +266,8 @@ std::shared_ptr<ZEBHelpBook> ZEBHelpBook::initWithPath(const std::string& path) 
   book->setUsesExternalViewer(information.boolean(usesExternalViewerKey));
   book->setAppBundleID(information.string(appIdentifierKey));
   book->setAppBundleVersion(information.string(appVersionKey));
-  book->setRemoteURL(remoteRoot(information));
+  book->setRemoteURL(remoteAddress(information, remoteRootKey));
+  book->setCatalogueURL(remoteAddress(information, catalogueKey));
   readFiles(*environment, information, folders, *book);
   return information.isBroken() ? nullptr : book;
 }

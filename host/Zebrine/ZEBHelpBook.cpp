@@ -15,6 +15,7 @@ struct ZEBHelpBook::Properties {
   std::optional<std::string> exactMatchPath;
   std::optional<std::string> suggestionsPath;
   std::optional<platform::URL> remoteURL;
+  std::optional<platform::URL> catalogueURL;
   bool usesExternalViewer = false;
   std::optional<std::string> appBundleID;
   std::optional<std::string> appBundleVersion;
@@ -123,6 +124,13 @@ std::optional<std::string> ZEBHelpBook::suggestionsPath() const {
 }
 void ZEBHelpBook::setSuggestionsPath(std::optional<std::string> suggestionsPath) {
   _set(&Properties::suggestionsPath, std::move(suggestionsPath));
+}
+
+std::optional<platform::URL> ZEBHelpBook::catalogueURL() const {
+  return _get(&Properties::catalogueURL);
+}
+void ZEBHelpBook::setCatalogueURL(std::optional<platform::URL> catalogueURL) {
+  _set(&Properties::catalogueURL, std::move(catalogueURL));
 }
 
 std::optional<platform::URL> ZEBHelpBook::remoteURL() const { return _get(&Properties::remoteURL); }

@@ -96,6 +96,11 @@ class ZEBHelpBook {
   std::optional<platform::URL> remoteURL() const;
   void setRemoteURL(std::optional<platform::URL> remoteURL);
 
+  /// Where the publisher's catalogue is (docs/formats/remote-book.md) that has the book, or newer
+  /// versions of it.
+  std::optional<platform::URL> catalogueURL() const;
+  void setCatalogueURL(std::optional<platform::URL> catalogueURL);
+
   /// Whether another program shows the book's pages, from remoteURL.
   bool usesExternalViewer() const;
   void setUsesExternalViewer(bool usesExternalViewer);

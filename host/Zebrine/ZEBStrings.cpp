@@ -171,3 +171,33 @@ std::string addSSLAsNecessary(std::string_view string) {
   secure += rest.substr(authorityLength);
   return secure;
 }
+
+std::string ZEBOriginOfURL(const platform::URL& url) {
+  const std::string& address = url.absoluteString();
+  const size_t separator = address.find("://");
+  if (separator == std::string::npos) {
+    return {};
+  }
+  std::string_view authority = std::string_view(address).substr(separator + 3);
+  authority = authority.substr(0, authority.find_first_of("/?#\\"));
+  const size_t at = authority.rfind('@');
+  if (at != std::string_view::npos) {
+    authority.remove_prefix(at + 1);
+  }
+  const size_t colon = authority.rfind(':');
+  const bool hasColon = colon != std::string_view::npos &&
+                        std::all_of(authority.begin() + colon + 1, authority.end(), isDigit);
+  const std::string_view host = hasColon ? authority.substr(0, colon) : authority;
+  if (host.empty()) {
+    return {};
+  }
+  std::string origin = address.substr(0, separator + 3);
+  origin += host;
+  std::transform(origin.begin(), origin.end(), origin.begin(), lower);
+  std::string_view port = hasColon ? authority.substr(colon + 1) : std::string_view();
+  port.remove_prefix(std::min(port.find_first_not_of('0'), port.size()));
+  if (port.empty()) {
+    port = origin.starts_with("https:") ? "443" : "80";
+  }
+  return origin + ':' + std::string(port);
+}

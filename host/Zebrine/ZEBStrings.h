@@ -27,3 +27,7 @@ std::optional<platform::URL> URLByEscapingString(std::string_view string);
 /// (other ports stay). Unchanged for other schemes, for what is no URL, and for hosts that are this
 /// machine ("localhost", 127.0.0.0/8, "[::1]"), to which no connection leaves it.
 std::string addSSLAsNecessary(std::string_view string);
+
+/// Scheme, host and port of an absolute URL, spelled alike for all URLs of one server:
+/// "https://help.example.org:443". Empty for a URL without a host.
+std::string ZEBOriginOfURL(const platform::URL& url);

@@ -31,7 +31,7 @@ void ZEBIndexshelf::_setUp() {
   {
     const platform::MonitorLock lock(_monitor);
     if (caches) {
-      _cachePath = platform::stringByAppendingPathComponent(*caches, "HelpindexCache.plist");
+      _cachePath = platform::stringByAppendingPathComponent(*caches, ZEBKnownIndicesFileName);
     }
   }
   if (std::optional<std::map<std::string, Indices>> known = unarchiveKnownIndices();
@@ -125,7 +125,7 @@ std::optional<std::string> ZEBIndexshelf::_generatedIndexPathForBookID(
 
 std::optional<std::string> ZEBIndexshelf::_generatedExactMatchPathForBookID(
     const std::optional<std::string>& bookID, const std::optional<std::string>& withLocalization) {
-  return _generatedFilePathForBookID(bookID, withLocalization, "exactmatch.plist");
+  return _generatedFilePathForBookID(bookID, withLocalization, ZEBExactMatchListExtension);
 }
 
 std::optional<std::string> ZEBIndexshelf::_generatedFilePathForBookID(

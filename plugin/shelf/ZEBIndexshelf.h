@@ -3,6 +3,7 @@
 
 #include <atomic>
 #include <cstdint>
+#include <functional>
 #include <map>
 #include <memory>
 #include <optional>
@@ -10,11 +11,15 @@
 #include <string_view>
 #include <vector>
 
+#include "platform/Clock.h"
 #include "platform/DispatchQueue.h"
 #include "platform/DistributedNotificationCenter.h"
 #include "platform/ThreadSafety.h"
+#include "platform/URL.h"
 #include "platform/Value.h"
 
+class ZEBAssetDownloadOperation;
+class ZEBBookInfoDiscoveryOperation;
 class ZEBHelpBook;
 class ZEBIndex;
 class ZEBOperationQueue;
@@ -116,8 +121,11 @@ class ZEBIndexshelf : public std::enable_shared_from_this<ZEBIndexshelf> {
 
   // Remote books (plugin/remote).
 
+  /// Whether a download of a type-4 book, or the start of a fetch of this very object of another
+  /// book, is under way.
   bool isIndexDownloadingForBook(const std::shared_ptr<ZEBHelpBook>& book);
-  /// Whether a download of a type-4 book that is under way ended within `timeout` seconds.
+  /// Whether a download of a type-4 book that is under way ended within `timeout` seconds. One
+  /// waiter is told of each download, and those who come after its end wait for nothing.
   bool waitForIndexDownloadCompletionForType4Book(const std::shared_ptr<ZEBHelpBook>& book,
                                                   double timeout);
 
@@ -157,14 +165,41 @@ class ZEBIndexshelf : public std::enable_shared_from_this<ZEBIndexshelf> {
   void _helpBookDidChange(const platform::DistributedNotification& notification);
   void _resetForLanguageChange();
 
+  /// Has the book's information, then its index and exact-match list, downloaded in the background,
+  /// unless that is under way. The shelf lives at least until the download has ended. The record
+  /// that the shelf has of the book, if any, counts as being downloaded meanwhile.
   void _addIndexDownloadOperationForType4Book(const std::shared_ptr<ZEBHelpBook>& book,
                                               const std::shared_ptr<ZEBIndex>& existingIndex);
+  /// Downloads what the book's remote information names, and takes it over. The completion runs
+  /// once, when all of that has ended, in whatever way.
+  void _downloadAssetsForType4Book(const std::shared_ptr<ZEBHelpBook>& book,
+                                   const std::shared_ptr<ZEBIndex>& existingIndex,
+                                   std::function<void()> completionHandler);
+  /// Looks for a newer version of the book's first index on the server. On the main thread.
   void _startFetchingUpdatedIndexForType3BookWithParams(const ZEBIndexFetchParameters& params);
+  /// Begins to fetch an index that is to take the place of the record's contents. False, and
+  /// nothing done, for a URL that cannot be asked for and without a record.
+  bool _startIndexFetch(const platform::URL& url, platform::Seconds timeout,
+                        const std::shared_ptr<ZEBHelpBook>& book,
+                        const std::shared_ptr<ZEBIndex>& existingIndex);
+  /// Has semantic data made for a record that has none.
+  void _generateSemanticIndexIfMissing(const std::shared_ptr<ZEBHelpBook>& book,
+                                       const std::shared_ptr<ZEBIndex>& existingIndex);
 
  private:
   explicit ZEBIndexshelf(const std::shared_ptr<ZEBPluginOwner>& owner) : _owner(owner) {}
   void _setUp();
   void _resolveIndicesForBook(const std::shared_ptr<ZEBHelpBook>& book, Indices& found);
+  void _discoveryDidFinish(const std::shared_ptr<ZEBBookInfoDiscoveryOperation>& operation,
+                           const std::shared_ptr<ZEBHelpBook>& book,
+                           const std::shared_ptr<ZEBIndex>& existingIndex);
+  void _exactMatchDownloadDidFinish(const ZEBAssetDownloadOperation& download,
+                                    const std::shared_ptr<ZEBHelpBook>& book);
+  void _searchIndexDownloadDidFinish(const ZEBAssetDownloadOperation& download,
+                                     const std::shared_ptr<ZEBHelpBook>& book,
+                                     const std::shared_ptr<ZEBIndex>& existingIndex);
+  void _downloadDidFinish(const std::shared_ptr<ZEBHelpBook>& book,
+                          const std::shared_ptr<ZEBIndex>& existingIndex);
 
   const std::weak_ptr<ZEBPluginOwner> _owner;
 

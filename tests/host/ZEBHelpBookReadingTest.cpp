@@ -269,6 +269,16 @@ TEST_F(ZEBHelpBookReading, unknownKeysAreLeftAlone) {
   EXPECT_NE(readWith({{"Comment", Value::Array{1, 2}}}), nullptr);
 }
 
+TEST_F(ZEBHelpBookReading, theCatalogueIsMadeSecureAndHasToBeAURL) {
+  EXPECT_EQ(readWith({{"ZEBBookCatalogue", "http://example.org/c.json"}})
+                ->catalogueURL()
+                ->absoluteString(),
+            "https://example.org/c.json");
+  EXPECT_EQ(readWith({})->catalogueURL(), std::nullopt);
+  EXPECT_EQ(readWith({{"ZEBBookCatalogue", "no-scheme"}}), nullptr);
+  EXPECT_EQ(readWith({{"ZEBBookCatalogue", 1}}), nullptr);
+}
+
 TEST_F(ZEBHelpBookReading, theRemoteRootIsMadeSecure) {
   EXPECT_EQ(
       readWith({{"ZEBBookRemoteRoot", "http://example.org/book/"}})->remoteURL()->absoluteString(),

@@ -66,6 +66,12 @@ bool ChildProcess::isRunning() {
   return _process != 0;
 }
 
+void ChildProcess::kill() const {
+  if (_process != 0) {
+    ::kill(_process, SIGKILL);
+  }
+}
+
 int ChildProcess::wait() {
   int status = 0;
   if (_process != 0 && ::waitpid(_process, &status, 0) == _process) {

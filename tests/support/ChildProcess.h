@@ -22,6 +22,8 @@ class ChildProcess {
   ChildProcess& operator=(const ChildProcess&) = delete;
 
   bool isRunning();
+  /// Kills it, unless it has ended.
+  void kill() const;
   /// Waits for its end; the exit status, or 128 and the signal's number.
   int wait();
 

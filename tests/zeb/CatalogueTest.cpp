@@ -51,6 +51,17 @@ TEST_F(CatalogueTest, KeepsEverythingThatIsKnownOfABook) {
   EXPECT_EQ(catalogue.entry("a"), entry("a"));
 }
 
+TEST_F(CatalogueTest, KeepsWhereAServerHasABook) {
+  CatalogueEntry remote = entry("a");
+  remote.type = 4;
+  remote.catalogueURL = "https://help.example.org/catalogue.json";
+  remote.pagesURL = "https://help.example.org/pages/";
+  ASSERT_EQ(catalogue.store(remote), std::nullopt);
+  EXPECT_EQ(catalogue.entry("a"), remote);
+  EXPECT_TRUE(catalogue.entry("a")->isRemote());
+  EXPECT_FALSE(entry("a").isRemote());
+}
+
 TEST_F(CatalogueTest, ListsBooksByIdentifier) {
   for (const char* bookID : {"b", "c", "a", "a.plist"}) {
     ASSERT_EQ(catalogue.store(entry(bookID)), std::nullopt);

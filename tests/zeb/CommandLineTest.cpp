@@ -160,6 +160,33 @@ TEST_F(CommandLineTest, ScanTakesFoldersRootLanguagesAndForce) {
   EXPECT_TRUE(parsed<zeb::ScanCommand>({"scan"}).installedBooks);
 }
 
+TEST_F(CommandLineTest, AddTakesAnAddressBooksAndLanguages) {
+  const auto command = parsed<zeb::AddCommand>(
+      {"add", "https://a.example/", "--book", "a", "--book", "b", "--language", "de"});
+  EXPECT_EQ(command.url, "https://a.example/");
+  EXPECT_THAT(command.books, ElementsAre("a", "b"));
+  EXPECT_THAT(command.languages, ElementsAre("de"));
+  EXPECT_EQ(parse({"add"}), std::nullopt);
+}
+
+TEST_F(CommandLineTest, RemoveTakesBooksAndAddresses) {
+  EXPECT_THAT(parsed<zeb::RemoveCommand>({"remove", "a", "https://a.example/", "-b"}).names,
+              ElementsAre("a", "https://a.example/", "-b"));
+  EXPECT_EQ(parse({"remove"}), std::nullopt);
+}
+
+TEST_F(CommandLineTest, PublishTakesFoldersASiteIdentifiersAndALanguage) {
+  const auto command =
+      parsed<zeb::PublishCommand>({"publish", "one", "two", "--site", "www", "--book-id", "a",
+                                   "--book-id", "b", "--language", "de"});
+  EXPECT_THAT(command.folders, ElementsAre("one", "two"));
+  EXPECT_EQ(command.site, "www");
+  EXPECT_THAT(command.bookIDs, ElementsAre("a", "b"));
+  EXPECT_EQ(command.language, "de");
+  EXPECT_EQ(parse({"publish", "one"}), std::nullopt);
+  EXPECT_EQ(parse({"publish", "--site", "www"}), std::nullopt);
+}
+
 TEST_F(CommandLineTest, CommonOptionsStandAnywhere) {
   const auto before = parse({"--color", "never", "--cache-dir", "/c", "--verbose", "books"});
   const auto after = parse({"books", "--color=never", "--cache-dir=/c", "--verbose"});
@@ -194,7 +221,8 @@ TEST_F(CommandLineTest, WrongLinesAreUsageErrors) {
 TEST_F(CommandLineTest, HelpAndVersionGoToTheOutputAndSucceed) {
   EXPECT_FALSE(parse({"--help"}).has_value());
   EXPECT_EQ(code, ExitCode::success);
-  for (const char* command : {"search", "anchor", "books", "index", "scan"}) {
+  for (const char* command :
+       {"search", "anchor", "books", "index", "scan", "add", "remove", "publish"}) {
     EXPECT_THAT(out.str(), HasSubstr(command));
   }
   EXPECT_FALSE(parse({"search", "--help"}).has_value());

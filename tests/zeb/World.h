@@ -30,7 +30,8 @@ inline zeb::Installation installation() { return {ZEB_PLUGIN_BUNDLE, ZEB_TOOL}; 
 
 class World {
  public:
-  World() : _environment(_madeEnvironment()) {}
+  /// Time passes `pace` times as fast as the machine's.
+  explicit World(double pace = 20) : _environment(_madeEnvironment(pace)) {}
 
   const TemporaryFolder& files() const { return _files; }
   std::string cacheFolder() const { return _files.path("cache"); }
@@ -73,9 +74,9 @@ class World {
  private:
   /// What is still going on after a command goes on in the world's own folder, and time passes so
   /// quickly that waits for quiet cost next to nothing.
-  platform::Environment _madeEnvironment() const {
+  platform::Environment _madeEnvironment(double pace) const {
     platform::Environment environment = *platform::Environment::current();
-    environment.clock = std::make_shared<QuickClock>(20);
+    environment.clock = std::make_shared<QuickClock>(pace);
     environment.cachesDirectory = cacheFolder();
     environment.notificationCenter = platform::localNotificationCenter();
     return environment;

@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <chrono>
 #include <filesystem>
 #include <fstream>
 #include <mutex>
@@ -318,8 +319,14 @@ void Run::_finishWork() {
   const std::vector<std::shared_ptr<ZEBOperationQueue>> queues = {
       _shelf->indexRegistrationQueue(), _shelf->indexFetchUpdateQueue(),
       _shelf->indexDownloadQueue(), _shelf->assetDownloadQueue(), _shelf->indexGeneratingQueue()};
-  while (!std::all_of(queues.begin(), queues.end(),
-                      [](const auto& queue) { return queue->operationCount() == 0; })) {
+  const auto areEmpty = [&] {
+    return std::all_of(queues.begin(), queues.end(),
+                       [](const auto& queue) { return queue->operationCount() == 0; });
+  };
+  // A download goes on from one queue to the next; its guard tells. One that is never given back is
+  // a fault, and found out after a while.
+  const auto patience = std::chrono::steady_clock::now() + std::chrono::seconds(60);
+  while (!areEmpty() || (_owner->depth() != 0 && std::chrono::steady_clock::now() < patience)) {
     _turnMainLoop();
   }
   for (const auto& queue : queues) {

@@ -25,6 +25,16 @@ void ShelfOwner::enableShutdown() {
   }
 }
 
+void ShelfOwner::notifyBookshelfOfModificationsToBook(const std::shared_ptr<ZEBHelpBook>& book) {
+  const std::lock_guard lock(_mutex);
+  _modified.push_back(book);
+}
+
+std::vector<std::shared_ptr<ZEBHelpBook>> ShelfOwner::modified() const {
+  const std::lock_guard lock(_mutex);
+  return _modified;
+}
+
 int RecordingLauncher::launchAndWait(const std::string& path,
                                      const std::vector<std::string>& arguments) {
   Launch launch{path, arguments, {}};
@@ -215,7 +225,7 @@ void ShelfWorld::finishWork() {
 }
 
 bool ShelfWorld::runMainLoopUntil(const std::function<bool()>& done) const {
-  const auto limit = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+  const auto limit = std::chrono::steady_clock::now() + std::chrono::seconds(60);
   while (std::chrono::steady_clock::now() < limit) {
     platform::RunLoop::main()->runPending();
     if (done()) {

@@ -37,6 +37,7 @@ class ShelfOwner : public BookOwner {
 
   void disableShutdown() override;
   void enableShutdown() override;
+  void notifyBookshelfOfModificationsToBook(const std::shared_ptr<ZEBHelpBook>& book) override;
   std::optional<std::string> userHelpCachesDirectoryPath() const override {
     return _cachesDirectory;
   }
@@ -45,12 +46,16 @@ class ShelfOwner : public BookOwner {
   /// How many calls of disableShutdown() wait for theirs of enableShutdown().
   int depth() const { return _depth; }
   bool everEnabledTooOften() const { return _everNegative; }
+  /// The books of which it was told that they have changed.
+  std::vector<std::shared_ptr<ZEBHelpBook>> modified() const;
 
  private:
   const std::optional<std::string> _cachesDirectory;
   std::atomic<int> _disableCount{0};
   std::atomic<int> _depth{0};
   std::atomic<bool> _everNegative{false};
+  mutable std::mutex _mutex;
+  std::vector<std::shared_ptr<ZEBHelpBook>> _modified;
 };
 
 /// Starts no process: notes what was asked for and does what the test says instead.
@@ -165,7 +170,8 @@ class ShelfWorld {
   /// Runs the main loop until all queues are empty and their drain blocks have run. As long as
   /// registrations wait, the clock moves on.
   void finishWork();
-  /// Runs the main loop until `done`; false after ten real seconds.
+  /// Runs the main loop until `done`; false after a minute of real time, which only a mistake
+  /// takes.
   bool runMainLoopUntil(const std::function<bool()>& done) const;
 
   std::string cachePath() const { return helpCaches + "/HelpindexCache.plist"; }
