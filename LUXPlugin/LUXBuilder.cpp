@@ -114,6 +114,8 @@ void LUXSearchController::_updateModelWithParams(const LUXModelBuildParameters& 
 void LUXSearchController::_buildModel(const LUXModelBuildParameters& params) {
   const BookTable books = _copyAllBooksForLanguage(params.language);
   params.model->reset();
+  // By now the folder is there.
+  _markAsBuilding(*params.model, params.modelGroupName, params.language);
   // Processes that ended in the middle of a build leave unfinished files here too.
   platform::removeAbandonedFiles(_savedIndexDataFolder(params.model->modelDirectoryPath()));
   Value::Dictionary thresholds;

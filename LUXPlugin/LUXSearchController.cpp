@@ -10,6 +10,7 @@
 #include "host/Zebrine/ZEBLog.h"
 #include "host/Zebrine/ZEBPluginOwner.h"
 #include "platform/Environment.h"
+#include "platform/Files.h"
 #include "platform/OperationQueue.h"
 #include "plugin/records/ZEBHelpindexIndex.h"
 
@@ -86,7 +87,20 @@ std::shared_ptr<HelpLUXModel> LUXSearchController::modelForGroupName(
     return nullptr;
   }
   model->setActivity(activity);
+  if (activity == kLUXModelActivityBuilding) {
+    _markAsBuilding(*model, modelGroupName, language);
+  }
   return model;
+}
+
+void LUXSearchController::_markAsBuilding(const HelpLUXModel& model,
+                                          const std::string& modelGroupName,
+                                          const std::string& language) {
+  const platform::MonitorLock lock(_registryMonitor);
+  auto& mark = _buildMarks[registryKey(modelGroupName, language)];
+  if (!mark) {
+    mark = platform::Environment::current()->files->markFolder(model.modelDirectoryPath());
+  }
 }
 
 std::shared_ptr<HelpLUXModel> LUXSearchController::aquiredModelWithGroupName(
@@ -117,6 +131,9 @@ std::shared_ptr<HelpLUXModel> LUXSearchController::aquiredModelWithGroupName(
 void LUXSearchController::finishedActivity(int activity, const std::string& modelGroupName,
                                            const std::string& language) {
   const platform::MonitorLock lock(_registryMonitor);
+  if (activity == kLUXModelActivityBuilding) {
+    _buildMarks.erase(registryKey(modelGroupName, language));
+  }
   const auto found = _activeLUXModels.find(registryKey(modelGroupName, language));
   if (found == _activeLUXModels.end()) {
     return;

@@ -25,8 +25,9 @@ class ZEBQuery;
 class ZEBResult;
 
 namespace platform {
+class FolderMark;
 class OperationQueue;
-}
+}  // namespace platform
 
 /// Searches by meaning over language models, one for each group of books and language, and keeps
 /// the models in step with the books: opens them ahead of time, builds missing and outdated ones in
@@ -189,6 +190,10 @@ class LUXSearchController : public ZEBIndexshelfObserver,
 
   static std::string _savedIndexDataFolder(const std::string& modelPath);
 
+  /// Lets other processes see that the model is being built, where its folder is there already.
+  void _markAsBuilding(const HelpLUXModel& model, const std::string& modelGroupName,
+                       const std::string& language);
+
   void _schedulePendingSync() REQUIRES(_pendingMonitor);
   void _synchronise();
   bool _synchroniseGroup(const std::string& modelGroupName,
@@ -215,6 +220,10 @@ class LUXSearchController : public ZEBIndexshelfObserver,
   std::map<std::string, Results> _searchResults GUARDED_BY(_monitor);
   std::optional<std::string> _currentQueryID GUARDED_BY(_monitor);
   const std::shared_ptr<platform::OperationQueue> _serialModelUpdateQueue;
+
+  // Of models that are being built, by key of the registry; as long as the activity.
+  std::map<std::string, std::unique_ptr<platform::FolderMark>> _buildMarks
+      GUARDED_BY(_registryMonitor);
 
   mutable platform::Monitor _monitor;
   mutable platform::Monitor _registryMonitor;

@@ -131,7 +131,44 @@ std::string folderOf(const std::string& path) {
   return folder.empty() ? "." : folder;
 }
 
+Descriptor openFolder(const std::string& path) {
+  return Descriptor(nameless(path) ? -1 : ::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+}
+
+/// A lock over the whole of a file, of this kind.
+struct flock lockOfKind(short kind) {
+  struct flock lock {};
+  lock.l_type = kind;
+  lock.l_whence = SEEK_SET;
+  return lock;
+}
+
+/// A lock that goes with the description of the open file: nobody can lose it by closing another
+/// descriptor of the folder, and it ends with the process.
+class LockedFolder : public FolderMark {
+ public:
+  explicit LockedFolder(Descriptor folder) : _folder(std::move(folder)) {}
+
+ private:
+  const Descriptor _folder;
+};
+
 }  // namespace
+
+std::unique_ptr<FolderMark> FileManager::markFolder(const std::string& path) const {
+  Descriptor folder = openFolder(path);
+  // Folders are never open for writing, so the mark is a lock for readers.
+  struct flock lock = lockOfKind(F_RDLCK);
+  const bool isMarked = folder.number() >= 0 && ::fcntl(folder.number(), F_OFD_SETLK, &lock) == 0;
+  return isMarked ? std::make_unique<LockedFolder>(std::move(folder)) : nullptr;
+}
+
+bool FileManager::folderIsMarked(const std::string& path) const {
+  const Descriptor folder = openFolder(path);
+  struct flock lock = lockOfKind(F_WRLCK);
+  return folder.number() >= 0 && ::fcntl(folder.number(), F_OFD_GETLK, &lock) == 0 &&
+         lock.l_type != F_UNLCK;
+}
 
 bool FileManager::fileExistsAtPath(const std::string& path, bool* isDirectory) const {
   struct stat status {};

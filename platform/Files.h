@@ -13,6 +13,13 @@
 
 namespace platform {
 
+/// A mark that this process has put on a folder; gone with this object, and with the process
+/// however that ends. Leaves no trace in the folder.
+class FolderMark {
+ public:
+  virtual ~FolderMark() = default;
+};
+
 /// The file system behind one replaceable object, so that tests can make any operation fail.
 ///
 /// Paths are absolute or relative UTF-8 strings in which other bytes pass through untouched. A
@@ -62,6 +69,13 @@ class FileManager {
 
   /// The names in a folder, sorted by bytes, without "." and "..". Absent when it cannot be read.
   virtual std::optional<std::vector<std::string>> namesInDirectory(const std::string& path) const;
+
+  /// Marks the folder for everybody to see; several marks on one are fine. Null when there is no
+  /// such folder or its file system knows no locks.
+  virtual std::unique_ptr<FolderMark> markFolder(const std::string& path) const;
+
+  /// Whether any process that runs, this one among them, has a mark on the folder.
+  virtual bool folderIsMarked(const std::string& path) const;
 };
 
 /// The real file system.

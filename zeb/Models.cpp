@@ -8,10 +8,15 @@
 #include "host/Luxwell/LUXModelFile.h"
 #include "host/Luxwell/LUXModelView.h"
 #include "platform/Environment.h"
+#include "platform/Files.h"
 
 namespace zeb {
 
 namespace {
+
+bool isBeingBuilt(const std::string& folder) {
+  return platform::Environment::current()->files->folderIsMarked(folder);
+}
 
 ListedModel describe(const std::string& group, const std::string& language) {
   ListedModel listed;
@@ -30,6 +35,7 @@ ListedModel describe(const std::string& group, const std::string& language) {
   if (const auto size = std::filesystem::file_size(file, unknown); !unknown) {
     listed.bytes = size;
   }
+  listed.isBeingBuilt = isBeingBuilt(folder);
   listed.built = platform::Environment::current()->files->modificationDate(file);
   return listed;
 }
@@ -40,7 +46,8 @@ std::vector<ListedModel> savedModels() {
   std::vector<ListedModel> models;
   for (const std::string& group : HelpLUXModel::allModelGroupNames()) {
     for (const std::string& language : HelpTokenizer::supportedLocalizations()) {
-      if (HelpLUXModel::modelExistsForGroupName(group, language)) {
+      if (HelpLUXModel::modelExistsForGroupName(group, language) ||
+          isBeingBuilt(HelpLUXModel::directoryPathForModelGroupName(group, language))) {
         models.push_back(describe(group, language));
       }
     }

@@ -9,7 +9,7 @@
 
 namespace zeb {
 
-/// One saved model.
+/// One model.
 struct ListedModel {
   std::string group;
   /// Folder name ("English").
@@ -22,9 +22,14 @@ struct ListedModel {
   std::optional<std::chrono::system_clock::time_point> built;
   /// Whether it is of no use as it is: torn, or from another version.
   bool needsBuild = false;
+  /// Whether some process that runs, this one among them, has it marked as being built. After a
+  /// build that broke off, that stays so until the process ends. What else processes do with a
+  /// model only they know.
+  bool isBeingBuilt = false;
 };
 
-/// Those of all groups and languages, by group, then language.
+/// Those of all groups and languages, by group, then language; with models that are being built for
+/// the first time.
 std::vector<ListedModel> savedModels();
 
 }  // namespace zeb

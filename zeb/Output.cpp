@@ -101,7 +101,9 @@ void printModels(const std::vector<ListedModel>& models, Console& console) {
                   << singleLine(model.language)
                   << fmt::format("  {} books  {} pages  {:.1f} MB  {}", model.books.size(),
                                  model.pageCount, static_cast<double>(model.bytes) / 1e6, built);
-    if (model.needsBuild) {
+    if (model.isBeingBuilt) {
+      console.out() << "  being built";
+    } else if (model.needsBuild) {
       console.out() << "  " << console.styled(Style::error, "needs to be built");
     }
     console.out() << '\n';
@@ -125,6 +127,7 @@ void printModelsAsJSON(const std::vector<ListedModel>& models, Console& console)
       entry["built"] = std::chrono::system_clock::to_time_t(*model.built);
     }
     entry["needsBuild"] = model.needsBuild;
+    entry["activity"] = model.isBeingBuilt ? "building" : "none";
     list.push_back(std::move(entry));
   }
   JSON object;

@@ -29,11 +29,12 @@ void printSuggestions(const std::vector<Suggestion>& suggestions, Console& conso
 void printSuggestionsAsJSON(std::string_view query, const std::vector<Suggestion>& suggestions,
                             Console& console);
 
-/// One line a model: group, language, numbers of books and pages, size, when it was built.
+/// One line a model: group, language, numbers of books and pages, size, when it was built, and what
+/// is to be said of its state.
 void printModels(const std::vector<ListedModel>& models, Console& console);
 
 /// One JSON object: "count", "models" (each with "group", "language", "books", "pages", "bytes",
-/// "built" in seconds since 1970, "needsBuild").
+/// "built" in seconds since 1970, "needsBuild", "activity": "building" or "none").
 void printModelsAsJSON(const std::vector<ListedModel>& models, Console& console);
 
 /// A book as it is listed.

@@ -279,6 +279,29 @@ TEST_F(Build, thatThrowsLeavesTheModelMarkedAsBuilding) {
   EXPECT_FALSE(HelpLUXModel::modelExistsForGroupName("Apps", "English"));
 }
 
+TEST_F(Build, isSeenByOtherProcessesFromItsBeginToItsEnd) {
+  world.addBook("org.one", tests::kitchenPages(), "Apps");
+  const auto isMarked = [&] { return world.files->folderIsMarked(world.modelFolder("Apps")); };
+  // Its folder is made at the begin.
+  bool wasMarked = false;
+  world.owner->onMessage = [&](const std::string&) { wasMarked = wasMarked || isMarked(); };
+  world.controller->startBuildingModelGroupName("Apps", "English")->waitUntilFinished();
+  world.finishWork();
+  EXPECT_TRUE(wasMarked);
+  EXPECT_FALSE(isMarked());
+  // One that breaks off leaves its mark as long as the model stays held.
+  world.owner->onMessage = [](const std::string& told) {
+    if (told == "knownBooks") {
+      throw std::runtime_error("host on fire");
+    }
+  };
+  build();
+  world.owner->onMessage = nullptr;
+  EXPECT_TRUE(isMarked());
+  world.controller->finishedActivity(kLUXModelActivityBuilding, "Apps", "English");
+  EXPECT_FALSE(isMarked());
+}
+
 TEST_F(Build, thatThrewKeepsEveryOtherModelFromBeingBuilt) {
   world.owner->onMessage = [](const std::string& told) {
     if (told == "knownBooks") {

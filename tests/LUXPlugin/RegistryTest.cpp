@@ -109,6 +109,22 @@ TEST_F(Registry, opensTheModelAnewAfterABuild) {
   EXPECT_NE(next, model);
 }
 
+TEST_F(Registry, showsOtherProcessesWhatIsBeingBuiltAndNothingElse) {
+  std::filesystem::create_directories(world.modelFolder("System"));
+  const auto isMarked = [&] { return world.files->folderIsMarked(world.modelFolder("System")); };
+  for (const int activity : {kLUXModelActivityQuerying, kLUXModelActivityPreloading}) {
+    take(activity);
+    EXPECT_FALSE(isMarked());
+    finish(activity);
+  }
+  take(kLUXModelActivityBuilding);
+  EXPECT_TRUE(isMarked());
+  finish(kLUXModelActivityQuerying);
+  EXPECT_TRUE(isMarked());
+  finish(kLUXModelActivityBuilding);
+  EXPECT_FALSE(isMarked());
+}
+
 TEST_F(Registry, ignoresTheEndOfWorkOnAnUnknownModel) {
   finish(kLUXModelActivityBuilding);
   finish(kLUXModelActivityQuerying, "None");

@@ -3,9 +3,12 @@
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
+#include <array>
 #include <cerrno>
+#include <csignal>
 #include <thread>
 
 #include "tests/platform/TemporaryFolder.h"
@@ -267,3 +270,54 @@ TEST(Paths, standardizing) {
 
 }  // namespace
 }  // namespace platform
+
+TEST(FolderMark, isSeenAsLongAsItIsHeld) {
+  const tests::TemporaryFolder folder;
+  const platform::FileManager files;
+  EXPECT_FALSE(files.folderIsMarked(folder.path()));
+  auto mark = files.markFolder(folder.path());
+  ASSERT_TRUE(mark);
+  EXPECT_TRUE(files.folderIsMarked(folder.path()));
+  auto second = files.markFolder(folder.path());
+  ASSERT_TRUE(second);
+  mark.reset();
+  EXPECT_TRUE(files.folderIsMarked(folder.path()));
+  second.reset();
+  EXPECT_FALSE(files.folderIsMarked(folder.path()));
+  EXPECT_TRUE(std::filesystem::is_empty(folder.path()));
+}
+
+TEST(FolderMark, isForFoldersThatAreThere) {
+  const tests::TemporaryFolder folder;
+  const platform::FileManager files;
+  for (const std::string& path :
+       {folder.path("none"), folder.write("file", "bytes"), std::string("/a\0b", 4)}) {
+    EXPECT_FALSE(files.markFolder(path));
+    EXPECT_FALSE(files.folderIsMarked(path));
+  }
+}
+
+TEST(FolderMark, goesWithTheProcess) {
+  const tests::TemporaryFolder folder;
+  const platform::FileManager files;
+  std::array<int, 2> ends{};
+  ASSERT_EQ(::pipe(ends.data()), 0);
+  const pid_t child = ::fork();
+  if (child == 0) {
+    const auto mark = files.markFolder(folder.path());
+    const char answer = mark ? 'y' : 'n';
+    (void)!::write(ends[1], &answer, 1);
+    while (true) {
+      ::pause();
+    }
+  }
+  char answer = 0;
+  ASSERT_EQ(::read(ends[0], &answer, 1), 1);
+  EXPECT_EQ(answer, 'y');
+  EXPECT_TRUE(files.folderIsMarked(folder.path()));
+  ASSERT_EQ(::kill(child, SIGKILL), 0);
+  ASSERT_EQ(::waitpid(child, nullptr, 0), child);
+  EXPECT_FALSE(files.folderIsMarked(folder.path()));
+  ::close(ends[0]);
+  ::close(ends[1]);
+}

@@ -7,6 +7,7 @@
 #include <utility>
 #include <vector>
 
+#include "platform/Files.h"
 #include "tests/zeb/World.h"
 
 namespace {
@@ -101,6 +102,29 @@ TEST_F(MeaningTest, ActionsArePagesFoundByMeaningAlone) {
   const Outcome run = world->zeb({"search", "--actions", "index a folder", "--json"});
   EXPECT_EQ(run.code, ExitCode::success) << run.err;
   EXPECT_FALSE(JSON::parse(run.out)["results"].empty());
+}
+
+TEST_F(MeaningTest, ModelsThatAreBeingBuiltAreListedAsSuch) {
+  const std::string models = world->cacheFolder() + "/org.zeb.zebd/Models/Default/";
+  EXPECT_EQ(JSON::parse(world->zeb({"models", "--json"}).out)["models"][0]["activity"], "none");
+  EXPECT_THAT(world->zeb({"models"}).out, Not(HasSubstr("being built")));
+  {
+    // As builds mark their models: one that was there, and one that is new.
+    std::filesystem::create_directories(models + "German");
+    const platform::FileManager files;
+    const auto old = files.markFolder(models + "English");
+    const auto fresh = files.markFolder(models + "German");
+    const JSON json = JSON::parse(world->zeb({"models", "--json"}).out);
+    ASSERT_EQ(json["count"], 2);
+    EXPECT_EQ(json["models"][0]["activity"], "building");
+    EXPECT_EQ(json["models"][0]["needsBuild"], false);
+    EXPECT_EQ(json["models"][1]["language"], "German");
+    EXPECT_EQ(json["models"][1]["activity"], "building");
+    EXPECT_EQ(json["models"][1]["needsBuild"], true);
+    EXPECT_THAT(world->zeb({"models"}).out, HasSubstr("  being built\n"));
+  }
+  std::filesystem::remove(models + "German");
+  EXPECT_EQ(JSON::parse(world->zeb({"models", "--json"}).out)["models"][0]["activity"], "none");
 }
 
 TEST_F(MeaningTest, WithoutBooksThereAreNoModels) {
