@@ -29,9 +29,9 @@ std::string sha256Digest(std::string_view bytes) {
 }
 
 bool isSHA256Digest(std::string_view text) {
-  return text.size() == 2 * SHA256_DIGEST_SIZE && std::all_of(text.begin(), text.end(), [](char c) {
-           return digits.find(c) != std::string_view::npos;
-         });
+  return text.size() == size_t{2} * SHA256_DIGEST_SIZE &&
+         std::all_of(text.begin(), text.end(),
+                     [](char c) { return digits.find(c) != std::string_view::npos; });
 }
 
 }  // namespace platform

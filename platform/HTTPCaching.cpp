@@ -17,22 +17,6 @@ using std::chrono::system_clock;
 /// No answer is fresh for longer: beyond a year nobody means it, and sums stay far from overflow.
 constexpr seconds longestLifetime{366L * 24 * 3600};
 
-std::string_view trimmed(std::string_view text) {
-  const auto isBlank = [](char c) { return c == ' ' || c == '\t'; };
-  while (!text.empty() && isBlank(text.front())) {
-    text.remove_prefix(1);
-  }
-  while (!text.empty() && isBlank(text.back())) {
-    text.remove_suffix(1);
-  }
-  return text;
-}
-
-bool equalIgnoringCase(std::string_view a, std::string_view b) {
-  constexpr HTTPFieldNameOrder before;
-  return !before(a, b) && !before(b, a);
-}
-
 /// Calls visit(name, value) for each part of a list such as "no-cache, max-age=5, x=\"a, b\"".
 void forEachDirective(std::string_view list,
                       const std::function<void(std::string_view, std::string_view)>& visit) {
@@ -45,15 +29,16 @@ void forEachDirective(std::string_view list,
       }
       ++end;
     }
-    const std::string_view part = trimmed(list.substr(0, end));
+    const std::string_view part = trimmedHTTPFieldValue(list.substr(0, end));
     list.remove_prefix(std::min(end + 1, list.size()));
     const size_t equals = part.find('=');
-    std::string_view value =
-        equals == std::string_view::npos ? std::string_view() : trimmed(part.substr(equals + 1));
+    std::string_view value = equals == std::string_view::npos
+                                 ? std::string_view()
+                                 : trimmedHTTPFieldValue(part.substr(equals + 1));
     if (value.size() >= 2 && value.front() == '"' && value.back() == '"') {
       value = value.substr(1, value.size() - 2);
     }
-    visit(trimmed(part.substr(0, equals)), value);
+    visit(trimmedHTTPFieldValue(part.substr(0, equals)), value);
   }
 }
 
@@ -84,15 +69,15 @@ Directives directivesOf(const HTTPHeaderFields& fields) {
   const std::optional<std::string> list = valueForHTTPHeaderField(fields, "Cache-Control");
   if (!list) {
     const std::optional<std::string> pragma = valueForHTTPHeaderField(fields, "Pragma");
-    directives.noCache = pragma && equalIgnoringCase(trimmed(*pragma), "no-cache");
+    directives.noCache = pragma && isSameHTTPFieldName(trimmedHTTPFieldValue(*pragma), "no-cache");
     return directives;
   }
   forEachDirective(*list, [&](std::string_view name, std::string_view value) {
-    if (equalIgnoringCase(name, "no-store")) {
+    if (isSameHTTPFieldName(name, "no-store")) {
       directives.noStore = true;
-    } else if (equalIgnoringCase(name, "no-cache")) {
+    } else if (isSameHTTPFieldName(name, "no-cache")) {
       directives.noCache = true;
-    } else if (equalIgnoringCase(name, "max-age")) {
+    } else if (isSameHTTPFieldName(name, "max-age")) {
       const seconds given = secondsFromText(value).value_or(seconds::zero());
       directives.maximumAge = std::min(directives.maximumAge.value_or(given), given);
     }
@@ -121,13 +106,13 @@ bool belongsToOneMessage(std::string_view name) {
                                                       "Proxy-Authorization",
                                                       "Set-Cookie"};
   return std::any_of(names.begin(), names.end(),
-                     [&](std::string_view other) { return equalIgnoringCase(name, other); });
+                     [&](std::string_view other) { return isSameHTTPFieldName(name, other); });
 }
 
 /// Fields that change with every answer, and matter only where the answer stays fresh for a while.
 bool onlyTellsTheTime(std::string_view name) {
-  return equalIgnoringCase(name, "Date") || equalIgnoringCase(name, "Age") ||
-         equalIgnoringCase(name, "Expires");
+  return isSameHTTPFieldName(name, "Date") || isSameHTTPFieldName(name, "Age") ||
+         isSameHTTPFieldName(name, "Expires");
 }
 
 HTTPHeaderFields withoutTimes(const HTTPHeaderFields& fields) {
@@ -139,7 +124,7 @@ HTTPHeaderFields withoutTimes(const HTTPHeaderFields& fields) {
 
 /// An entity tag without the mark of the weak ones (section 8.8.3.2 of RFC 9110).
 std::string_view opaqueTag(std::string_view tag) {
-  tag = trimmed(tag);
+  tag = trimmedHTTPFieldValue(tag);
   return tag.starts_with("W/") ? tag.substr(2) : tag;
 }
 
@@ -203,7 +188,7 @@ bool isFresh(const CachedURLResponse& cached, const URLRequest& request,
   const auto date = timeOfField(response, "Date").value_or(cached.date());
   const auto apparentAge = std::max(cached.date() - date, system_clock::duration::zero());
   const seconds statedAge =
-      secondsFromText(trimmed(response.valueForHTTPHeaderField("Age").value_or("")))
+      secondsFromText(trimmedHTTPFieldValue(response.valueForHTTPHeaderField("Age").value_or("")))
           .value_or(seconds::zero());
   const auto initialAge = std::max<system_clock::duration>(apparentAge, statedAge);
   return initialAge + (now - cached.date()) < lifetime;

@@ -34,6 +34,18 @@ std::optional<std::string> valueForHTTPHeaderField(const HTTPHeaderFields& field
   return found == fields.end() ? std::nullopt : std::optional(found->second);
 }
 
+bool isSameHTTPFieldName(std::string_view a, std::string_view b) noexcept {
+  constexpr HTTPFieldNameOrder before;
+  return !before(a, b) && !before(b, a);
+}
+
+std::string_view trimmedHTTPFieldValue(std::string_view text) noexcept {
+  constexpr std::string_view blanks = " \t\r\n";
+  const size_t first = std::min(text.find_first_not_of(blanks), text.size());
+  text.remove_prefix(first);
+  return text.substr(0, text.find_last_not_of(blanks) + 1);
+}
+
 bool isValidHTTPHeaderField(std::string_view name, std::string_view value) noexcept {
   return !name.empty() && std::all_of(name.begin(), name.end(), isTokenCharacter) &&
          std::all_of(value.begin(), value.end(), isValueCharacter);

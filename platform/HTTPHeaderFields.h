@@ -22,6 +22,12 @@ using HTTPHeaderFields = std::map<std::string, std::string, HTTPFieldNameOrder>;
 std::optional<std::string> valueForHTTPHeaderField(const HTTPHeaderFields& fields,
                                                    std::string_view name);
 
+/// Whether two names mean the same field.
+bool isSameHTTPFieldName(std::string_view a, std::string_view b) noexcept;
+
+/// The text without blanks, tabs and line ends around it.
+std::string_view trimmedHTTPFieldValue(std::string_view text) noexcept;
+
 /// Whether the name and the value may stand in a message: no control characters, a name without
 /// separators.
 bool isValidHTTPHeaderField(std::string_view name, std::string_view value) noexcept;

@@ -17,17 +17,6 @@ namespace {
 /// has to be held while the client holds the transfer back.
 constexpr long receiveBufferLength = 32 << 10;
 
-std::string_view trimmed(std::string_view text) {
-  const auto isBlank = [](char c) { return c == ' ' || c == '\t' || c == '\r' || c == '\n'; };
-  while (!text.empty() && isBlank(text.front())) {
-    text.remove_prefix(1);
-  }
-  while (!text.empty() && isBlank(text.back())) {
-    text.remove_suffix(1);
-  }
-  return text;
-}
-
 /// Whether the host is this machine, which no proxy must be asked for.
 bool isThisMachine(const std::string& host) {
   return host == "localhost" || host == "[::1]" || host == "::1" || host.starts_with("127.");
@@ -35,17 +24,13 @@ bool isThisMachine(const std::string& host) {
 
 constexpr std::string_view lengthField = "Content-Length";
 
-bool isLengthField(std::string_view name) {
-  constexpr HTTPFieldNameOrder before;
-  return !before(name, lengthField) && !before(lengthField, name);
-}
-
 /// libcurl reads to the end of the connection where the length is too great for it.
 bool isHonest(std::string_view name, std::string_view value) {
   int64_t length = -1;
   const char* const end = value.data() + value.size();
   const auto [rest, failure] = std::from_chars(value.data(), end, length);
-  return !isLengthField(name) || (failure == std::errc() && rest == end && length >= 0);
+  return !isSameHTTPFieldName(name, lengthField) ||
+         (failure == std::errc() && rest == end && length >= 0);
 }
 
 }  // namespace
@@ -195,20 +180,21 @@ bool HTTPTransfer::Exchange::_takeHeadLine(std::string_view line) {
     _response.reset();
     return true;
   }
-  const std::string_view text = trimmed(line);
+  const std::string_view text = trimmedHTTPFieldValue(line);
   return text.empty() ? _finishHead() : _takeField(line);
 }
 
 bool HTTPTransfer::Exchange::_takeField(std::string_view line) {
   if (line.front() == ' ' || line.front() == '\t') {
     if (const auto field = _fields.find(_lastField); field != _fields.end()) {
-      field->second.append(" ").append(trimmed(line));
+      field->second.append(" ").append(trimmedHTTPFieldValue(line));
     }
     return true;
   }
   const size_t colon = std::min(line.find(':'), line.size());
   const std::string name(line.substr(0, colon));
-  const std::string_view value = trimmed(line.substr(std::min(colon + 1, line.size())));
+  const std::string_view value =
+      trimmedHTTPFieldValue(line.substr(std::min(colon + 1, line.size())));
   if (!isValidHTTPHeaderField(name, value)) {
     return true;
   }
@@ -217,7 +203,7 @@ bool HTTPTransfer::Exchange::_takeField(std::string_view line) {
   if (isNew) {
     return isHonest(name, value) || _fail(URLErrorBadServerResponse, "it gives no real length");
   }
-  if (isLengthField(name)) {
+  if (isSameHTTPFieldName(name, lengthField)) {
     // A length may be said twice, but not two lengths.
     return field->second == value || _fail(URLErrorBadServerResponse, "it gives two lengths");
   }

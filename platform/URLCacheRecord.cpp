@@ -152,9 +152,8 @@ std::shared_ptr<const URLCacheRecord> URLCacheRecord::recordWithCachedResponse(
   const auto varies = cachedResponse->response()->valueForHTTPHeaderField("Vary");
   for (const std::string& name : namesInList(varies.value_or(""))) {
     const std::optional<std::string> value = request.valueForHTTPHeaderField(name);
-    constexpr HTTPFieldNameOrder before;
-    const bool tellsWhoAsks = !before(name, "Authorization") && !before("Authorization", name) &&
-                              (value || request.credential());
+    const bool tellsWhoAsks =
+        isSameHTTPFieldName(name, "Authorization") && (value || request.credential());
     if (name == "*" || tellsWhoAsks || !isValidHTTPHeaderField(name, "")) {
       return nullptr;
     }

@@ -77,9 +77,8 @@ void URLSessionTaskCore::cancel(const std::shared_ptr<URLSessionDataTask>& task)
 URLRequest URLSessionTaskCore::requestToLoad(URLRequest request) const {
   const bool isOriginalServer = originOfURL(request.URL()) == originOfURL(original.URL());
   for (const auto& [name, value] : configuration.HTTPAdditionalHeaders()) {
-    constexpr HTTPFieldNameOrder before;
-    const bool tellsWhoAsks = (!before(name, "Authorization") && !before("Authorization", name)) ||
-                              (!before(name, "Cookie") && !before("Cookie", name));
+    const bool tellsWhoAsks =
+        isSameHTTPFieldName(name, "Authorization") || isSameHTTPFieldName(name, "Cookie");
     if (!request.valueForHTTPHeaderField(name) && (isOriginalServer || !tellsWhoAsks)) {
       request.setValueForHTTPHeaderField(value, name);
     }

@@ -320,19 +320,6 @@ HelpSearch::Indexing HelpSearch::makeIndexes(const std::vector<std::string>& boo
       progress(bookID, count);
     }
   };
-  (void)_implementation->reports->take();
-  const auto collector = std::make_shared<Collector>();
-  _implementation->host->registerBooks(bookIDs, collector);
-  Indexing indexing;
-  indexing.ended = Host::runMainLoopUntil(
-      [&] {
-        for (const std::string& bookID : _implementation->reports->take()) {
-          tell(bookID);
-        }
-        return collector->ended() && _implementation->host->owner().isQuietFor(quietSpan) &&
-               _implementation->reports->areQuietFor(modelSpan);
-      },
-      limit);
   // Not reported are books whose indexes were there before, and those that another process has made
   // meanwhile: the plug-in leaves them to it.
   const auto tellAll = [&] {
@@ -340,15 +327,39 @@ HelpSearch::Indexing HelpSearch::makeIndexes(const std::vector<std::string>& boo
       tell(bookID);
     }
   };
-  tellAll();
-  if (indexing.ended && !waiting.empty()) {
-    Host::runMainLoopUntil(
+  Indexing indexing;
+  bool mayHaveBeenLeftToAnother = anIndexingToolIsRunning();
+  bool isAnew = false;
+  while (true) {
+    (void)_implementation->reports->take();
+    const auto collector = std::make_shared<Collector>();
+    _implementation->host->registerBooks({waiting.begin(), waiting.end()}, collector);
+    indexing.ended = Host::runMainLoopUntil(
         [&] {
-          tellAll();
-          return waiting.empty() || !anIndexingToolIsRunning();
+          for (const std::string& bookID : _implementation->reports->take()) {
+            tell(bookID);
+          }
+          return collector->ended() && _implementation->host->owner().isQuietFor(quietSpan) &&
+                 _implementation->reports->areQuietFor(modelSpan);
         },
         limit);
     tellAll();
+    if (!indexing.ended || waiting.empty()) {
+      break;
+    }
+    Host::runMainLoopUntil(
+        [&] {
+          tellAll();
+          const bool isLeftToAnother = !waiting.empty() && anIndexingToolIsRunning();
+          mayHaveBeenLeftToAnother = mayHaveBeenLeftToAnother || isLeftToAnother;
+          return !isLeftToAnother;
+        },
+        limit);
+    tellAll();
+    // What the other made may be what was just removed here.
+    if (waiting.empty() || !mayHaveBeenLeftToAnother || std::exchange(isAnew, true)) {
+      break;
+    }
   }
   indexing.missing.assign(waiting.begin(), waiting.end());
   return indexing;

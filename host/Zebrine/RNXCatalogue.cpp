@@ -103,7 +103,7 @@ class Reader {
     if (!text) {
       return std::nullopt;
     }
-    const auto url = platform::URL::URLWithStringRelativeToURL(*text, _base);
+    auto url = platform::URL::URLWithStringRelativeToURL(*text, _base);
     if (!url) {
       refuse(_placeOf(key), "is no URL");
     }

@@ -157,7 +157,7 @@ void RNXObjectManager::_requestBookWithHelpBook(const std::shared_ptr<ZEBHelpBoo
   });
 }
 
-void RNXObjectManager::loadCatalogue(const platform::URL& url, CatalogueHandler handler) {
+void RNXObjectManager::loadCatalogue(const platform::URL& url, const CatalogueHandler& handler) {
   const platform::Clock::Instant now = platform::Environment::current()->clock->elapsed();
   std::shared_ptr<const RNXCatalogue> fresh;
   bool isFirst = false;
@@ -167,7 +167,7 @@ void RNXObjectManager::loadCatalogue(const platform::URL& url, CatalogueHandler 
     if (entry.catalogue && !entry.isLoading && now - entry.loaded < freshness) {
       fresh = entry.catalogue;
     } else {
-      entry.waiting.push_back(std::move(handler));
+      entry.waiting.push_back(handler);
       isFirst = !std::exchange(entry.isLoading, true);
     }
   }
@@ -190,8 +190,8 @@ void RNXObjectManager::_ask(const platform::URL& url) {
   const auto task = request ? session->dataTaskWithRequest(
                                   std::move(*request),
                                   [self = shared_from_this(), url](
-                                      std::optional<platform::Data> data,
-                                      std::shared_ptr<const platform::URLResponse> response,
+                                      const std::optional<platform::Data>& data,
+                                      const std::shared_ptr<const platform::URLResponse>& response,
                                       std::optional<platform::Error> error) {
                                     self->_catalogueDidLoad(url, data, response, std::move(error));
                                   })

@@ -58,7 +58,7 @@ class RNXObjectManager : public std::enable_shared_from_this<RNXObjectManager> {
                                         CompletionHandler completionHandler);
 
   /// The catalogue at a URL: as it was asked for less than a minute ago, else from the server.
-  void loadCatalogue(const platform::URL& url, CatalogueHandler handler);
+  void loadCatalogue(const platform::URL& url, const CatalogueHandler& handler);
 
   /// What is known of the catalogue without asking anybody: from this process or, in the URL cache,
   /// from an earlier one. Null when that is nothing.

@@ -78,10 +78,10 @@ void ZEBAssetDownloadOperation::main() {
   // Kept until the task has called for the first time, and no longer than that.
   const auto kept = std::make_shared<std::shared_ptr<ZEBAssetDownloadOperation>>(self);
   const auto download = session()->dataTaskWithRequest(
-      *made,
-      [kept, weak = std::weak_ptr(self)](std::optional<platform::Data> data,
-                                         std::shared_ptr<const platform::URLResponse> response,
-                                         std::optional<platform::Error> error) {
+      *made, [kept, weak = std::weak_ptr(self)](
+                 const std::optional<platform::Data>& data,
+                 const std::shared_ptr<const platform::URLResponse>& response,
+                 std::optional<platform::Error> error) {
         if (const auto operation = weak.lock()) {
           kept->reset();
           operation->_taskDidComplete(data, response, std::move(error));

@@ -29,8 +29,8 @@ class ScriptedProtocol : public URLProtocol {
     std::atomic<int> resumed{0};
   };
 
-  static std::shared_ptr<const URLProtocolClass> kind(std::shared_ptr<Counts> counts,
-                                                      Script script) {
+  static std::shared_ptr<const URLProtocolClass> kind(const std::shared_ptr<Counts>& counts,
+                                                      const Script& script) {
     URLProtocolClass made;
     made.canInitWithRequest = [](const URLRequest& request) {
       return URLProtocol::propertyForKey(mark, request).boolValue();
@@ -77,8 +77,8 @@ class URLProtocolTest : public SessionTest {
     }
   }
 
-  std::shared_ptr<const URLProtocolClass> registered(ScriptedProtocol::Script script) {
-    const auto kind = ScriptedProtocol::kind(counts, std::move(script));
+  std::shared_ptr<const URLProtocolClass> registered(const ScriptedProtocol::Script& script) {
+    auto kind = ScriptedProtocol::kind(counts, script);
     EXPECT_TRUE(URLProtocol::registerClass(kind));
     _kinds.push_back(kind);
     return kind;

@@ -14,6 +14,7 @@
 #include "host/Zebrine/ZEBConstants.h"
 #include "platform/Digest.h"
 #include "platform/PropertyList.h"
+#include "platform/ThreadSafety.h"
 #include "plugin/records/ZEBHelpindexIndex.h"
 #include "tests/plugin/HelpIndexWorld.h"
 #include "tests/support/ChildProcess.h"
@@ -80,17 +81,18 @@ class KilledDownload : public testing::Test {
         DOWNLOAD_ONCE_PROGRAM,
         {_folder.path("caches"), _server.URL("/catalogue.json"), "org.book", std::to_string(step)},
         output);
-    if (_reached) {
-      EXPECT_TRUE(_reached->wait()) << contents(output);
+    if (const auto reached = _round().reached) {
+      EXPECT_TRUE(reached->wait()) << contents(output);
       host.kill();
     }
     return host.wait();
   }
 
   void beginRound(int round, std::optional<Moment> moment) {
-    _current = &_editions[static_cast<size_t>(round) % 2];
-    _moment = std::move(moment);
-    _reached = _moment ? std::make_unique<tests::Latch>() : nullptr;
+    const platform::MutexLock lock(_mutex);
+    _state.edition = &_editions[static_cast<size_t>(round) % 2];
+    _state.moment = std::move(moment);
+    _state.reached = _state.moment ? std::make_shared<tests::Latch>() : nullptr;
   }
 
   std::string kept(const std::string& extension) const {
@@ -109,35 +111,51 @@ class KilledDownload : public testing::Test {
 
   /// The next start brings the current edition, whatever was left behind.
   void expectNextStartCompletes() {
-    _moment.reset();
-    _reached.reset();
+    {
+      const platform::MutexLock lock(_mutex);
+      _state.moment.reset();
+      _state.reached.reset();
+    }
     EXPECT_EQ(run(0), 0) << contents(_folder.path("output"));
-    EXPECT_EQ(contents(kept("helpindex")), _current->index);
-    EXPECT_EQ(contents(kept("exactmatch.plist")), _current->list);
+    EXPECT_EQ(contents(kept("helpindex")), _round().edition->index);
+    EXPECT_EQ(contents(kept("exactmatch.plist")), _round().edition->list);
   }
 
  private:
-  void _answer(const ScriptedRequest& request, ScriptedConnection& connection) {
+  /// What the server is to do now.
+  struct Round {
+    const Edition* edition = nullptr;
+    std::optional<Moment> moment;
+    /// Opened at that moment.
+    std::shared_ptr<tests::Latch> reached;
+  };
+
+  Round _round() const {
+    const platform::MutexLock lock(_mutex);
+    return _state;
+  }
+
+  void _answer(const ScriptedRequest& request, ScriptedConnection& connection) const {
+    const Round round = _round();
     const std::string kind = request.target.substr(request.target.rfind('.'));
-    const std::string& body = kind == ".json"    ? _current->catalogue
-                              : kind == ".index" ? _current->index
-                                                 : _current->list;
+    const std::string& body = kind == ".json"    ? round.edition->catalogue
+                              : kind == ".index" ? round.edition->index
+                                                 : round.edition->list;
     const std::string answer = httpAnswer(200, body, {"Cache-Control: no-cache"});
-    if (!_moment || _moment->path != kind) {
+    if (!round.moment || round.moment->path != kind) {
       connection.send(answer);
       return;
     }
     connection.send(std::string_view(answer).substr(
-        0, static_cast<size_t>(static_cast<double>(answer.size()) * _moment->share)));
-    _reached->open();
+        0, static_cast<size_t>(static_cast<double>(answer.size()) * round.moment->share)));
+    round.reached->open();
     connection.waitUntilClientIsGone();
   }
 
   const tests::TemporaryFolder _folder;
   const std::vector<Edition> _editions = {Edition("applet"), Edition("gadget")};
-  const Edition* _current = &_editions[0];
-  std::optional<Moment> _moment;
-  std::unique_ptr<tests::Latch> _reached;
+  mutable platform::Mutex _mutex;
+  Round _state GUARDED_BY(_mutex);
   // Last: its threads use all of the above.
   tests::ScriptedServer _server;
 };
