@@ -100,6 +100,9 @@ TEST_F(Build, ofAGroupWithoutBooksSavesAnEmptyModel) {
   EXPECT_FALSE(saved()->needsBuild());
   EXPECT_THAT(savedBooks(), IsEmpty());
   EXPECT_EQ(saved()->view()->totalPageCount(), 0U);
+  EXPECT_EQ(saved()->view()->options(),
+            platform::Value(platform::Value::Dictionary{
+                {"SuggestionThresholdsPerBook", platform::Value::Dictionary{}}}));
   EXPECT_THAT(world.controller->_registeredModels(), IsEmpty());
 }
 
@@ -131,6 +134,28 @@ TEST_F(Build, ofASmoothingBookTakesWordsButNoPages) {
   EXPECT_TRUE(view->termNumber(LUXTokenKind::stem, "printer"));
   // What the book says of its phrases is kept all the same, and its data beside the model.
   EXPECT_TRUE(std::filesystem::exists(savedDataPath("org.smooth")));
+}
+
+TEST_F(Build, keepsTheThresholdsOfEachBookUnchangedUnderItsFullName) {
+  using platform::Value;
+  // An index of attributes alone: two thresholds, one, none.
+  const auto addBook = [&](const std::string& bookID, const Value::Dictionary& attributes) {
+    world.addBookWithData(bookID, HelpLUXIndex::versionedDataWithAttributes(attributes), "Apps");
+  };
+  addBook("org.both*2.1", {{HelpLUXIndexAttributeBigramThresholdKey, 1.25},
+                           {HelpLUXIndexAttributeTrigramThresholdKey, 7}});
+  addBook("org.one", {{HelpLUXIndexAttributeTrigramThresholdKey, 0.5}});
+  addBook("org.none", {});
+  world.setBook("org.one", "Apps", {{"SmoothingOnly", true}});
+  build();
+  EXPECT_EQ(saved()->view()->options(),
+            Value(Value::Dictionary{
+                {"SuggestionThresholdsPerBook",
+                 Value::Dictionary{{"org.both*2.1", Value::Dictionary{{"BigramThreshold", 1.25},
+                                                                      {"TrigramThreshold", 7}}},
+                                   {"org.none", Value::Dictionary{}},
+                                   {"org.one", Value::Dictionary{{"TrigramThreshold", 0.5}}}}}}));
+  EXPECT_THAT(savedBooks(), ElementsAre("org.both*2.1", "org.none"));
 }
 
 TEST_F(Build, ofABookThatSmoothsAnotherGroupTakesItInToo) {
