@@ -124,7 +124,7 @@ namespace {
 
 /// The book of which only index and exact-match list come to this machine.
 std::shared_ptr<ZEBHelpBook> remoteBookOfEntry(const CatalogueEntry& entry) {
-  const std::shared_ptr<ZEBHelpBook> book =
+  std::shared_ptr<ZEBHelpBook> book =
       ZEBHelpBook::bookWithID(entry.bookID, entry.type, entry.folder);
   if (book == nullptr) {
     return nullptr;

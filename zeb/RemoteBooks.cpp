@@ -81,7 +81,7 @@ std::shared_ptr<const RNXCatalogue> loadCatalogue(const platform::URL& url, cons
       [answer](const std::shared_ptr<const RNXCatalogue>& catalogue,
                const std::optional<platform::Error>& error) { answer->set(catalogue, error); });
   zebd::Host::runMainLoopUntil([&] { return answer->isThere(); }, platform::Seconds(waiting.limit));
-  const auto catalogue = answer->catalogue();
+  auto catalogue = answer->catalogue();
   if (catalogue == nullptr) {
     console.error(fmt::format("{}: {}", url.absoluteString(), answer->reason()));
   }

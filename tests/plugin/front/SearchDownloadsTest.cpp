@@ -1,6 +1,7 @@
 // Searches in remote books whose indexes are on their way.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <atomic>
 #include <thread>
 
@@ -66,6 +67,19 @@ class SearchDownloads : public testing::Test {
     });
   }
 
+  /// Until a search has begun to wait for the download, in the simulated time.
+  void waitUntilASearchWaitsFor(const std::string& bookID) {
+    const std::string line = "====== Waiting index download completion for " + bookID;
+    while (true) {
+      const auto lines = world.logged(3);
+      if (std::find(lines.begin(), lines.end(), line) != lines.end()) {
+        break;
+      }
+      std::this_thread::yield();
+    }
+    world.clock->waitForSleepers(1);
+  }
+
   void waitUntilDownloaded(const std::shared_ptr<ZEBHelpBook>& book) {
     const auto& shelf = world.controller->_shelf();
     while (shelf->isIndexDownloadingForBook(book)) {
@@ -104,7 +118,7 @@ TEST_F(SearchDownloads, AfterFiveSecondsASearchGoesOnWithoutTheIndex) {
   std::atomic<bool> ended{false};
   const auto start = world.clock->elapsed();
   std::thread searcher = search({"r1", "local"}, ended);
-  world.clock->waitForSleepers(1);
+  waitUntilASearchWaitsFor("r1");
   world.clock->advance(platform::Seconds(4.999));
   EXPECT_FALSE(ended);
   world.clock->advance(platform::Seconds(0.001));
@@ -168,16 +182,12 @@ TEST_F(SearchDownloads, AnOlderIndexIsSearchedAsItStandsAfterFiveSeconds) {
   const auto start = world.clock->elapsed();
   std::thread searcher = search({"r1"}, ended);
   server.waitForRequests(1);
-  while (!ended) {
-    world.clock->waitForSleepers(1);
-    if ((world.clock->elapsed() - start).count() >= 5.0) {
-      break;
-    }
-    world.clock->advance(platform::Seconds(0.5));
-  }
+  waitUntilASearchWaitsFor("r1");
+  world.clock->advance(platform::Seconds(4.999));
+  EXPECT_FALSE(ended);
+  world.clock->advance(platform::Seconds(0.001));
   searcher.join();
-  EXPECT_GE((world.clock->elapsed() - start).count(), 5.0);
-  EXPECT_LE((world.clock->elapsed() - start).count(), 5.5);
+  EXPECT_DOUBLE_EQ((world.clock->elapsed() - start).count(), 5.0);
   EXPECT_THAT(titlesOf(world.owner->records(0)), ElementsAre("Older"));
 }
 
