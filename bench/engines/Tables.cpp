@@ -362,15 +362,35 @@ void printTables(const Settings& settings) {
       "{} pages in {} manuals, {:.1f} MB of text. All engines found the same pages for all "
       "questions asked, {} in all.\n",
       pageCount(books), books.size(), static_cast<double>(textLength(books)) / 1e6, found);
-  printSearches(manuals, classes);
-  printSearches(parts, classes);
-  printWholeSearches(manuals, classes);
-  printWholeSearches(parts, classes);
-  printLetters({&manuals, &parts});
-  printOpening({&manuals, &parts});
-  printSizes({&manuals, &parts});
-  printBuilding(books);
-  printMemory(parts, classes);
+  const auto isWanted = [&](const char* table) {
+    return settings.tables.empty() || std::find(settings.tables.begin(), settings.tables.end(),
+                                                table) != settings.tables.end();
+  };
+  for (const Shelf* const shelf : {&manuals, &parts}) {
+    if (isWanted("engine")) {
+      printSearches(*shelf, classes);
+    }
+  }
+  for (const Shelf* const shelf : {&manuals, &parts}) {
+    if (isWanted("plugin")) {
+      printWholeSearches(*shelf, classes);
+    }
+  }
+  if (isWanted("letters")) {
+    printLetters({&manuals, &parts});
+  }
+  if (isWanted("opening")) {
+    printOpening({&manuals, &parts});
+  }
+  if (isWanted("size")) {
+    printSizes({&manuals, &parts});
+  }
+  if (isWanted("building")) {
+    printBuilding(books);
+  }
+  if (isWanted("memory")) {
+    printMemory(parts, classes);
+  }
 }
 
 }  // namespace engines

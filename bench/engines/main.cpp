@@ -14,6 +14,8 @@ int main(int count, char** arguments) {
   app.add_option("--folder", settings.folder, "Where the indexes are made");
   app.add_option("--questions", settings.questionCount, "Questions of each kind");
   app.add_option("--seed", settings.seed, "Other questions with another number");
+  app.add_option("--tables", settings.tables,
+                 "Only these: engine, plugin, letters, opening, size, building, memory");
   std::string engine;
   std::string folder;
   std::string questions;

@@ -84,9 +84,11 @@ TEST(SKIndex, isNotOpenedWhenTruncatedAnywhere) {
 }
 
 TEST(SKIndex, isNotOpenedInAnotherVersion) {
-  std::vector<uint8_t> bytes = smallIndexBytes();
-  put<uint16_t>(bytes, format::versionAt, 2);
-  EXPECT_EQ(open(bytes), nullptr);
+  for (const uint16_t version : std::initializer_list<uint16_t>{0, format::version + 1, 0xFFFF}) {
+    std::vector<uint8_t> bytes = smallIndexBytes();
+    put<uint16_t>(bytes, format::versionAt, version);
+    EXPECT_EQ(open(bytes), nullptr);
+  }
 }
 
 TEST(SKIndex, isOpenedInALaterRevision) {
@@ -127,7 +129,7 @@ TEST(SKIndex, skipsSectionsThatItDoesNotKnow) {
 }
 
 TEST(SKIndex, isNotOpenedWithoutASection) {
-  for (uint32_t id = 1; id <= format::lastKnownSection; ++id) {
+  for (uint32_t id = 1; id <= format::lastRequiredSection; ++id) {
     std::vector<uint8_t> bytes = smallIndexBytes();
     put<uint32_t>(bytes, entryOfSection(bytes, static_cast<format::Section>(id)), 4711);
     EXPECT_EQ(open(bytes), nullptr) << id;
@@ -145,7 +147,7 @@ TEST(SKIndex, isNotOpenedWithASectionTwice) {
 
 TEST(SKIndex, isNotOpenedWhenAnExtentDoesNotFit) {
   const std::vector<uint8_t> bytes = smallIndexBytes();
-  for (uint32_t id = 1; id <= format::lastKnownSection; ++id) {
+  for (uint32_t id = 1; id <= format::lastRequiredSection; ++id) {
     const size_t entry = entryOfSection(bytes, static_cast<format::Section>(id));
     for (const uint64_t wrong :
          {uint64_t{0}, uint64_t{8}, uint64_t{bytes.size() + 1}, ~uint64_t{0}, ~uint64_t{7}}) {
