@@ -59,6 +59,10 @@ ParsedCommandLine parseCommandLine(const std::vector<std::string>& arguments) {
          "--language", create.language,
          "The language of the pages (\"de\", \"pt-BR\", \"German\"); without, it is found out")
       ->type_name("TAG");
+  app.add_option("--jobs", create.jobs,
+                 "Read pages in N threads; without, one a processor, or one with --lowered-priority")
+      ->type_name("N")
+      ->check(CLI::Range(size_t{1}, maximumJobs).description(""));
   app.add_flag("--lowered-priority", create.loweredPriority,
                "Give way to other programs, on the processor and on the disk");
   app.add_flag("-v,--verbose", command.verbosity,

@@ -4,6 +4,8 @@
 
 namespace bvmake {
 
+void Report::filesDone(size_t, size_t) {}
+
 StreamReport::StreamReport(std::FILE* stream, std::string program, int verbosity)
     : _stream(stream), _program(std::move(program)), _verbosity(verbosity) {}
 

@@ -18,6 +18,8 @@ enum class ExitCode : int {
   usage = 2,
 };
 
+inline constexpr size_t maximumJobs = 256;
+
 /// One run of `bvmake --create`.
 struct CreateOptions {
   /// The folder to index; page paths in the index are relative to it, with a leading slash.
@@ -34,8 +36,11 @@ struct CreateOptions {
   /// everything else in it as it is.
   bool appendLUXOnly = false;
   /// The tag or name of the language that the pages are in; when empty it is found out
-  /// (SemanticData).
+  /// (SemanticData.h).
   std::string language;
+  /// How many threads read pages; 0 for as many as there are processors, or one with
+  /// loweredPriority. Never more than maximumJobs.
+  size_t jobs = 0;
   /// Give way to all other programs, on the processor and on the disk. Holds for the whole process
   /// from then on.
   bool loweredPriority = false;
@@ -63,7 +68,8 @@ struct Outcome {
 };
 
 /// Indexes a folder. The same bytes are written for the same folder contents and options, whatever
-/// order the disk lists the files in. A page or sub-folder that cannot be read is reported as a
+/// order the disk lists the files in and however many threads read them; messages come in the order
+/// of the files' paths. A page or sub-folder that cannot be read is reported as a
 /// warning and left out; what makes the run fail is reported as an error, and then the file at the
 /// output path is as it was before. Throws nothing but std::bad_alloc.
 /// Files are read and written through platform::Environment::current()->files.

@@ -140,6 +140,34 @@ struct LUXIndexWriter::Implementation {
     }
   }
 
+  // The numbers of `other` mean the same words under other numbers here.
+  void absorb(Implementation& other) {
+    std::vector<uint32_t> surfaceOfOther(other.surfaces.size());
+    for (size_t theirs = 0; theirs < other.surfaces.size(); ++theirs) {
+      const Surface& surface = other.surfaces[theirs];
+      const uint32_t ours = surfaceNames.numberOf(other.surfaceNames[theirs]);
+      if (ours == surfaces.size()) {
+        surfaces.push_back(surface);
+        Surface& added = surfaces.back();
+        added.count = 0;
+        added.form = surface.form == none ? none : forms.numberOf(other.forms[surface.form]);
+        added.stem = surface.stem == none ? none : stems.numberOf(other.stems[surface.stem]);
+      }
+      surfaces[ours].count += surface.count;
+      surfaceOfOther[theirs] = ours;
+    }
+    for (Page& page : other.pages) {
+      for (LUXWordSequence::Word& word : page.sequence.words) {
+        word.number = surfaceOfOther[word.number];
+      }
+      for (Whole& whole : page.wholes) {
+        whole.form = forms.numberOf(other.forms[whole.form]);
+      }
+      pages.push_back(std::move(page));
+    }
+    keys.merge(other.keys);
+  }
+
   // Which surface each form is shown as: as it is written where it does not begin a sentence, as
   // far as one can know: in small letters if it ever is.
   std::vector<uint32_t> displaySurfaces() const {
@@ -366,6 +394,17 @@ void LUXIndexWriter::addDocument(const LUXDocument& document) {
     _implementation->addText(block, page);
   }
   _implementation->pages.push_back(std::move(page));
+}
+
+void LUXIndexWriter::absorb(LUXIndexWriter& other) {
+  for (const std::string& key : other._implementation->keys) {
+    if (_implementation->keys.contains(key)) {
+      throw platform::Exception(platform::invalidArgumentException,
+                                "the page " + key + " comes twice");
+    }
+  }
+  _implementation->absorb(*other._implementation);
+  other._implementation.reset();
 }
 
 size_t LUXIndexWriter::documentCount() const noexcept { return _implementation->pages.size(); }
