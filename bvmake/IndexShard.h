@@ -55,7 +55,9 @@ class IndexShard {
 
   /// May both be called once, side by side.
   platform::Data finishKeywords() { return _keywords.finish(); }
-  platform::Data finishSemanticData() { return _semanticData.finish(); }
+  platform::Data finishSemanticData(size_t threadCount) {
+    return _semanticData.finish(threadCount);
+  }
 
  private:
   void _addPage(PreparedPage page, AddedFile& added);

@@ -258,7 +258,7 @@ class Run {
     OrderedWork<bool>::run(_options.appendLUXOnly ? 1 : 2, limits,
                            {free,
                             [&](size_t piece, size_t) {
-                              halves[piece] = piece == 0 ? whole.finishSemanticData()
+                              halves[piece] = piece == 0 ? whole.finishSemanticData(_workerCount)
                                                          : whole.finishKeywords();
                               return true;
                             },

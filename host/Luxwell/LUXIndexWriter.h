@@ -46,10 +46,10 @@ class LUXIndexWriter {
 
   size_t documentCount() const noexcept;
 
-  /// The bytes. The writer is not used afterwards. Throws platform::Exception
-  /// "InvalidArgumentException" for a book whose data would be too large for the format (4 GiB a
-  /// section).
-  platform::Data finish();
+  /// The bytes, which do not depend on the number of threads that make them. The writer is not used
+  /// afterwards. Throws platform::Exception "InvalidArgumentException" for a book whose data would
+  /// be too large for the format (4 GiB a section).
+  platform::Data finish(size_t threadCount = 1);
 
  private:
   struct Implementation;

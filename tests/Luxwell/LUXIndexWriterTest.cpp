@@ -125,14 +125,14 @@ std::vector<LUXDocument> example() {
 TEST(LUXIndexWriter, absorbedWritersMakeTheSameBytesAsOne) {
   std::mt19937 random(3);
   std::vector<LUXDocument> documents;
-  for (int i = 0; i < 60; ++i) {
+  for (int i = 0; i < 200; ++i) {
     std::string text;
     for (int word = 0; word < 50; ++word) {
       const uint32_t number = static_cast<uint32_t>(random());
       text += (number % 3 == 0 ? "Word" : "word") + std::to_string(number / 3 % 90);
       text += number % 11 == 0 ? ". The " : number % 7 == 0 ? " os.path " : " ";
     }
-    documents.push_back(document("page" + std::to_string(i * 37 % 60), "Title " + text.substr(0, 9),
+    documents.push_back(document("page" + std::to_string(i * 37 % 200), "Title " + text.substr(0, 9),
                                  {text, "The print queue waits."}));
   }
   const Data bytes = written(documents);
@@ -149,7 +149,8 @@ TEST(LUXIndexWriter, absorbedWritersMakeTheSameBytesAsOne) {
       writers[0]->absorb(*writers[i]);
     }
     EXPECT_EQ(writers[0]->documentCount(), documents.size());
-    EXPECT_EQ(writers[0]->finish(), bytes);
+    // Threads that take part in writing change nothing either.
+    EXPECT_EQ(writers[0]->finish(count), bytes);
   }
 }
 
