@@ -123,8 +123,7 @@ class Check {
         _problems.add("term {}: its entry in the dictionary is broken", number + 1);
         return false;
       }
-      if (beginsBlock &&
-          _view.blockKey(number / _view.termsPerBlock()) != format::blockKey(term)) {
+      if (beginsBlock && _view.blockKey(number / _view.termsPerBlock()) != format::blockKey(term)) {
         _problems.add("term {}: the key of its block is wrong", number + 1);
       }
       if (postingsLength > _postings.left() || positionsLength > _positions.left()) {

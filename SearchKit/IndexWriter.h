@@ -48,10 +48,10 @@ class IndexWriter {
 
   size_t documentCount() const;
 
-  /// Takes over the documents of a writer with the same options that has absorbed none itself and is
-  /// not used afterwards: so several threads can fill a writer each, and the index is the same as
-  /// from one. Throws platform::Exception "InvalidArgumentException", and both stay as they were,
-  /// when both have a document of the same path.
+  /// Takes over the documents of a writer with the same options that has absorbed none itself and
+  /// is not used afterwards: so several threads can fill a writer each, and the index is the same
+  /// as from one. Throws platform::Exception "InvalidArgumentException", and both stay as they
+  /// were, when both have a document of the same path.
   void absorb(IndexWriter& other);
 
   /// Does now, in this thread, what finish() else has to do for these documents alone. Nothing is

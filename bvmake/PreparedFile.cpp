@@ -23,9 +23,7 @@ std::string nameFromPath(const std::string& path) {
 
 FilePreparer::FilePreparer(const PreparationOptions& options,
                            std::shared_ptr<platform::FileManager> files)
-    : _options(options),
-      _files(std::move(files)),
-      _summarizer(std::make_unique<Summarizer>()) {}
+    : _options(options), _files(std::move(files)), _summarizer(std::make_unique<Summarizer>()) {}
 
 FilePreparer::~FilePreparer() = default;
 

@@ -27,8 +27,8 @@ namespace bvmake {
 
 namespace {
 
-/// Files being read at once, in bytes, whatever the number of workers. What a page takes while it is
-/// read is some times the size of its file.
+/// Files being read at once, in bytes, whatever the number of workers. What a page takes while it
+/// is read is some times the size of its file.
 constexpr uint64_t bytesInFlight = uint64_t{32} << 20;
 
 constexpr int highestVerbosity = 3;

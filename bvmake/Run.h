@@ -12,10 +12,12 @@ class Report;
 /// What the program's exit status says.
 enum class ExitCode : int {
   success = 0,
-  /// The folder, the output file or the file to inspect cannot be used.
+  /// The folder, the output file or the file to look at cannot be used.
   failure = 1,
   /// The command line is wrong; nothing was done.
   usage = 2,
+  /// The file that was checked is damaged.
+  damaged = 3,
 };
 
 inline constexpr size_t maximumJobs = 256;

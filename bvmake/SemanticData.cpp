@@ -57,8 +57,7 @@ LUXDocument semanticDocument(const PreparedPage& prepared) {
     document.description = prepared.abstract;
   }
   document.excludedFromSearch = prepared.page.excludedFromSearch;
-  forEachBlock(prepared.page,
-               [&](const std::string& block) { document.blocks.push_back(block); });
+  forEachBlock(prepared.page, [&](const std::string& block) { document.blocks.push_back(block); });
   return document;
 }
 

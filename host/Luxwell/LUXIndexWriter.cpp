@@ -295,8 +295,8 @@ struct LUXIndexWriter::Implementation {
     LUXTokenSections sections(
         {stems.all(), numberBigrams(), forms.all(), phraseNames(finder), std::move(kept)});
     // Each piece's pages are one part, so that they can be put in order.
-    std::vector<std::unique_ptr<LUXTokenSections::Pages>> parts(
-        (pages.size() + pagesAtOnce - 1) / pagesAtOnce);
+    std::vector<std::unique_ptr<LUXTokenSections::Pages>> parts((pages.size() + pagesAtOnce - 1) /
+                                                                pagesAtOnce);
     LUXInParallel(pages.size(), pagesAtOnce, threadCount, [&](size_t from, size_t to) {
       auto part = std::make_unique<LUXTokenSections::Pages>(sections);
       for (size_t number = from; number < to; ++number) {

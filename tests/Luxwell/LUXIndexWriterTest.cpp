@@ -132,8 +132,8 @@ TEST(LUXIndexWriter, absorbedWritersMakeTheSameBytesAsOne) {
       text += (number % 3 == 0 ? "Word" : "word") + std::to_string(number / 3 % 90);
       text += number % 11 == 0 ? ". The " : number % 7 == 0 ? " os.path " : " ";
     }
-    documents.push_back(document("page" + std::to_string(i * 37 % 200), "Title " + text.substr(0, 9),
-                                 {text, "The print queue waits."}));
+    documents.push_back(document("page" + std::to_string(i * 37 % 200),
+                                 "Title " + text.substr(0, 9), {text, "The print queue waits."}));
   }
   const Data bytes = written(documents);
   const auto tokenizer = HelpTokenizer::tokenizerForLanguage("English");
