@@ -19,6 +19,18 @@ namespace {
 
 namespace fs = std::filesystem;
 
+/// 0 for a file that has just gone: reading it will tell.
+uint64_t sizeOfFile(const std::string& file) {
+  std::error_code code;
+  const uintmax_t size = fs::file_size(file, code);
+  return code ? 0 : size;
+}
+
+/// "index.docbook#start.html": the pages of a document have such names.
+bool hasNameOfPart(std::string_view name) {
+  return name.starts_with(docBookFileName) && name.substr(docBookFileName.size()).starts_with('#');
+}
+
 class Walk {
  public:
   Walk(std::string folder, Report& report)
@@ -84,7 +96,7 @@ class Walk {
       return;
     }
     const std::optional<PageKind> kind = pageKindOfFileName(name);
-    if (!kind) {
+    if (!kind || hasNameOfPart(name)) {
       return;
     }
     if (!platform::isValidUTF8(path)) {
@@ -92,10 +104,11 @@ class Walk {
       return;
     }
     if (status.type() == fs::file_type::symlink) {
-      _links.push_back({path, _folder + path, *kind});
+      _links.push_back({path, _folder + path, *kind, 0});
     } else if (status.type() == fs::file_type::regular) {
       std::string file = _folder + path;
-      _pages.push_back({std::move(path), std::move(file), *kind});
+      const uint64_t size = sizeOfFile(file);
+      _pages.push_back({std::move(path), std::move(file), *kind, size});
     }
   }
 
@@ -115,6 +128,7 @@ class Walk {
                  !targets.insert(target).second) {
         _report.progress(3, fmt::format("{}: a link to what is found anyway", link.path));
       } else {
+        link.size = sizeOfFile(target);
         _pages.push_back(std::move(link));
       }
     }

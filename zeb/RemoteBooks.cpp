@@ -18,9 +18,9 @@
 #include "platform/Files.h"
 #include "platform/RunLoop.h"
 #include "platform/ThreadSafety.h"
-#include "zeb/BookFolder.h"
 #include "zeb/HelpSearch.h"
 #include "zeb/Indexing.h"
+#include "zebd/BookFolder.h"
 #include "zebd/Host.h"
 
 namespace zeb {
@@ -146,8 +146,8 @@ std::optional<CatalogueEntry> entryToStore(const RNXCatalogueEntry& book,
 }
 
 bool hasIndex(const CatalogueEntry& entry) {
-  const auto book = bookOfEntry(entry);
-  return book != nullptr && indexPathOfBook(*book);
+  const auto book = zebd::bookOfEntry(entry);
+  return book != nullptr && zebd::indexPathOfBook(*book);
 }
 
 /// Fetches what the books need; returns whether all have an index then.
