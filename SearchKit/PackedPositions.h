@@ -132,6 +132,11 @@ class BitReader {
     return skip(high + 1 + lowBits);
   }
 
+  /// Bits read so far.
+  uint64_t position() const noexcept { return _at; }
+  /// Whether what is left is less than a byte, and zeros.
+  bool isAtEnd() const noexcept { return _byteCount * 8 - _at < 8 && _window() == 0; }
+
   bool skip(uint64_t bits) noexcept {
     _at += bits;
     return _at <= _byteCount * 8 || _fail();
