@@ -1,8 +1,10 @@
 #include "plugin/records/ZEBHelpindexIndex.h"
 
+#include <string_view>
 #include <utility>
 #include <vector>
 
+#include "SearchKit/IndexReader.h"
 #include "host/Luxwell/HelpLUXIndex.h"
 #include "host/Zebrine/ZEBCheckClass.h"
 #include "host/Zebrine/ZEBLog.h"
@@ -32,6 +34,11 @@ std::optional<std::string> decodeString(platform::KeyedUnarchiver& coder, const 
   } catch (const platform::Exception&) {
     return std::nullopt;
   }
+}
+
+bool isPlainPath(std::string_view path) {
+  return path.size() > 1 && path.front() == '/' && path.back() != '/' &&
+         path.find('%') == std::string_view::npos && path.find('\0') == std::string_view::npos;
 }
 
 }  // namespace
@@ -175,6 +182,7 @@ bool ZEBHelpindexIndex::_populateWithDictionary(const platform::Value& dictionar
 void ZEBHelpindexIndex::_disposeRetainedData() {
   _anchorDictionary.set({});
   _indexData.reset();
+  _hasPlainPages.reset();
   _luxIndexData.reset();
   _luxIndex.reset();
 }
@@ -190,6 +198,26 @@ SKIndexRef ZEBHelpindexIndex::copyIndexRef() {
     _isSearchable.store(SKIndexGetMaximumTermID(opened) >= 1);
   }
   return opened;
+}
+
+bool ZEBHelpindexIndex::hasPlainPages(const SKIndexRef& indexRef) {
+  const platform::MonitorLock lock(_monitor);
+  // The record may have other data by now.
+  const bool isOfThisData =
+      _indexData && _indexData->bytes() == searchkit::indexBytes(*indexRef).bytes();
+  if (isOfThisData && _hasPlainPages) {
+    return *_hasPlainPages;
+  }
+  const uint32_t count = searchkit::indexDocumentCount(*indexRef);
+  bool arePlain = true;
+  for (uint32_t id = 0; arePlain && id < count; ++id) {
+    const auto page = searchkit::indexDocument(*indexRef, id);
+    arePlain = page && page->abstract && isPlainPath(page->path);
+  }
+  if (isOfThisData) {
+    _hasPlainPages = arePlain;
+  }
+  return arePlain;
 }
 
 void ZEBHelpindexIndex::disposeIndexRef(SKIndexRef& indexRef) const {

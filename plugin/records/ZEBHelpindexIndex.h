@@ -77,6 +77,11 @@ class ZEBHelpindexIndex : public ZEBIndex, public platform::KeyedCodable {
   /// Gives back what copyIndexRef() gave; the reference is null afterwards.
   void disposeIndexRef(SKIndexRef& indexRef) const;
 
+  /// Whether each page of the opened index has an abstract and a path that leads to a URL of its
+  /// own: absolute, not ending in a slash, without NUL and '%'. Records for such pages can be made
+  /// without a look at them. Found out once for the record's data.
+  bool hasPlainPages(const SKIndexRef& indexRef);
+
   /// The semantic index, made from its data at the first call that succeeds; the data is then let
   /// go. Null without data, or with data that makes none.
   std::shared_ptr<HelpLUXIndex> luxIndex();
@@ -112,6 +117,8 @@ class ZEBHelpindexIndex : public ZEBIndex, public platform::KeyedCodable {
 
   mutable platform::Monitor _monitor;
   std::optional<platform::Data> _indexData GUARDED_BY(_monitor);
+  /// Of _indexData; absent until asked for.
+  std::optional<bool> _hasPlainPages GUARDED_BY(_monitor);
   /// Not owned: those who were handed it are its owners.
   std::weak_ptr<const SKIndex> _indexRef GUARDED_BY(_monitor);
   std::optional<platform::Data> _luxIndexData GUARDED_BY(_monitor);
