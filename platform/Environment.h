@@ -46,6 +46,9 @@ struct Environment {
   /// The user's caches folder; absent when there is none (no home folder).
   std::optional<std::string> cachesDirectory;
 
+  /// A file of certificates (PEM) to trust in place of the system's store; absent but in tests.
+  std::optional<std::string> certificateAuthorityFile;
+
   /// The real world: system clock, files and processes, log on standard error up to level 2,
   /// languages from LANGUAGE, LC_ALL, LC_MESSAGES and LANG, caches folder from XDG_CACHE_HOME or
   /// HOME, settings from zeb/settings.plist under XDG_CONFIG_HOME or HOME, and notifications within

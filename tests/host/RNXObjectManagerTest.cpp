@@ -10,7 +10,9 @@
 #include "host/Zebrine/RNXExpectedAssets.h"
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBHelpBook.h"
+#include "platform/URLError.h"
 #include "tests/host/RemoteHostWorld.h"
+#include "tests/support/DigestGate.h"
 #include "tests/support/NginxServer.h"
 #include "tests/support/ScriptedServer.h"
 
@@ -217,6 +219,49 @@ TEST_F(RNXObjectManagerTest, sendsTheUsersCredentialsForTheCatalogue) {
       {{"Host", "127.0.0.1"}, {"Port", server.port()}, {"Scheme", "bearer"}, {"Token", "secret"}});
   request(book(server.URL("/catalogue.json")));
   EXPECT_EQ(server.requests().at(0).header("Authorization"), "Bearer secret");
+}
+
+TEST_F(RNXObjectManagerTest, readsACatalogueBehindADigestPassword) {
+  const tests::DigestGate gate("SHA-256", "reader", "secret");
+  const ScriptedServer server(gate.before(tests::answering(httpAnswer(200, catalogue()))));
+  EXPECT_THAT(request(book(server.URL("/catalogue.json"))).error->description, HasSubstr("401"));
+  world.setCredential({{"Host", "127.0.0.1"},
+                       {"Port", server.port()},
+                       {"Scheme", "digest"},
+                       {"User", "reader"},
+                       {"Password", "secret"}});
+  EXPECT_NE(request(book(server.URL("/catalogue.json"))).book, nullptr);
+}
+
+TEST_F(RNXObjectManagerTest, readsACatalogueThatHasMovedElsewhereWithoutCredentials) {
+  ScriptedServer other([](const auto&, tests::ScriptedConnection& connection) {
+    connection.send(httpAnswer(200, catalogue()));
+  });
+  const auto server =
+      ScriptedServer::sending(httpAnswer(302, "", {"Location: " + other.URL("/moved.json")}));
+  world.setCredential(
+      {{"Host", "127.0.0.1"}, {"Port", server->port()}, {"Scheme", "bearer"}, {"Token", "secret"}});
+  const Answer answer = request(book(server->URL("/catalogue.json")));
+  ASSERT_NE(answer.book, nullptr);
+  // What it names is still relative to where it was asked for.
+  EXPECT_EQ(answer.book->remoteSearchIndex()->absoluteString(), server->URL("/one/i"));
+  EXPECT_EQ(other.requests().at(0).header("Authorization"), std::nullopt);
+}
+
+TEST_F(RNXObjectManagerTest, readsCataloguesOfServersWithARightCertificateAlone) {
+  const auto& authority = tests::TestAuthority::shared();
+  world.trustedAuthority = authority.certificateFile();
+  world.setDefaults({});
+  const tests::NginxServer right({}, authority.serverIdentity());
+  right.write("catalogue.json", catalogue());
+  EXPECT_NE(request(book(right.URL("/catalogue.json"))).book, nullptr);
+  const tests::NginxServer wrong({}, authority.foreignIdentity());
+  wrong.write("catalogue.json", catalogue());
+  const Answer answer = request(book(wrong.URL("/catalogue.json")));
+  EXPECT_EQ(answer.book, nullptr);
+  ASSERT_TRUE(answer.error);
+  EXPECT_TRUE(platform::isURLError(*answer.error, platform::URLErrorServerCertificateUntrusted));
+  EXPECT_TRUE(wrong.accessLog().empty());
 }
 
 TEST_F(RNXObjectManagerTest, takesTheLocalizationOfTheBookElseWhatTheCatalogueHas) {

@@ -228,6 +228,42 @@ TEST_F(NginxDownload, showsTheUsersPassword) {
   EXPECT_NE(world.knownRecord("org.book"), nullptr);
 }
 
+TEST_F(NginxDownload, showsTheUsersPasswordOverTLSAndBelievesNoWrongCertificate) {
+  const auto& authority = tests::TestAuthority::shared();
+  const tests::TemporaryFolder folder;
+  const std::string passwords =
+      folder.write("passwords", tests::nginxPasswordLine("user", "secret"));
+  std::filesystem::permissions(folder.path(), std::filesystem::perms::all);
+  const std::string locked = "auth_basic \"help\"; auth_basic_user_file " + passwords + ";";
+  const NginxServer server(locked, authority.serverIdentity());
+  const NginxServer impostor({}, authority.foreignIdentity());
+  publish(server, "org.book", "applet");
+  publish(impostor, "org.book", "gadget");
+  const auto credential = [](const NginxServer& of) {
+    return platform::Value::Dictionary{
+        {"Host", "127.0.0.1"}, {"Port", of.port()}, {"User", "user"}, {"Password", "secret"}};
+  };
+  world.change([&](platform::Environment& environment) {
+    environment.certificateAuthorityFile = authority.certificateFile();
+    environment.userDefaults = platform::userDefaultsFromDictionary(
+        {{"RemoteServices", platform::Value::Dictionary{
+                                {"org.zeb.help", platform::Value::Array{credential(server),
+                                                                        credential(impostor)}}}}});
+  });
+  auto book = makeBook(server, "org.book");
+  (void)world.shelf->indicesForBook(book);
+  EXPECT_TRUE(finishDownload(book));
+  EXPECT_NE(world.knownRecord("org.book"), nullptr);
+  EXPECT_THAT(messages(1), IsEmpty());
+  restart();
+  book = makeBook(impostor, "org.book");
+  (void)world.shelf->indicesForBook(book);
+  EXPECT_TRUE(finishDownload(book));
+  EXPECT_THAT(messages(1), testing::ElementsAre(HasSubstr("Failed to make book request")));
+  EXPECT_EQ(ShelfWorld::contents(world.generatedPath("org.book", "en")), indexBytes("applet"));
+  EXPECT_TRUE(impostor.accessLog().empty());
+}
+
 TEST_F(NginxDownload, withoutAServerLeavesWhatIsHere) {
   NginxServer server;
   publish(server, "org.book", "applet");
