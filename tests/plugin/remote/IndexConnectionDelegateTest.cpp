@@ -416,6 +416,16 @@ TEST_F(IndexConnectionDelegate, anIndexThatCannotBeWrittenIsLoggedAndInUseAllThe
   EXPECT_THAT(world.observer->kinds(), ElementsAre(ZEBIndexChangeUpdated));
 }
 
+TEST_F(IndexConnectionDelegate, deletesWhatHostsLeftThatWereKilledWhileTheyWrote) {
+  const auto delegate = make();
+  const std::string folder = platform::stringByDeletingLastPathComponent(generatedPath());
+  ASSERT_EQ(world.files->createDirectoryWithParents(folder), std::nullopt);
+  ASSERT_EQ(world.files->writeAtomically(folder + "/.fr.helpindex.76.0.tmp", {}), std::nullopt);
+  receive(*delegate, ShelfWorld::indexBytes(luxData()));
+  complete(*delegate);
+  EXPECT_EQ(world.files->namesInDirectory(folder), std::vector<std::string>{"fr.helpindex"});
+}
+
 TEST_F(IndexConnectionDelegate, addsGenerationsUnderTheLockOfTheShelf) {
   const auto delegate = make(false);
   std::thread caller;
