@@ -112,7 +112,8 @@ std::vector<const RNXCatalogueEntry*> chosenEntries(const RNXCatalogue& catalogu
   return chosen;
 }
 
-CatalogueEntry remoteEntry(const RNXCatalogueEntry& book, const platform::URL& catalogueURL) {
+CatalogueEntry remoteEntry(const RNXCatalogueEntry& book, const platform::URL& catalogueURL,
+                           const std::vector<std::string>& languages) {
   CatalogueEntry entry;
   entry.bookID = book.identifier;
   entry.title = book.title;
@@ -122,6 +123,7 @@ CatalogueEntry remoteEntry(const RNXCatalogueEntry& book, const platform::URL& c
   entry.accessPagePath = stringByAppendingPathComponent(entry.folder, "index.html");
   entry.language = book.locale.value_or("");
   entry.catalogueURL = catalogueURL.absoluteString();
+  entry.languages = languages;
   if (book.pages) {
     entry.pagesURL = book.pages->absoluteString();
   }
@@ -131,10 +133,11 @@ CatalogueEntry remoteEntry(const RNXCatalogueEntry& book, const platform::URL& c
 /// What is to be remembered of the book; absent, and told, when another one has its place.
 std::optional<CatalogueEntry> entryToStore(const RNXCatalogueEntry& book,
                                            const platform::URL& catalogueURL,
-                                           const Catalogue& catalogue, Console& console) {
+                                           const AddCommand& command, const Catalogue& catalogue,
+                                           Console& console) {
   std::optional<CatalogueEntry> former = catalogue.entry(book.identifier);
   if (!former || former->isRemote()) {
-    return remoteEntry(book, catalogueURL);
+    return remoteEntry(book, catalogueURL, command.languages);
   }
   if (former->type == ZEBHelpBookType3) {
     former->catalogueURL = catalogueURL.absoluteString();
@@ -224,6 +227,32 @@ void forgetKnownIndicesWhenDue(const std::vector<CatalogueEntry>& entries) {
   }
 }
 
+void followLanguages(const Catalogue& catalogue, std::vector<CatalogueEntry>& entries) {
+  std::vector<CatalogueEntry> changed;
+  for (CatalogueEntry& entry : entries) {
+    const auto book = entry.isRemote() ? bookOfEntry(entry) : nullptr;
+    if (book == nullptr || book->localization() == entry.language) {
+      continue;
+    }
+    entry.language = book->localization();
+    const std::optional<platform::URL> pages = book->remoteURL();
+    entry.pagesURL = pages ? std::optional(pages->absoluteString()) : std::nullopt;
+    changed.push_back(entry);
+  }
+  if (changed.empty()) {
+    return;
+  }
+  forgetKnownIndices();
+  // Whoever has the catalogue to himself may be removing one of them; the next time will do.
+  if (const auto lock = platform::FileLock::tryLock(lockPathOfCatalogue(catalogue))) {
+    for (const CatalogueEntry& entry : changed) {
+      if (catalogue.entry(entry.bookID)) {
+        (void)catalogue.store(entry);
+      }
+    }
+  }
+}
+
 ExitCode addBooks(const AddCommand& command, const Catalogue& catalogue,
                   const Installation& installation, const Waiting& waiting, Console& console) {
   const std::optional<platform::URL> url = addressOfCatalogue(command.url);
@@ -239,7 +268,7 @@ ExitCode addBooks(const AddCommand& command, const Catalogue& catalogue,
   const auto chosen = chosenEntries(*published, command, console);
   std::vector<CatalogueEntry> entries;
   for (const RNXCatalogueEntry* book : chosen) {
-    std::optional<CatalogueEntry> entry = entryToStore(*book, *url, catalogue, console);
+    std::optional<CatalogueEntry> entry = entryToStore(*book, *url, command, catalogue, console);
     if (!entry) {
       continue;
     }
@@ -321,6 +350,7 @@ size_t refreshRemoteBooks(const Catalogue& catalogue, const Installation& instal
                           const Waiting& waiting, Console& console) {
   std::vector<CatalogueEntry> remote = catalogue.entries();
   std::erase_if(remote, [](const CatalogueEntry& entry) { return !entry.isRemote(); });
+  followLanguages(catalogue, remote);
   if (!remote.empty() && waiting.waits) {
     (void)fetchIndexes(remote, installation, waiting, console);
   }

@@ -35,6 +35,11 @@ class RemoteHostWorld {
     _override.reset();
     _override.emplace(std::move(environment));
   }
+  /// The user prefers these languages from now on.
+  void speak(std::vector<std::string> preferred) {
+    languages = std::move(preferred);
+    setDefaults({});
+  }
   /// Settings with one credential for the standard service.
   void setCredential(platform::Value::Dictionary entry) {
     setDefaults(

@@ -46,6 +46,25 @@ class RemoteBooksTest : public testing::Test {
         world.zeb({"publish", tests::shippedBook("manual"), "--site", server.folder()});
     ASSERT_EQ(run.code, ExitCode::success) << run.err;
   }
+  /// A book in German and in English.
+  void publishInTwoLanguages(const NginxServer& server) const {
+    world.files().write("book/Info.plist",
+                        platform::dataFromPropertyList(
+                            platform::Value::Dictionary{{"ZEBBookIdentifier", "org.book"}},
+                            platform::PropertyListFormat::xml)
+                            .view());
+    world.writePage("book/de.lproj/index.html", "Buch", "Drucker");
+    world.writePage("book/en.lproj/index.html", "Book", "printer");
+    const Outcome run =
+        world.zeb({"publish", world.files().path("book"), "--site", server.folder()});
+    ASSERT_EQ(run.code, ExitCode::success) << run.err;
+  }
+  /// As long as this lives, the user prefers the language.
+  static platform::EnvironmentOverride speaking(const std::string& language) {
+    platform::Environment environment = *platform::Environment::current();
+    environment.preferredLanguages = {language};
+    return platform::EnvironmentOverride(std::move(environment));
+  }
   /// As a new process would: nothing is remembered of catalogues.
   static void forgetCatalogues() {
     RNXObjectManager::setSharedObjectManager(RNXObjectManager::init());
@@ -206,20 +225,70 @@ TEST_F(RemoteBooksTest, someBooksOfACatalogueMayBeAdded) {
 
 TEST_F(RemoteBooksTest, theUsersLanguageDecides) {
   const NginxServer server;
-  world.files().write(
-      "book/Info.plist",
-      platform::dataFromPropertyList(platform::Value::Dictionary{{"ZEBBookIdentifier", "org.book"}},
-                                     platform::PropertyListFormat::xml)
-          .view());
-  world.writePage("book/de.lproj/index.html", "Buch", "Drucker");
-  world.writePage("book/en.lproj/index.html", "Book", "printer");
-  const Outcome run = world.zeb({"publish", world.files().path("book"), "--site", server.folder()});
-  ASSERT_EQ(run.code, ExitCode::success) << run.err;
-  ASSERT_EQ(world.zeb({"add", server.URL("/catalogue.json"), "--language", "de"}).code,
-            ExitCode::success);
+  publishInTwoLanguages(server);
+  const auto german = speaking("de");
+  ASSERT_EQ(world.zeb({"add", server.URL("/catalogue.json")}).code, ExitCode::success);
   EXPECT_TRUE(fs::exists(world.indexPath("org.book", "de")));
+  EXPECT_FALSE(fs::exists(world.indexPath("org.book", "en")));
   EXPECT_THAT(found({"search", "Drucker"}),
               ElementsAre(server.URL("/books/org.book/de/pages/index.html")));
+}
+
+TEST_F(RemoteBooksTest, anotherLanguageOfTheUserBringsTheBookInThat) {
+  NginxServer server;
+  publishInTwoLanguages(server);
+  {
+    const auto german = speaking("de");
+    ASSERT_EQ(world.zeb({"add", server.URL("/catalogue.json")}).code, ExitCode::success);
+  }
+  forgetCatalogues();
+  {
+    const auto english = speaking("en");
+    // This search, or, should the server be slow, the next.
+    (void)found({"search", "printer"});
+    EXPECT_THAT(found({"search", "printer"}),
+                ElementsAre(server.URL("/books/org.book/en/pages/index.html")));
+    EXPECT_THAT(found({"search", "Drucker"}), IsEmpty());
+    EXPECT_THAT(world.zeb({"books"}).out, HasSubstr(" en "));
+  }
+  // Both are here now.
+  server.stop();
+  forgetCatalogues();
+  const auto german = speaking("de");
+  EXPECT_THAT(found({"search", "Drucker"}),
+              ElementsAre(server.URL("/books/org.book/de/pages/index.html")));
+}
+
+TEST_F(RemoteBooksTest, whatIsNotHereInTheUsersLanguageStaysInTheFormerOne) {
+  NginxServer server;
+  publishInTwoLanguages(server);
+  {
+    const auto german = speaking("de");
+    ASSERT_EQ(world.zeb({"add", server.URL("/catalogue.json")}).code, ExitCode::success);
+  }
+  server.stop();
+  forgetCatalogues();
+  const auto english = speaking("en");
+  EXPECT_THAT(found({"search", "Drucker"}),
+              ElementsAre(server.URL("/books/org.book/de/pages/index.html")));
+  EXPECT_THAT(world.zeb({"books"}).out, HasSubstr(" de "));
+}
+
+TEST_F(RemoteBooksTest, aLanguageThatWasAskedForStays) {
+  const NginxServer server;
+  publishInTwoLanguages(server);
+  const auto english = speaking("en");
+  ASSERT_EQ(world.zeb({"add", server.URL("/catalogue.json"), "--language", "de"}).code,
+            ExitCode::success);
+  forgetCatalogues();
+  ASSERT_EQ(world.zeb({"scan", "--no-system"}).code, ExitCode::success);
+  EXPECT_FALSE(fs::exists(world.indexPath("org.book", "en")));
+  EXPECT_THAT(found({"search", "Drucker"}),
+              ElementsAre(server.URL("/books/org.book/de/pages/index.html")));
+  // Until the book is added without one.
+  ASSERT_EQ(world.zeb({"add", server.URL("/catalogue.json")}).code, ExitCode::success);
+  EXPECT_THAT(found({"search", "printer"}),
+              ElementsAre(server.URL("/books/org.book/en/pages/index.html")));
 }
 
 TEST_F(RemoteBooksTest, whatIsNoCatalogueIsNotAdded) {
