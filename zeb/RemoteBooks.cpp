@@ -73,14 +73,20 @@ std::optional<platform::URL> addressOfCatalogue(const std::string& typed) {
   return isWeb && !ZEBOriginOfURL(*url).empty() ? url : std::nullopt;
 }
 
-std::shared_ptr<const RNXCatalogue> loadCatalogue(const platform::URL& url, const Waiting& waiting,
-                                                  Console& console) {
+/// Asks for the catalogue, and waits for what becomes of that.
+std::shared_ptr<const Answer> askForCatalogue(const platform::URL& url, const Waiting& waiting) {
   const auto answer = std::make_shared<Answer>();
   RNXObjectManager::sharedObjectManager()->loadCatalogue(
       url,
       [answer](const std::shared_ptr<const RNXCatalogue>& catalogue,
                const std::optional<platform::Error>& error) { answer->set(catalogue, error); });
   zebd::Host::runMainLoopUntil([&] { return answer->isThere(); }, platform::Seconds(waiting.limit));
+  return answer;
+}
+
+std::shared_ptr<const RNXCatalogue> loadCatalogue(const platform::URL& url, const Waiting& waiting,
+                                                  Console& console) {
+  const auto answer = askForCatalogue(url, waiting);
   auto catalogue = answer->catalogue();
   if (catalogue == nullptr) {
     console.error(fmt::format("{}: {}", url.absoluteString(), answer->reason()));
@@ -348,13 +354,22 @@ ExitCode removeBooks(const RemoveCommand& command, const Catalogue& catalogue,
 
 size_t refreshRemoteBooks(const Catalogue& catalogue, const Installation& installation,
                           const Waiting& waiting, Console& console) {
-  std::vector<CatalogueEntry> remote = catalogue.entries();
-  std::erase_if(remote, [](const CatalogueEntry& entry) { return !entry.isRemote(); });
-  followLanguages(catalogue, remote);
-  if (!remote.empty() && waiting.waits) {
-    (void)fetchIndexes(remote, installation, waiting, console);
+  std::vector<CatalogueEntry> concerned = catalogue.entries();
+  std::erase_if(concerned, [](const CatalogueEntry& entry) { return !entry.catalogueURL; });
+  followLanguages(catalogue, concerned);
+  if (!concerned.empty() && waiting.waits) {
+    // Installed books go by what is known of their catalogues when the plug-in looks at them.
+    for (const CatalogueEntry& entry : concerned) {
+      const auto url = platform::URL::URLWithString(*entry.catalogueURL);
+      if (url && !entry.isRemote()) {
+        (void)askForCatalogue(*url, waiting);
+      }
+    }
+    (void)fetchIndexes(concerned, installation, waiting, console);
   }
-  return remote.size();
+  return static_cast<size_t>(
+      std::count_if(concerned.begin(), concerned.end(),
+                    [](const CatalogueEntry& entry) { return entry.isRemote(); }));
 }
 
 }  // namespace zeb

@@ -23,8 +23,8 @@ ExitCode addBooks(const AddCommand& command, const Catalogue& catalogue,
 ExitCode removeBooks(const RemoveCommand& command, const Catalogue& catalogue,
                      const Installation& installation, Console& console);
 
-/// Has all remote books looked for on their servers now, and what has changed fetched. Returns how
-/// many there are.
+/// Has all remote books, and installed books that are renewed from servers, looked for there now,
+/// and what has changed fetched. Returns how many remote books there are.
 size_t refreshRemoteBooks(const Catalogue& catalogue, const Installation& installation,
                           const Waiting& waiting, Console& console);
 

@@ -190,8 +190,10 @@ void ZEBIndexConnectionDelegate::_keep(const platform::Data& data) {
   platform::removeAbandonedFiles(folder);
   if (files->writeAtomically(path, data)) {
     ZEBLog(1, "Couldn't write updated index data to %@", path);
-  } else {
-    (void)_index->setPath(path);
+  } else if (_index->path() != path && _index->setPath(path)) {
+    // What is remembered of a record over a restart is its file, and the queue of fetches, which
+    // has it remembered, has drained by now.
+    _indexshelf->archiveKnownIndices();
   }
 }
 

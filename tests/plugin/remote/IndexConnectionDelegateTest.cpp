@@ -313,6 +313,18 @@ TEST_F(IndexConnectionDelegate, aNewIndexRefillsTheRecordAndIsTold) {
           LogEntry{4, "Index download: response has been cached for task (null) ((null))"}));
 }
 
+TEST_F(IndexConnectionDelegate, aNewIndexIsTheOneThatIsRememberedOverARestart) {
+  const auto delegate = make();
+  world.shelf->_addIndex(record, bookID);
+  world.shelf->archiveKnownIndices();
+  receive(*delegate, ShelfWorld::indexBytes(luxData()));
+  complete(*delegate);
+  const auto known = world.shelf->unarchiveKnownIndices();
+  ASSERT_TRUE(known);
+  ASSERT_THAT(known->at(bookID), SizeIs(1));
+  EXPECT_EQ(known->at(bookID).front()->path(), generatedPath());
+}
+
 TEST_F(IndexConnectionDelegate, aNewIndexGivesTheBookItsRemoteRoot) {
   const auto delegate = make();
   platform::Value::Dictionary content = luxData();
