@@ -2,7 +2,7 @@
 
 #include <algorithm>
 #include <deque>
-#include <numeric>
+#include <span>
 #include <unordered_set>
 #include <utility>
 
@@ -45,6 +45,35 @@ class NumberBuffer {
   std::vector<uint8_t> _bytes;
 };
 
+// Adds the postings of one part to those that are there already, in the order of the documents'
+// final numbers; `numbers` has that of the document that was added as the n-th, from 0.
+void readPostings(std::span<const uint8_t> bytes, const std::vector<uint32_t>& numbers,
+                  std::vector<Posting>& postings) {
+  const auto before = static_cast<std::ptrdiff_t>(postings.size());
+  const uint8_t* at = bytes.data();
+  const uint8_t* const end = at + bytes.size();
+  uint32_t document = 0;
+  uint32_t difference;
+  Posting posting;
+  uint32_t positionsLength;
+  while (format::readNumber(at, end, difference) && format::readNumber(at, end, posting.weight) &&
+         format::readNumber(at, end, positionsLength)) {
+    document += difference;
+    posting.document = numbers[document - 1];
+    posting.positions = {at, positionsLength};
+    at += positionsLength;
+    postings.push_back(posting);
+  }
+  const auto byDocument = [](const Posting& a, const Posting& b) {
+    return a.document < b.document;
+  };
+  const auto middle = postings.begin() + before;
+  if (!std::is_sorted(middle, postings.end(), byDocument)) {
+    std::sort(middle, postings.end(), byDocument);
+  }
+  std::inplace_merge(postings.begin(), middle, postings.end(), byDocument);
+}
+
 std::optional<std::string> repaired(const std::optional<std::string>& text) {
   return text ? std::optional(platform::stringByRepairingUTF8(*text)) : std::nullopt;
 }
@@ -64,6 +93,8 @@ struct IndexWriter::Implementation {
   // A deque, so that the paths stay where `paths` sees them.
   std::deque<StoredTexts> documents;
   std::unordered_set<std::string_view> paths;
+  // In the order of their bytes, once no document comes any more.
+  std::vector<uint32_t> sortedTerms;
   bool isFinished = false;
 
   // Of the document being added.
@@ -76,9 +107,15 @@ struct IndexWriter::Implementation {
   void addText(std::string_view text, uint32_t weight);
   void addWord(std::string_view text, uint32_t weight);
   void closeDocument();
-  std::vector<uint32_t> sortedDocuments() const;
-  static void readPostings(std::span<const uint8_t> bytes, const std::vector<uint32_t>& numbers,
-                           std::vector<Posting>& postings);
+  void requireUnfinished() const;
+  void sortTerms();
+
+  // The parts of one index are writers whose documents are all different.
+  using Parts = std::vector<Implementation*>;
+  // By part and order of adding, the final number of each document.
+  using Numbers = std::vector<std::vector<uint32_t>>;
+  static Numbers addDocuments(const Parts& parts, IndexAssembler& assembler);
+  static void addTerms(const Parts& parts, const Numbers& numbers, IndexAssembler& assembler);
 };
 
 void IndexWriter::Implementation::addText(std::string_view text, uint32_t weight) {
@@ -134,38 +171,98 @@ void IndexWriter::Implementation::closeDocument() {
   touchedTerms.clear();
 }
 
-std::vector<uint32_t> IndexWriter::Implementation::sortedDocuments() const {
-  std::vector<uint32_t> order(documents.size());
-  std::iota(order.begin(), order.end(), 0U);
-  std::sort(order.begin(), order.end(),
-            [this](uint32_t a, uint32_t b) { return documents[a].path < documents[b].path; });
-  return order;
+void IndexWriter::Implementation::requireUnfinished() const {
+  if (isFinished) {
+    throw platform::Exception(platform::invalidArgumentException, "the index is finished");
+  }
 }
 
-// `numbers` has the final number of the document that was added as the n-th, from 0.
-void IndexWriter::Implementation::readPostings(std::span<const uint8_t> bytes,
-                                               const std::vector<uint32_t>& numbers,
-                                               std::vector<Posting>& postings) {
-  postings.clear();
-  const uint8_t* at = bytes.data();
-  const uint8_t* const end = at + bytes.size();
-  uint32_t document = 0;
-  uint32_t difference;
-  Posting posting;
-  uint32_t positionsLength;
-  while (format::readNumber(at, end, difference) && format::readNumber(at, end, posting.weight) &&
-         format::readNumber(at, end, positionsLength)) {
-    document += difference;
-    posting.document = numbers[document - 1];
-    posting.positions = {at, positionsLength};
-    at += positionsLength;
-    postings.push_back(posting);
+void IndexWriter::Implementation::sortTerms() {
+  if (sortedTerms.size() != terms.size()) {
+    sortedTerms = terms.sortedEntries();
   }
-  const auto byDocument = [](const Posting& a, const Posting& b) {
-    return a.document < b.document;
+}
+
+IndexWriter::Implementation::Numbers IndexWriter::Implementation::addDocuments(
+    const Parts& parts, IndexAssembler& assembler) {
+  struct Place {
+    size_t part;
+    size_t document;
   };
-  if (!std::is_sorted(postings.begin(), postings.end(), byDocument)) {
-    std::sort(postings.begin(), postings.end(), byDocument);
+  std::vector<Place> order;
+  Numbers numbers(parts.size());
+  for (size_t part = 0; part < parts.size(); ++part) {
+    numbers[part].resize(parts[part]->documents.size());
+    for (size_t document = 0; document < numbers[part].size(); ++document) {
+      order.push_back({part, document});
+    }
+  }
+  std::sort(order.begin(), order.end(), [&parts](const Place& a, const Place& b) {
+    return parts[a.part]->documents[a.document].path < parts[b.part]->documents[b.document].path;
+  });
+  for (uint32_t number = 0; number < order.size(); ++number) {
+    const Place& place = order[number];
+    numbers[place.part][place.document] = number;
+    assembler.addDocument(parts[place.part]->documents[place.document]);
+  }
+  return numbers;
+}
+
+void IndexWriter::Implementation::addTerms(const Parts& parts, const Numbers& numbers,
+                                           IndexAssembler& assembler) {
+  // The parts that have terms left, by how far they are.
+  struct Source {
+    size_t part;
+    size_t at;
+    size_t firstByte;
+  };
+  std::vector<Source> sources;
+  for (size_t part = 0; part < parts.size(); ++part) {
+    parts[part]->sortTerms();
+    sources.push_back({part, 0, 0});
+  }
+  const auto entryOf = [&parts](const Source& source) -> const TermEntry& {
+    Implementation& part = *parts[source.part];
+    return part.terms[part.sortedTerms[source.at]];
+  };
+  const auto isAtEnd = [&parts](const Source& source) {
+    return source.at == parts[source.part]->sortedTerms.size();
+  };
+  std::vector<uint8_t> bytes;
+  std::vector<Posting> postings;
+  std::vector<Source*> having;
+  while (true) {
+    std::erase_if(sources, isAtEnd);
+    if (sources.empty()) {
+      return;
+    }
+    having.clear();
+    std::string_view term;
+    for (Source& source : sources) {
+      const std::string_view text = entryOf(source).text;
+      if (having.empty() || text < term) {
+        having.clear();
+        term = text;
+      }
+      if (text == term) {
+        having.push_back(&source);
+      }
+    }
+    // All bytes first: the postings point into them.
+    bytes.clear();
+    for (Source* const source : having) {
+      source->firstByte = bytes.size();
+      entryOf(*source).postings.copyTo(bytes);
+    }
+    postings.clear();
+    for (size_t i = 0; i < having.size(); ++i) {
+      const size_t begin = having[i]->firstByte;
+      const size_t end = i + 1 < having.size() ? having[i + 1]->firstByte : bytes.size();
+      readPostings(std::span(bytes).subspan(begin, end - begin), numbers[having[i]->part],
+                   postings);
+      ++having[i]->at;
+    }
+    assembler.addTerm(term, postings);
   }
 }
 
@@ -176,17 +273,12 @@ IndexWriter::~IndexWriter() = default;
 
 void IndexWriter::add(Document document) {
   Implementation& self = *_implementation;
-  if (self.isFinished) {
-    throw platform::Exception(platform::invalidArgumentException, "the index is finished");
-  }
+  self.requireUnfinished();
   if (!document.path.starts_with('/')) {
     throw platform::Exception(platform::invalidArgumentException,
                               "the path of a document begins with a slash: " + document.path);
   }
-  if (self.paths.contains(document.path)) {
-    throw platform::Exception(platform::invalidArgumentException,
-                              "there is a document already at " + document.path);
-  }
+  _requireNewPath(document.path);
   if (self.documents.size() >= maximumDocumentCount) {
     throw platform::Exception(platform::rangeException, "too many documents for one index");
   }
@@ -208,31 +300,45 @@ void IndexWriter::add(Document document) {
   self.closeDocument();
 }
 
-size_t IndexWriter::documentCount() const { return _implementation->documents.size(); }
+void IndexWriter::_requireNewPath(const std::string& path) const {
+  if (_implementation->paths.contains(path) ||
+      std::any_of(_absorbed.begin(), _absorbed.end(),
+                  [&](const auto& part) { return part->paths.contains(path); })) {
+    throw platform::Exception(platform::invalidArgumentException,
+                              "there is a document already at " + path);
+  }
+}
+
+size_t IndexWriter::documentCount() const {
+  size_t count = _implementation->documents.size();
+  for (const auto& part : _absorbed) {
+    count += part->documents.size();
+  }
+  return count;
+}
+
+void IndexWriter::absorb(IndexWriter& other) {
+  _implementation->requireUnfinished();
+  other._implementation->requireUnfinished();
+  for (const auto& document : other._implementation->documents) {
+    _requireNewPath(document.path);
+  }
+  _absorbed.push_back(std::move(other._implementation));
+}
+
+void IndexWriter::sortTerms() { _implementation->sortTerms(); }
 
 platform::Data IndexWriter::finish() {
-  Implementation& self = *_implementation;
-  if (self.isFinished) {
-    throw platform::Exception(platform::invalidArgumentException, "the index is finished");
+  _implementation->requireUnfinished();
+  _implementation->isFinished = true;
+  const size_t shortest = std::min<size_t>(_implementation->options.minimumTermLength, UINT32_MAX);
+  IndexAssembler assembler(static_cast<uint32_t>(shortest));
+  Implementation::Parts parts{_implementation.get()};
+  for (const auto& part : _absorbed) {
+    parts.push_back(part.get());
   }
-  self.isFinished = true;
-  const size_t longest = std::min<size_t>(self.options.minimumTermLength, UINT32_MAX);
-  IndexAssembler assembler(static_cast<uint32_t>(longest));
-  const std::vector<uint32_t> order = self.sortedDocuments();
-  std::vector<uint32_t> numbers(order.size());
-  for (uint32_t number = 0; number < order.size(); ++number) {
-    numbers[order[number]] = number;
-    assembler.addDocument(self.documents[order[number]]);
-  }
-  std::vector<uint8_t> bytes;
-  std::vector<Posting> postings;
-  for (const uint32_t entry : self.terms.sortedEntries()) {
-    const TermEntry& term = self.terms[entry];
-    bytes.clear();
-    term.postings.copyTo(bytes);
-    Implementation::readPostings(bytes, numbers, postings);
-    assembler.addTerm(term.text, postings);
-  }
+  const Implementation::Numbers numbers = Implementation::addDocuments(parts, assembler);
+  Implementation::addTerms(parts, numbers, assembler);
   return assembler.finish();
 }
 

@@ -48,6 +48,16 @@ class IndexWriter {
 
   size_t documentCount() const;
 
+  /// Takes over the documents of a writer with the same options that has absorbed none itself and
+  /// is not used afterwards: so several threads can fill a writer each, and the index is the same
+  /// as from one. Throws platform::Exception "InvalidArgumentException", and both stay as they
+  /// were, when both have a document of the same path.
+  void absorb(IndexWriter& other);
+
+  /// Does now, in this thread, what finish() else has to do for these documents alone. Nothing is
+  /// added afterwards.
+  void sortTerms();
+
   /// The index of all documents added. May be called once; nothing can be added after that. Throws
   /// platform::Exception "RangeException" for more text than one index can hold (four gigabytes in
   /// any one of its sections).
@@ -55,7 +65,11 @@ class IndexWriter {
 
  private:
   struct Implementation;
+
+  void _requireNewPath(const std::string& path) const;
+
   std::unique_ptr<Implementation> _implementation;
+  std::vector<std::unique_ptr<Implementation>> _absorbed;
 };
 
 }  // namespace searchkit

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <sstream>
 
+#include "bvmake/Check.h"
 #include "bvmake/Report.h"
 
 namespace bvmake {
@@ -18,7 +19,7 @@ constexpr const char* description =
 
 constexpr const char* footer =
     "Exit status: 0 done (pages that could not be read were reported), 1 failure, 2 wrong command "
-    "line.";
+    "line, 3 what was checked is damaged.";
 
 constexpr size_t longestMinimumTermLength = 255;
 
@@ -59,6 +60,11 @@ ParsedCommandLine parseCommandLine(const std::vector<std::string>& arguments) {
          "--language", create.language,
          "The language of the pages (\"de\", \"pt-BR\", \"German\"); without, it is found out")
       ->type_name("TAG");
+  app.add_option(
+         "--jobs", create.jobs,
+         "Read pages in N threads; without, one a processor, or one with --lowered-priority")
+      ->type_name("N")
+      ->check(CLI::Range(size_t{1}, maximumJobs).description(""));
   app.add_flag("--lowered-priority", create.loweredPriority,
                "Give way to other programs, on the processor and on the disk");
   app.add_flag("-v,--verbose", command.verbosity,
@@ -68,6 +74,9 @@ ParsedCommandLine parseCommandLine(const std::vector<std::string>& arguments) {
   CLI::Option* inspected =
       app.add_option("--inspect", inspect.path, "Show what is in the help-index file FILE")
           ->type_name("FILE");
+  CLI::Option* checked = app.add_option("--check", command.checkedPath,
+                                        "Check whether all of the help-index file FILE is sound")
+                             ->type_name("FILE");
   CLI::Option* termOption =
       app.add_option("--term", term, "With --inspect: the pages that have WORD")->type_name("WORD");
   CLI::Option* anchorOption =
@@ -89,25 +98,28 @@ ParsedCommandLine parseCommandLine(const std::vector<std::string>& arguments) {
   }
 
   const bool inspecting = inspected->count() != 0;
-  if (inspecting && wantsCreate) {
-    return misuse("--create and --inspect exclude each other");
+  const bool checking = checked->count() != 0;
+  const int actions = (wantsCreate ? 1 : 0) + (inspecting ? 1 : 0) + (checking ? 1 : 0);
+  if (actions > 1) {
+    return misuse("--create, --inspect and --check exclude each other");
   }
-  if (!inspecting && !wantsCreate) {
-    return misuse("nothing to do: give --create or --inspect");
+  if (actions == 0) {
+    return misuse("nothing to do: give --create, --inspect or --check");
   }
   if (!inspecting && (termOption->count() != 0 || anchorOption->count() != 0 || inspect.pages)) {
     return misuse("--term, --anchor and --pages go with --inspect");
   }
-  if (inspecting && (folder->count() != 0 || file->count() != 0)) {
-    return misuse("--inspect takes neither FOLDER nor --file");
+  if (!wantsCreate && (folder->count() != 0 || file->count() != 0)) {
+    return misuse(inspecting ? "--inspect takes neither FOLDER nor --file"
+                             : "--check takes neither FOLDER nor --file");
   }
-  if (!inspecting && file->count() == 0) {
+  if (wantsCreate && file->count() == 0) {
     return misuse("--create needs --file OUT");
   }
-  if (!inspecting && folder->count() == 0) {
+  if (wantsCreate && folder->count() == 0) {
     return misuse("--create needs the FOLDER to index");
   }
-  if (!inspecting && (create.folder.empty() || create.outputPath.empty())) {
+  if (wantsCreate && (create.folder.empty() || create.outputPath.empty())) {
     return misuse("FOLDER and OUT must not be empty");
   }
   if (termOption->count() != 0) {
@@ -116,7 +128,9 @@ ParsedCommandLine parseCommandLine(const std::vector<std::string>& arguments) {
   if (anchorOption->count() != 0) {
     inspect.anchor = std::move(anchor);
   }
-  command.action = inspecting ? CommandLine::Action::inspect : CommandLine::Action::create;
+  command.action = inspecting ? CommandLine::Action::inspect
+                   : checking ? CommandLine::Action::check
+                              : CommandLine::Action::create;
   ParsedCommandLine result;
   result.command = std::move(command);
   return result;
@@ -134,7 +148,9 @@ int runProgram(const std::vector<std::string>& arguments, std::FILE* output, std
     return static_cast<int>(run(parsed.command->create, report).exitCode);
   }
   std::string text;
-  const ExitCode code = inspect(parsed.command->inspect, text, report);
+  const ExitCode code = parsed.command->action == CommandLine::Action::check
+                            ? check(parsed.command->checkedPath, text, report)
+                            : inspect(parsed.command->inspect, text, report);
   const bool written = std::fwrite(text.data(), 1, text.size(), output) == text.size();
   if (!written || std::fflush(output) != 0) {
     report.error("cannot write to standard output");

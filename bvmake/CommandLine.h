@@ -12,13 +12,15 @@ namespace bvmake {
 
 /// What the user asked for.
 struct CommandLine {
-  enum class Action { create, inspect };
+  enum class Action { create, inspect, check };
 
   Action action = Action::create;
   /// For Action::create.
   CreateOptions create;
   /// For Action::inspect.
   InspectOptions inspect;
+  /// For Action::check: the help-index file.
+  std::string checkedPath;
   /// How often --verbose was given.
   int verbosity = 0;
 };

@@ -19,6 +19,13 @@ namespace {
 
 namespace fs = std::filesystem;
 
+/// 0 for a file that has just gone: reading it will tell.
+uint64_t sizeOfFile(const std::string& file) {
+  std::error_code code;
+  const uintmax_t size = fs::file_size(file, code);
+  return code ? 0 : size;
+}
+
 class Walk {
  public:
   Walk(std::string folder, Report& report)
@@ -92,10 +99,11 @@ class Walk {
       return;
     }
     if (status.type() == fs::file_type::symlink) {
-      _links.push_back({path, _folder + path, *kind});
+      _links.push_back({path, _folder + path, *kind, 0});
     } else if (status.type() == fs::file_type::regular) {
       std::string file = _folder + path;
-      _pages.push_back({std::move(path), std::move(file), *kind});
+      const uint64_t size = sizeOfFile(file);
+      _pages.push_back({std::move(path), std::move(file), *kind, size});
     }
   }
 
@@ -115,6 +123,7 @@ class Walk {
                  !targets.insert(target).second) {
         _report.progress(3, fmt::format("{}: a link to what is found anyway", link.path));
       } else {
+        link.size = sizeOfFile(target);
         _pages.push_back(std::move(link));
       }
     }

@@ -1,6 +1,7 @@
 // Finds the pages of a folder.
 #pragma once
 
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <vector>
@@ -18,6 +19,8 @@ struct FoundPage {
   /// Where to read it.
   std::string file;
   PageKind kind = PageKind::html;
+  /// Bytes of the file when it was found.
+  uint64_t size = 0;
 };
 
 /// All files below `folder` whose names are those of pages, in the order of the bytes of their

@@ -2,31 +2,18 @@
 
 #include <fmt/format.h>
 
-#include <algorithm>
 #include <string_view>
 #include <vector>
 
 #include "SearchKit/IndexReader.h"
 #include "bvmake/HelpIndexFile.h"
+#include "bvmake/Printable.h"
 #include "bvmake/Report.h"
 #include "host/Luxwell/HelpLUXIndex.h"
 
 namespace bvmake {
 
 namespace {
-
-/// Strings from files may hold anything; a terminal must not obey them.
-std::string printable(std::string_view text) {
-  std::string result(text);
-  std::replace_if(
-      result.begin(), result.end(),
-      [](char character) {
-        const auto byte = static_cast<unsigned char>(character);
-        return byte < 0x20 || byte == 0x7F;
-      },
-      '?');
-  return result;
-}
 
 std::string describe(const platform::Value& value) {
   using Kind = platform::Value::Kind;

@@ -33,9 +33,13 @@ std::optional<PageKind> pageKindOfFileName(std::string_view name) {
   return std::nullopt;
 }
 
+platform::Error tooLargeError() {
+  return platform::formatError(fmt::format("larger than {} bytes", maximumPageSize));
+}
+
 std::optional<Page> readPage(PageKind kind, std::string_view bytes, platform::Error* error) {
   if (bytes.size() > maximumPageSize) {
-    return refuse(error, fmt::format("larger than {} bytes", maximumPageSize));
+    return refuse(error, tooLargeError().description);
   }
   // Two threads that begin with their first page at once could wait for each other for ever if
   // libxml2 were left to set itself up when it is first used.

@@ -20,6 +20,9 @@ enum class PageKind : uint8_t {
 /// under the wrong name) cannot take all memory.
 inline constexpr size_t maximumPageSize = size_t{256} << 20;
 
+/// What is said of them.
+platform::Error tooLargeError();
+
 /// The kind that the file name's extension stands for, whatever its case (.html, .htm, .xhtml,
 /// .xht; .page); absent for files that are no help pages.
 std::optional<PageKind> pageKindOfFileName(std::string_view name);

@@ -2,7 +2,11 @@
 
 #include <utility>
 
+#include "bvmake/Printable.h"
+
 namespace bvmake {
+
+void Report::filesDone(size_t, size_t) {}
 
 StreamReport::StreamReport(std::FILE* stream, std::string program, int verbosity)
     : _stream(stream), _program(std::move(program)), _verbosity(verbosity) {}
@@ -20,11 +24,7 @@ void StreamReport::progress(int verbosity, std::string_view text) {
 void StreamReport::_writeLine(std::string_view kind, std::string_view text) {
   std::string line = _program;
   line.append(": ").append(kind);
-  for (const char character : text) {
-    const auto byte = static_cast<unsigned char>(character);
-    line += byte < 0x20 || byte == 0x7F ? '?' : character;
-  }
-  line += '\n';
+  line.append(printable(text)).append("\n");
   std::fwrite(line.data(), 1, line.size(), _stream);
 }
 

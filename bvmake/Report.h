@@ -1,6 +1,7 @@
 // What the tool tells a person while it works.
 #pragma once
 
+#include <cstddef>
 #include <cstdio>
 #include <string>
 #include <string_view>
@@ -23,6 +24,9 @@ class Report {
   /// Progress of interest from `verbosity` on: 1 what the run did as a whole, 2 each page, 3 why
   /// each thing was left out that is left out in the ordinary course of things.
   virtual void progress(int verbosity, std::string_view text) = 0;
+
+  /// How far the run is: so many of the files are done. Called after each; nothing is done here.
+  virtual void filesDone(size_t done, size_t count);
 
   /// Whether progress() of this verbosity goes anywhere; lets callers skip formatting.
   virtual bool wants(int verbosity) const noexcept = 0;

@@ -2,21 +2,24 @@
 
 #include <fmt/format.h>
 
+#include <algorithm>
 #include <filesystem>
+#include <memory>
 #include <optional>
 #include <string_view>
 #include <utility>
 #include <vector>
 
-#include "SearchKit/IndexWriter.h"
 #include "bvmake/AnchorTable.h"
 #include "bvmake/FolderWalker.h"
 #include "bvmake/HelpIndexFile.h"
-#include "bvmake/PageReader.h"
+#include "bvmake/IndexShard.h"
+#include "bvmake/OrderedWork.h"
+#include "bvmake/PreparedFile.h"
 #include "bvmake/Priority.h"
 #include "bvmake/Report.h"
 #include "bvmake/SemanticData.h"
-#include "bvmake/Summary.h"
+#include "host/Luxwell/HelpTokenizer.h"
 #include "platform/Environment.h"
 #include "platform/Exception.h"
 
@@ -24,29 +27,21 @@ namespace bvmake {
 
 namespace {
 
-/// "page" for "/a/page.html": how a page is called that has no other name.
-std::string nameFromPath(const std::string& path) {
-  const std::string name = platform::lastPathComponent(path);
-  return name.substr(0, name.rfind('.'));
-}
+/// Files being read at once, in bytes, whatever the number of workers. What a page takes while it
+/// is read is some times the size of its file.
+constexpr uint64_t bytesInFlight = uint64_t{32} << 20;
 
-searchkit::Document documentFromPage(const std::string& path, std::string title, Page page,
-                                     std::string abstract) {
-  searchkit::Document document;
-  document.path = path;
-  document.title = std::move(title);
-  document.headings = std::move(page.headings);
-  document.headings.insert(document.headings.end(), page.keywords.begin(), page.keywords.end());
-  if (!page.description.empty()) {
-    document.body.push_back(std::move(page.description));
+constexpr int highestVerbosity = 3;
+
+size_t workerCount(const CreateOptions& options) {
+  if (options.jobs > 0) {
+    return std::min(options.jobs, maximumJobs);
   }
-  for (TextBlock& block : page.body) {
-    document.body.push_back(std::move(block.text));
-  }
-  if (!abstract.empty()) {
-    document.abstract = std::move(abstract);
-  }
-  return document;
+  // Whoever asks to be given way to is not to meet this program on every processor; and the help
+  // daemon, which asks for it, runs several of these at once.
+  return options.loweredPriority
+             ? 1
+             : static_cast<size_t>(platform::Environment::current()->processorCount());
 }
 
 class Run {
@@ -55,11 +50,10 @@ class Run {
       : _options(options),
         _report(report),
         _files(platform::Environment::current()->files),
-        _writer({options.minimumTermLength}),
-        _semanticData(options.folder, options.language) {}
+        _workerCount(workerCount(options)) {}
 
   Outcome run() {
-    if (!_options.language.empty() && !SemanticData::isLanguage(_options.language)) {
+    if (!_options.language.empty() && !isLanguage(_options.language)) {
       return _fail(fmt::format("no language that is known here: {}", _options.language));
     }
     if (_options.loweredPriority) {
@@ -79,9 +73,15 @@ class Run {
     if (_options.appendLUXOnly && !readHelpIndexFile(_options.outputPath, &error)) {
       return _failToAppend(error);
     }
-    for (const FoundPage& page : *pages) {
-      _addFile(page);
+    _pages = std::move(*pages);
+    for (size_t worker = 0; worker < _workerCount; ++worker) {
+      _preparers.push_back(std::make_unique<FilePreparer>(_preparationOptions(), _files));
     }
+    _tokenizer = tokenizerForBook(_options.folder, _options.language);
+    if (_tokenizer == nullptr) {
+      _findLanguage();
+    }
+    _addFiles();
     return _write();
   }
 
@@ -118,64 +118,87 @@ class Run {
     return folder.empty() ? std::nullopt : _files->createDirectoryWithParents(folder);
   }
 
-  void _skip(const FoundPage& found, std::string_view why) {
-    _report.warning(fmt::format("{}: {}; the page is left out", found.file, why));
-    ++_outcome.skippedCount;
+  PreparationOptions _preparationOptions() const {
+    PreparationOptions options;
+    options.generateSummaries = _options.generateSummaries;
+    while (_report.wants(options.verbosity + 1) && options.verbosity < highestVerbosity) {
+      ++options.verbosity;
+    }
+    return options;
   }
 
-  void _addFile(const FoundPage& found) {
-    try {
-      platform::Error error;
-      const auto bytes = _files->contentsAtPath(found.file, &error);
-      if (!bytes) {
-        _skip(found, error.description);
-        return;
+  /// Reads the first files ahead, until they have pages enough to tell. They are kept.
+  void _findLanguage() {
+    std::vector<const PreparedPage*> sample;
+    uint64_t bytes = 0;
+    while (sample.size() < languageSample && bytes < languageSampleBytes &&
+           _prepared.size() < _pages.size()) {
+      const size_t first = _prepared.size();
+      size_t end = first;
+      for (; end < _pages.size() && end - first < languageSample - sample.size() &&
+             bytes < languageSampleBytes;
+           ++end) {
+        bytes += _pages[end].size;
       }
-      _outcome.inputBytes += bytes->length();
-      std::optional<Page> page = readPage(found.kind, bytes->view(), &error);
-      if (!page) {
-        _skip(found, error.description);
-        return;
+      _prepared.resize(end);
+      OrderedWork<bool>::run(end - first, _limits(),
+                             {[&](size_t piece) { return _pages[first + piece].size; },
+                              [&](size_t piece, size_t worker) {
+                                _prepared[first + piece] =
+                                    _preparers[worker]->prepare(_pages[first + piece]);
+                                return true;
+                              },
+                              {}});
+      sample.clear();
+      for (const PreparedFile& file : _prepared) {
+        for (const PreparedPage& page : file.pages) {
+          sample.push_back(&page);
+        }
       }
-      _addPage(found, std::move(*page));
-    } catch (const std::exception& exception) {
-      _skip(found, exception.what());
     }
+    sample.resize(std::min(sample.size(), languageSample));
+    _tokenizer = tokenizerForPages(sample);
   }
 
-  void _addPage(const FoundPage& found, Page page) {
-    if (!page.hasText() && page.anchors.empty()) {
-      _report.progress(2, fmt::format("{}: nothing in it", found.path));
-      ++_outcome.leftOutCount;
-      return;
+  void _addFiles() {
+    IndexShard::Options options;
+    options.minimumTermLength = _options.minimumTermLength;
+    options.semanticOnly = _options.appendLUXOnly;
+    options.anchors = _options.anchors;
+    for (size_t worker = 0; worker < _workerCount; ++worker) {
+      _shards.push_back(std::make_unique<IndexShard>(options, _tokenizer));
     }
-    std::string title = page.title.empty() ? nameFromPath(found.path) : page.title;
-    if (page.excludedFromSearch) {
-      // Its words are those of the book all the same, and say how the book uses them.
-      _semanticData.addPage(found.path, title, page.description, page);
-      _report.progress(2, fmt::format("{}: asks not to be indexed", found.path));
-      ++_outcome.leftOutCount;
-      return;
-    }
-    std::string abstract = page.description;
-    if (abstract.empty() && _options.generateSummaries) {
-      abstract = _summarizer.summary(page);
-    }
-    const bool hasAbstract = !abstract.empty();
-    _semanticData.addPage(found.path, title, abstract, page);
-    if (!_options.appendLUXOnly) {
-      const std::vector<std::string> anchors = std::move(page.anchors);
-      _writer.add(
-          documentFromPage(found.path, std::move(title), std::move(page), std::move(abstract)));
-      if (_options.anchors) {
-        _anchors.addPage(found.path, anchors);
+    OrderedWork<AddedFile>::run(
+        _pages.size(), _limits(),
+        {[this](size_t piece) { return _pages[piece].size; },
+         [this](size_t piece, size_t worker) {
+           PreparedFile file = piece < _prepared.size()
+                                   ? std::exchange(_prepared[piece], PreparedFile())
+                                   : _preparers[worker]->prepare(_pages[piece]);
+           return _shards[worker]->add(std::move(file));
+         },
+         [this](size_t piece, AddedFile added) { _count(piece, std::move(added)); }});
+  }
+
+  WorkLimits _limits() const { return {_workerCount, bytesInFlight}; }
+
+  void _count(size_t piece, AddedFile added) {
+    for (const Message& message : added.messages) {
+      if (message.kind == Message::Kind::warning) {
+        _report.warning(message.text);
+      } else {
+        _report.progress(message.verbosity, message.text);
       }
     }
-    _outcome.abstractCount += hasAbstract ? 1 : 0;
-    ++_outcome.pageCount;
-    if (_report.wants(2)) {
-      _report.progress(2, found.path);
+    for (const PageAnchors& page : added.anchors) {
+      _anchors.addPage(page.path, page.anchors);
     }
+    _outcome.inputBytes += added.inputBytes;
+    _outcome.pageCount += added.pageCount;
+    _outcome.skippedCount += added.skippedCount;
+    _outcome.leftOutCount += added.leftOutCount;
+    _outcome.abstractCount += added.abstractCount;
+    _report.filesDone(piece + 1, _pages.size());
   }
 
   Outcome _write() {
@@ -198,31 +221,65 @@ class Run {
         1, fmt::format("{}: {} pages ({} skipped, {} left out), {} anchors, language {}, {} bytes, "
                        "of these {} of semantic data",
                        _options.outputPath, _outcome.pageCount, _outcome.skippedCount,
-                       _outcome.leftOutCount, _outcome.anchorCount, _semanticData.languageTag(),
+                       _outcome.leftOutCount, _outcome.anchorCount, _tokenizer->languageTag(),
                        _outcome.outputBytes, _outcome.semanticBytes));
     return _outcome;
   }
 
   /// The bytes to write; absent, with `error` set, where the file to add to cannot be read.
   std::optional<platform::Data> _file(platform::Error* error) {
-    const platform::Data semanticData = _semanticData.finish();
+    const auto [keywords, semanticData] = _finishShards();
     _outcome.semanticBytes = semanticData.length();
     if (!_options.appendLUXOnly) {
-      return helpIndexFile(_writer.finish(), semanticData,
+      return helpIndexFile(keywords, semanticData,
                            _options.anchors ? _anchors.value() : platform::Value());
     }
     const auto former = _files->contentsMappedAtPath(_options.outputPath, error);
     return former ? helpIndexFileWithLUXIndexData(*former, semanticData, error) : std::nullopt;
   }
 
+  /// The keyword index, empty where none is wanted, and the semantic data.
+  std::pair<platform::Data, platform::Data> _finishShards() {
+    const WorkLimits limits{_workerCount, UINT64_MAX};
+    const auto free = [](size_t) { return uint64_t{0}; };
+    OrderedWork<bool>::run(_shards.size(), limits,
+                           {free,
+                            [this](size_t piece, size_t) {
+                              _shards[piece]->prepareToFinish();
+                              return true;
+                            },
+                            {}});
+    IndexShard& whole = *_shards.front();
+    for (size_t shard = 1; shard < _shards.size(); ++shard) {
+      whole.absorb(*_shards[shard]);
+      _shards[shard].reset();
+    }
+    platform::Data halves[2];
+    OrderedWork<bool>::run(_options.appendLUXOnly ? 1 : 2, limits,
+                           {free,
+                            [&](size_t piece, size_t) {
+                              halves[piece] = piece == 0 ? whole.finishSemanticData(_workerCount)
+                                                         : whole.finishKeywords();
+                              return true;
+                            },
+                            {}});
+    _shards.clear();
+    return {halves[1], halves[0]};
+  }
+
   const CreateOptions& _options;
   Report& _report;
   std::shared_ptr<platform::FileManager> _files;
   Outcome _outcome;
-  searchkit::IndexWriter _writer;
-  SemanticData _semanticData;
+  const size_t _workerCount;
+  std::vector<FoundPage> _pages;
+  /// The first files, read ahead to find out the language.
+  std::vector<PreparedFile> _prepared;
+  std::shared_ptr<const HelpTokenizer> _tokenizer;
+  /// One of each a worker.
+  std::vector<std::unique_ptr<FilePreparer>> _preparers;
+  std::vector<std::unique_ptr<IndexShard>> _shards;
   AnchorTable _anchors;
-  Summarizer _summarizer;
 };
 
 }  // namespace

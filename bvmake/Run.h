@@ -12,11 +12,15 @@ class Report;
 /// What the program's exit status says.
 enum class ExitCode : int {
   success = 0,
-  /// The folder, the output file or the file to inspect cannot be used.
+  /// The folder, the output file or the file to look at cannot be used.
   failure = 1,
   /// The command line is wrong; nothing was done.
   usage = 2,
+  /// The file that was checked is damaged.
+  damaged = 3,
 };
+
+inline constexpr size_t maximumJobs = 256;
 
 /// One run of `bvmake --create`.
 struct CreateOptions {
@@ -34,8 +38,11 @@ struct CreateOptions {
   /// everything else in it as it is.
   bool appendLUXOnly = false;
   /// The tag or name of the language that the pages are in; when empty it is found out
-  /// (SemanticData).
+  /// (SemanticData.h).
   std::string language;
+  /// How many threads read pages; 0 for as many as there are processors, or one with
+  /// loweredPriority. Never more than maximumJobs.
+  size_t jobs = 0;
   /// Give way to all other programs, on the processor and on the disk. Holds for the whole process
   /// from then on.
   bool loweredPriority = false;
@@ -63,7 +70,8 @@ struct Outcome {
 };
 
 /// Indexes a folder. The same bytes are written for the same folder contents and options, whatever
-/// order the disk lists the files in. A page or sub-folder that cannot be read is reported as a
+/// order the disk lists the files in and however many threads read them; messages come in the order
+/// of the files' paths. A page or sub-folder that cannot be read is reported as a
 /// warning and left out; what makes the run fail is reported as an error, and then the file at the
 /// output path is as it was before. Throws nothing but std::bad_alloc.
 /// Files are read and written through platform::Environment::current()->files.

@@ -2,7 +2,7 @@
 
 #include <algorithm>
 #include <map>
-#include <utility>
+#include <string>
 
 #include "host/Luxwell/HelpTokenizer.h"
 #include "host/Luxwell/LUXLanguage.h"
@@ -18,7 +18,7 @@ constexpr std::string_view languageFolderExtension = "lproj";
 
 /// The tokenizer for the innermost folder of the path that is named after a language; null where
 /// there is none.
-std::shared_ptr<const HelpTokenizer> languageOfFolder(std::string_view folder) {
+std::shared_ptr<const HelpTokenizer> tokenizerForFolder(std::string_view folder) {
   std::string path(folder);
   while (!path.empty() && path != "/") {
     const std::string name = platform::lastPathComponent(path);
@@ -34,67 +34,46 @@ std::shared_ptr<const HelpTokenizer> languageOfFolder(std::string_view folder) {
   return nullptr;
 }
 
-LUXDocument documentFromPage(std::string_view path, const std::string& title,
-                             const std::string& abstract, const Page& page) {
-  LUXDocument document;
-  document.key = path.substr(path.starts_with('/') ? 1 : 0);
-  document.title = title;
-  if (!abstract.empty()) {
-    document.description = abstract;
-  }
-  document.excludedFromSearch = page.excludedFromSearch;
+/// Calls `sink` with each block of text but the title, which is told apart.
+template <typename Sink>
+void forEachBlock(const Page& page, Sink sink) {
   if (!page.description.empty()) {
-    document.blocks.push_back(page.description);
+    sink(page.description);
   }
-  document.blocks.insert(document.blocks.end(), page.keywords.begin(), page.keywords.end());
-  document.blocks.insert(document.blocks.end(), page.headings.begin(), page.headings.end());
+  std::for_each(page.keywords.begin(), page.keywords.end(), sink);
+  std::for_each(page.headings.begin(), page.headings.end(), sink);
   for (const TextBlock& block : page.body) {
-    document.blocks.push_back(block.text);
+    sink(block.text);
   }
-  return document;
 }
 
 }  // namespace
 
-SemanticData::SemanticData(std::string_view folder, std::string_view language)
-    : _tokenizer(language.empty() ? languageOfFolder(folder)
-                                  : HelpTokenizer::tokenizerForLanguage(language)) {}
-
-SemanticData::~SemanticData() = default;
-
-bool SemanticData::isLanguage(std::string_view language) {
-  return LUXLanguage::withTag(language) != nullptr;
+LUXDocument semanticDocument(const PreparedPage& prepared) {
+  LUXDocument document;
+  document.key = prepared.path.substr(prepared.path.starts_with('/') ? 1 : 0);
+  document.title = prepared.title;
+  if (!prepared.abstract.empty()) {
+    document.description = prepared.abstract;
+  }
+  document.excludedFromSearch = prepared.page.excludedFromSearch;
+  forEachBlock(prepared.page, [&](const std::string& block) { document.blocks.push_back(block); });
+  return document;
 }
 
-void SemanticData::addPage(std::string_view path, const std::string& title,
-                           const std::string& abstract, const Page& page) {
-  LUXDocument document = documentFromPage(path, title, abstract, page);
-  if (_writer != nullptr) {
-    _writer->addDocument(document);
-    return;
-  }
-  _waiting.push_back({std::move(document), page.language});
-  if (_tokenizer != nullptr || _waiting.size() >= languageSample) {
-    _decideLanguage();
-  }
+bool isLanguage(std::string_view language) { return LUXLanguage::withTag(language) != nullptr; }
+
+std::shared_ptr<const HelpTokenizer> tokenizerForBook(std::string_view folder,
+                                                      std::string_view language) {
+  return language.empty() ? tokenizerForFolder(folder)
+                          : HelpTokenizer::tokenizerForLanguage(language);
 }
 
-void SemanticData::_decideLanguage() {
-  if (_tokenizer == nullptr) {
-    _tokenizer = _languageOfPages();
-  }
-  _languageTag = _tokenizer->languageTag();
-  _writer = std::make_unique<LUXIndexWriter>(_tokenizer);
-  for (const Waiting& waiting : _waiting) {
-    _writer->addDocument(waiting.document);
-  }
-  _waiting.clear();
-}
-
-std::shared_ptr<const HelpTokenizer> SemanticData::_languageOfPages() const {
+std::shared_ptr<const HelpTokenizer> tokenizerForPages(
+    const std::vector<const PreparedPage*>& pages) {
   std::map<const LUXLanguage*, size_t> said;
-  for (const Waiting& waiting : _waiting) {
-    if (const LUXLanguage* language = LUXLanguage::withTag(waiting.language)) {
+  for (const PreparedPage* const page : pages) {
+    if (const LUXLanguage* language = LUXLanguage::withTag(page->page.language)) {
       ++said[language];
     }
   }
@@ -104,20 +83,11 @@ std::shared_ptr<const HelpTokenizer> SemanticData::_languageOfPages() const {
     return HelpTokenizer::tokenizerForLanguage(most->first->tag);
   }
   LUXLanguageGuess guess;
-  for (const Waiting& waiting : _waiting) {
-    guess.addText(waiting.document.title);
-    for (const std::string& block : waiting.document.blocks) {
-      guess.addText(block);
-    }
+  for (const PreparedPage* const page : pages) {
+    guess.addText(page->title);
+    forEachBlock(page->page, [&](const std::string& block) { guess.addText(block); });
   }
   return HelpTokenizer::tokenizerForLanguage(guess.language().tag);
-}
-
-platform::Data SemanticData::finish() {
-  if (_writer == nullptr) {
-    _decideLanguage();
-  }
-  return _writer->finish();
 }
 
 }  // namespace bvmake

@@ -1,67 +1,38 @@
-// The semantic half of an index: from pages to the data that language models are trained from.
+// The semantic half of an index: from pages to what language models are trained from.
 #pragma once
 
 #include <cstddef>
 #include <memory>
-#include <optional>
-#include <string>
 #include <string_view>
 #include <vector>
 
-#include "bvmake/Page.h"
+#include "bvmake/PreparedFile.h"
 #include "host/Luxwell/LUXIndexWriter.h"
-#include "platform/Data.h"
 
 class HelpTokenizer;
 
 namespace bvmake {
 
-/// Collects the pages of one book, in whatever language it is in. Thread-safety: confined to one
-/// thread.
-class SemanticData {
- public:
-  /// The language of a book is, of the first of these that is known:
-  ///  - `language`, a tag or a name ("de", "German"), when it is not empty;
-  ///  - that of a folder name such as "de.lproj", where `folder` is one or lies in one;
-  ///  - the one that most of the first pages say that they are in;
-  ///  - the one that the first pages look like.
-  SemanticData(std::string_view folder, std::string_view language);
-  ~SemanticData();
-  SemanticData(const SemanticData&) = delete;
-  SemanticData& operator=(const SemanticData&) = delete;
+/// A page as the semantic data take it: under its path without the slash in front.
+LUXDocument semanticDocument(const PreparedPage& page);
 
-  /// So many pages are looked at to find out the language.
-  static constexpr size_t languageSample = 64;
+/// Whether there is a language of this tag or name ("de", "German").
+bool isLanguage(std::string_view language);
 
-  /// Whether there is a language of this tag or name.
-  static bool isLanguage(std::string_view language);
+/// The tokenizer for the language of a book, as far as it is known without its pages: `language`, a
+/// tag or a name, when it is not empty; else that of a folder name such as "de.lproj", where
+/// `folder` is one or lies in one. Null when neither tells.
+std::shared_ptr<const HelpTokenizer> tokenizerForBook(std::string_view folder,
+                                                      std::string_view language);
 
-  /// Adds a page under its path within the folder, which begins with a slash. `title` and
-  /// `abstract` (none when empty) are what is shown of it.
-  void addPage(std::string_view path, const std::string& title, const std::string& abstract,
-               const Page& page);
+/// So many pages are looked at to find out a language …
+inline constexpr size_t languageSample = 64;
+/// … or fewer, when their files have more bytes than this.
+inline constexpr uint64_t languageSampleBytes = uint64_t{32} << 20;
 
-  /// The bytes for the help-index file. Afterwards this is not used any more, but for
-  /// languageTag(). Throws platform::Exception for a book too large for the format.
-  platform::Data finish();
-
-  /// The tag of the language; empty before finish().
-  const std::string& languageTag() const noexcept { return _languageTag; }
-
- private:
-  struct Waiting {
-    LUXDocument document;
-    std::string language;
-  };
-
-  void _decideLanguage();
-  std::shared_ptr<const HelpTokenizer> _languageOfPages() const;
-
-  /// Null until the language is decided.
-  std::shared_ptr<const HelpTokenizer> _tokenizer;
-  std::unique_ptr<LUXIndexWriter> _writer;
-  std::vector<Waiting> _waiting;
-  std::string _languageTag;
-};
+/// The tokenizer for the language that most of the pages say that they are in; where none says
+/// anything, for the one that they look like. Never null.
+std::shared_ptr<const HelpTokenizer> tokenizerForPages(
+    const std::vector<const PreparedPage*>& pages);
 
 }  // namespace bvmake

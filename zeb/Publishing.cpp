@@ -145,7 +145,7 @@ std::optional<platform::Data> Publishing::_index(const BookEdition& edition,
   options.anchors = true;
   options.generateSummaries = true;
   options.minimumTermLength = minimumTermLength;
-  if (bvmake::SemanticData::isLanguage(edition.language)) {
+  if (bvmake::isLanguage(edition.language)) {
     options.language = edition.language;
   }
   ConsoleReport report(_console);

@@ -11,6 +11,8 @@
 #include "host/Luxwell/HelpLUXIndex.h"
 #include "host/Luxwell/HelpTokenizer.h"
 #include "host/Luxwell/LUXNumbers.h"
+#include "host/Luxwell/LUXPairTable.h"
+#include "host/Luxwell/LUXParallel.h"
 #include "host/Luxwell/LUXPhraseFinder.h"
 #include "host/Luxwell/LUXSectionedData.h"
 #include "host/Luxwell/LUXTokenSections.h"
@@ -23,6 +25,9 @@ using luxnumbers::appendVarnumber;
 namespace {
 
 constexpr uint32_t none = 0xFFFFFFFF;
+
+// A piece of work while the data are written.
+constexpr size_t pagesAtOnce = 64;
 
 struct TextHash {
   using is_transparent = void;
@@ -100,8 +105,9 @@ struct LUXIndexWriter::Implementation {
   std::vector<Surface> surfaces;
   Names forms;
   Names stems;
-  // By their stems, the first in the upper half.
-  std::unordered_map<uint64_t, uint32_t> bigrams;
+  // By their stems.
+  LUXPairTable bigrams;
+  size_t threadCount = 1;
   std::vector<HelpTokenizer::Segment> segments;
   std::string buffer;
 
@@ -138,6 +144,34 @@ struct LUXIndexWriter::Implementation {
       page.sequence.words.push_back({number, breaks});
       breaks = false;
     }
+  }
+
+  // The numbers of `other` mean the same words under other numbers here.
+  void absorb(Implementation& other) {
+    std::vector<uint32_t> surfaceOfOther(other.surfaces.size());
+    for (size_t theirs = 0; theirs < other.surfaces.size(); ++theirs) {
+      const Surface& surface = other.surfaces[theirs];
+      const uint32_t ours = surfaceNames.numberOf(other.surfaceNames[theirs]);
+      if (ours == surfaces.size()) {
+        surfaces.push_back(surface);
+        Surface& added = surfaces.back();
+        added.count = 0;
+        added.form = surface.form == none ? none : forms.numberOf(other.forms[surface.form]);
+        added.stem = surface.stem == none ? none : stems.numberOf(other.stems[surface.stem]);
+      }
+      surfaces[ours].count += surface.count;
+      surfaceOfOther[theirs] = ours;
+    }
+    for (Page& page : other.pages) {
+      for (LUXWordSequence::Word& word : page.sequence.words) {
+        word.number = surfaceOfOther[word.number];
+      }
+      for (Whole& whole : page.wholes) {
+        whole.form = forms.numberOf(other.forms[whole.form]);
+      }
+      pages.push_back(std::move(page));
+    }
+    keys.merge(other.keys);
   }
 
   // Which surface each form is shown as: as it is written where it does not begin a sentence, as
@@ -189,7 +223,7 @@ struct LUXIndexWriter::Implementation {
       formOfSurface.push_back(surface.form);
     }
     LUXPhraseFinder finder;
-    finder.find(sequences, formOfSurface, edgeForms());
+    finder.find(sequences, formOfSurface, edgeForms(), threadCount);
     return finder;
   }
 
@@ -201,7 +235,7 @@ struct LUXIndexWriter::Implementation {
       const LUXWordSequence::Word& word = page.sequence.words[at];
       const uint32_t stem = surfaces[word.number].stem;
       if (before != none && stem != none && !word.breaksChain) {
-        sink(static_cast<uint64_t>(before) << 32U | stem, at);
+        sink(before, stem, at);
       }
       before = stem;
     }
@@ -211,9 +245,9 @@ struct LUXIndexWriter::Implementation {
   std::vector<std::string> numberBigrams() {
     std::vector<std::string> names;
     for (const Page& page : pages) {
-      forEachBigram(page, [&](uint64_t pair, size_t) {
-        if (bigrams.emplace(pair, static_cast<uint32_t>(names.size())).second) {
-          names.push_back(stems[pair >> 32U] + ' ' + stems[pair & 0xFFFFFFFFU]);
+      forEachBigram(page, [&](uint32_t first, uint32_t second, size_t) {
+        if (bigrams.numberOf(first, second).second) {
+          names.push_back(stems[first] + ' ' + stems[second]);
         }
       });
     }
@@ -260,20 +294,31 @@ struct LUXIndexWriter::Implementation {
     }
     LUXTokenSections sections(
         {stems.all(), numberBigrams(), forms.all(), phraseNames(finder), std::move(kept)});
-    for (size_t number = 0; number < pages.size(); ++number) {
-      addWords(pages[number], sections);
-      for (const LUXPhraseFinder::Count& count : finder.countsOfPages()[number]) {
-        sections.add(LUXTokenKind::phrase, count.phrase, count.titleCount, count.bodyCount);
+    // Each piece's pages are one part, so that they can be put in order.
+    std::vector<std::unique_ptr<LUXTokenSections::Pages>> parts((pages.size() + pagesAtOnce - 1) /
+                                                                pagesAtOnce);
+    LUXInParallel(pages.size(), pagesAtOnce, threadCount, [&](size_t from, size_t to) {
+      auto part = std::make_unique<LUXTokenSections::Pages>(sections);
+      for (size_t number = from; number < to; ++number) {
+        addWords(pages[number], *part);
+        for (const LUXPhraseFinder::Count& count : finder.countsOfPages()[number]) {
+          part->add(LUXTokenKind::phrase, count.phrase, count.titleCount, count.bodyCount);
+        }
+        if (titleOfPage[number] != none) {
+          part->add(LUXTokenKind::title, titleOfPage[number], 1, 0);
+        }
+        part->endPage();
       }
-      if (titleOfPage[number] != none) {
-        sections.add(LUXTokenKind::title, titleOfPage[number], 1, 0);
-      }
-      sections.endPage();
+      parts[from / pagesAtOnce] = std::move(part);
+    });
+    for (auto& part : parts) {
+      sections.append(*part);
+      part.reset();
     }
     return sections;
   }
 
-  void addWords(const Page& page, LUXTokenSections& sections) const {
+  void addWords(const Page& page, LUXTokenSections::Pages& sections) const {
     const size_t titleLength = page.sequence.titleLength;
     const auto add = [&](LUXTokenKind kind, uint32_t token, size_t at) {
       if (at < titleLength) {
@@ -290,8 +335,9 @@ struct LUXIndexWriter::Implementation {
         add(LUXTokenKind::stem, surface.stem, at);
       }
     }
-    forEachBigram(
-        page, [&](uint64_t pair, size_t at) { add(LUXTokenKind::bigram, bigrams.at(pair), at); });
+    forEachBigram(page, [&](uint32_t first, uint32_t second, size_t at) {
+      add(LUXTokenKind::bigram, bigrams.at(first, second), at);
+    });
     for (const Whole& whole : page.wholes) {
       add(LUXTokenKind::form, whole.form, whole.place);
     }
@@ -368,6 +414,20 @@ void LUXIndexWriter::addDocument(const LUXDocument& document) {
   _implementation->pages.push_back(std::move(page));
 }
 
+void LUXIndexWriter::absorb(LUXIndexWriter& other) {
+  for (const std::string& key : other._implementation->keys) {
+    if (_implementation->keys.contains(key)) {
+      throw platform::Exception(platform::invalidArgumentException,
+                                "the page " + key + " comes twice");
+    }
+  }
+  _implementation->absorb(*other._implementation);
+  other._implementation.reset();
+}
+
 size_t LUXIndexWriter::documentCount() const noexcept { return _implementation->pages.size(); }
 
-platform::Data LUXIndexWriter::finish() { return _implementation->finish(); }
+platform::Data LUXIndexWriter::finish(size_t threadCount) {
+  _implementation->threadCount = threadCount;
+  return _implementation->finish();
+}

@@ -38,12 +38,18 @@ class LUXIndexWriter {
   /// Throws platform::Exception "InvalidArgumentException" for a key that was added before.
   void addDocument(const LUXDocument& document);
 
+  /// Takes over the documents of a writer of the same language, which is not used afterwards: so
+  /// several threads can fill a writer each, and the bytes are the same as from one. Throws
+  /// platform::Exception "InvalidArgumentException", and both stay as they were, when both have a
+  /// document of the same key.
+  void absorb(LUXIndexWriter& other);
+
   size_t documentCount() const noexcept;
 
-  /// The bytes. The writer is not used afterwards. Throws platform::Exception
-  /// "InvalidArgumentException" for a book whose data would be too large for the format (4 GiB a
-  /// section).
-  platform::Data finish();
+  /// The bytes, which do not depend on the number of threads that make them. The writer is not used
+  /// afterwards. Throws platform::Exception "InvalidArgumentException" for a book whose data would
+  /// be too large for the format (4 GiB a section).
+  platform::Data finish(size_t threadCount = 1);
 
  private:
   struct Implementation;

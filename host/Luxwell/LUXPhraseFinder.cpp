@@ -2,23 +2,14 @@
 
 #include <algorithm>
 #include <functional>
-#include <unordered_map>
 
-namespace {
-
-struct PairHash {
-  size_t operator()(uint64_t key) const noexcept {
-    key ^= key >> 32U;
-    key *= 0x9E3779B97F4A7C15U;
-    return static_cast<size_t>(key ^ (key >> 29U));
-  }
-};
-
-}  // namespace
+#include "host/Luxwell/LUXPairTable.h"
+#include "host/Luxwell/LUXParallel.h"
 
 void LUXPhraseFinder::find(const std::vector<const LUXWordSequence*>& pages,
                            const std::vector<uint32_t>& wordOfNumber,
-                           const std::vector<bool>& mayStandAtEdge) {
+                           const std::vector<bool>& mayStandAtEdge, size_t threadCount) {
+  _threadCount = threadCount;
   _counts.resize(pages.size());
   _findSingleWords(pages, wordOfNumber, mayStandAtEdge.size());
   _keep(pages, mayStandAtEdge);
@@ -58,7 +49,7 @@ void LUXPhraseFinder::_findLonger(const Pages& pages) {
     return part != none && parts[part].pageCount >= minimumPageCount;
   };
   Groups groups;
-  std::unordered_map<uint64_t, uint32_t, PairHash> numbers;
+  LUXPairTable numbers;
   for (uint32_t page = 0; page < pages.size(); ++page) {
     std::vector<uint32_t>& positions = _positions[page];
     for (size_t at = 0; at < positions.size(); ++at) {
@@ -70,15 +61,14 @@ void LUXPhraseFinder::_findLonger(const Pages& pages) {
           (partsAreWords && pages[page]->words[at + 1].breaksChain)) {
         continue;
       }
-      const uint64_t key = static_cast<uint64_t>(first) << 32U | second;
-      const auto [found, isNew] = numbers.emplace(key, static_cast<uint32_t>(groups.size()));
+      const auto [number, isNew] = numbers.numberOf(first, second);
       if (isNew) {
         groups.push_back({first, second, 0, none, none});
       }
-      Group& group = groups[found->second];
+      Group& group = groups[number];
       group.pageCount += group.lastPage == page ? 0 : 1;
       group.lastPage = page;
-      positions[at] = found->second;
+      positions[at] = number;
     }
   }
   _levels.push_back(std::move(groups));
@@ -98,6 +88,7 @@ uint32_t LUXPhraseFinder::_wordOf(size_t level, uint32_t group, size_t i) const 
 void LUXPhraseFinder::_keep(const Pages& pages, const std::vector<bool>& mayStandAtEdge) {
   const size_t level = _levels.size() - 1;
   const uint32_t minimum = level == 0 ? 1 : minimumPageCount;
+  uint32_t kept = 0;
   for (uint32_t number = 0; number < _levels[level].size(); ++number) {
     Group& group = _levels[level][number];
     if (group.pageCount < minimum || !mayStandAtEdge[_wordOf(level, number, 0)] ||
@@ -105,6 +96,7 @@ void LUXPhraseFinder::_keep(const Pages& pages, const std::vector<bool>& mayStan
       continue;
     }
     group.phrase = static_cast<uint32_t>(_phrases.size());
+    ++kept;
     LUXPhrase phrase;
     for (size_t i = 0; i <= level; ++i) {
       phrase.words[i] = _wordOf(level, number, i);
@@ -115,36 +107,47 @@ void LUXPhraseFinder::_keep(const Pages& pages, const std::vector<bool>& mayStan
     _phrases.push_back(phrase);
     _groupOfPhrase.push_back(number);
   }
+  constexpr size_t pagesAtOnce = 64;
+  LUXInParallel(pages.size(), pagesAtOnce, _threadCount, [&](size_t from, size_t to) {
+    for (size_t page = from; page < to; ++page) {
+      _countInPage(level, page, pages[page]->titleLength);
+    }
+  });
+  const uint32_t firstPhrase = static_cast<uint32_t>(_phrases.size()) - kept;
+  for (const std::vector<Count>& counts : _counts) {
+    for (auto count = counts.rbegin(); count != counts.rend() && count->phrase >= firstPhrase;
+         ++count) {
+      LUXPhraseStatistics& statistics = _phrases[count->phrase].statistics;
+      statistics.frequency += count->titleCount + count->bodyCount;
+      statistics.titleCount += count->titleCount > 0 ? 1 : 0;
+    }
+  }
+}
+
+void LUXPhraseFinder::_countInPage(size_t level, size_t page, size_t titleLength) {
   std::vector<uint32_t> inTitle;
   std::vector<uint32_t> all;
-  for (size_t page = 0; page < pages.size(); ++page) {
-    inTitle.clear();
-    all.clear();
-    for (size_t at = 0; at < _positions[page].size(); ++at) {
-      const uint32_t group = _positions[page][at];
-      if (group != none && _levels[level][group].phrase != none) {
-        all.push_back(_levels[level][group].phrase);
-        if (at < pages[page]->titleLength) {
-          inTitle.push_back(all.back());
-        }
+  for (size_t at = 0; at < _positions[page].size(); ++at) {
+    const uint32_t group = _positions[page][at];
+    if (group != none && _levels[level][group].phrase != none) {
+      all.push_back(_levels[level][group].phrase);
+      if (at < titleLength) {
+        inTitle.push_back(all.back());
       }
     }
-    std::sort(all.begin(), all.end());
-    std::sort(inTitle.begin(), inTitle.end());
-    auto title = inTitle.begin();
-    for (auto from = all.begin(); from != all.end();) {
-      const auto to = std::upper_bound(from, all.end(), *from);
-      Count count{*from, 0, 0};
-      for (; title != inTitle.end() && *title == *from; ++title) {
-        ++count.titleCount;
-      }
-      count.bodyCount = static_cast<uint32_t>(to - from) - count.titleCount;
-      LUXPhraseStatistics& statistics = _phrases[count.phrase].statistics;
-      statistics.frequency += count.titleCount + count.bodyCount;
-      statistics.titleCount += count.titleCount > 0 ? 1 : 0;
-      _counts[page].push_back(count);
-      from = to;
+  }
+  std::sort(all.begin(), all.end());
+  std::sort(inTitle.begin(), inTitle.end());
+  auto title = inTitle.begin();
+  for (auto from = all.begin(); from != all.end();) {
+    const auto to = std::find_if(from, all.end(), [&](uint32_t other) { return other != *from; });
+    Count count{*from, 0, 0};
+    for (; title != inTitle.end() && *title == *from; ++title) {
+      ++count.titleCount;
     }
+    count.bodyCount = static_cast<uint32_t>(to - from) - count.titleCount;
+    _counts[page].push_back(count);
+    from = to;
   }
 }
 

@@ -45,9 +45,11 @@ class LUXPhraseFinder {
   static constexpr uint32_t minimumPageCount = 2;
 
   /// The numbers in the pages stand for words by way of `wordOfNumber`: several may be one word.
-  /// `mayStandAtEdge` has one entry for each word. The pages are not used afterwards.
+  /// `mayStandAtEdge` has one entry for each word. The pages are not used afterwards. Up to
+  /// `threadCount` threads take part; what is found does not depend on their number.
   void find(const std::vector<const LUXWordSequence*>& pages,
-            const std::vector<uint32_t>& wordOfNumber, const std::vector<bool>& mayStandAtEdge);
+            const std::vector<uint32_t>& wordOfNumber, const std::vector<bool>& mayStandAtEdge,
+            size_t threadCount = 1);
 
   const std::vector<LUXPhrase>& phrases() const noexcept { return _phrases; }
 
@@ -74,9 +76,11 @@ class LUXPhraseFinder {
                         size_t wordCount);
   void _findLonger(const Pages& pages);
   void _keep(const Pages& pages, const std::vector<bool>& mayStandAtEdge);
+  void _countInPage(size_t level, size_t page, size_t titleLength);
   void _countLongerPhrases();
   uint32_t _wordOf(size_t level, uint32_t group, size_t i) const;
 
+  size_t _threadCount = 1;
   /// By length less one.
   std::vector<Groups> _levels;
   /// The group that begins at each word of each page, of the longest length so far.

@@ -42,6 +42,16 @@ std::string_view LUXRecords::operator[](size_t i) const noexcept {
   return _bytes.view().substr(begin, readUInt32(offset + 4) - begin);
 }
 
+void LUXRecordsWriter::append(LUXRecordsWriter& other) {
+  const uint64_t begin = _bytes.size();
+  for (const uint64_t offset : other._offsets) {
+    _offsets.push_back(begin + offset);
+  }
+  _bytes += other._bytes;
+  other._offsets.clear();
+  std::string().swap(other._bytes);
+}
+
 platform::Data LUXRecordsWriter::finish() {
   if (_bytes.size() > std::numeric_limits<uint32_t>::max()) {
     throw platform::Exception(platform::invalidArgumentException,

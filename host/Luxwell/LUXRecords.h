@@ -39,6 +39,9 @@ class LUXRecordsWriter {
     return _bytes;
   }
 
+  /// Adds the records of another writer, which is empty afterwards.
+  void append(LUXRecordsWriter& other);
+
   /// The section. Throws platform::Exception "InvalidArgumentException" when it has 4 GiB or more.
   platform::Data finish();
 

@@ -28,12 +28,17 @@ LUXTokenSections::LUXTokenSections(Names names) {
   _table = LUXTokenTable::withTokens(sorted);
 }
 
-void LUXTokenSections::endPage() {
+void LUXTokenSections::append(Pages& pages) {
+  _records.append(pages._records);
+  _places.append(pages._places);
+}
+
+void LUXTokenSections::Pages::endPage() {
   std::sort(_page.begin(), _page.end(),
             [](const auto& a, const auto& b) { return a.number < b.number; });
   std::string& bytes = _records.beginRecord();
   std::string& places = _places.beginRecord();
-  const uint32_t firstWithoutPlace = _table->startOfKind(LUXTokenKind::phrase);
+  const uint32_t firstWithoutPlace = _sections._table->startOfKind(LUXTokenKind::phrase);
   uint32_t next = 0;
   for (size_t i = 0; i < _page.size();) {
     LUXTokenCounts::Entry sum = _page[i];

@@ -21,16 +21,35 @@ class LUXTokenSections {
   /// The names of each kind's tokens, by the caller's numbers; tokens of one name become one.
   explicit LUXTokenSections(Names names);
 
-  /// Adds to the counts of a token in the page that is being written; it begins at the least of the
-  /// places that it is added with.
-  void add(LUXTokenKind kind, uint32_t token, uint32_t titleCount, uint32_t bodyCount,
-           uint8_t wordsBefore = LUXTokenCount::farDown) {
-    _page.push_back(
-        {_numbers[static_cast<size_t>(kind)][token], titleCount, bodyCount, wordsBefore});
-  }
+  /// Pages that follow one another. Several may be written at the same time, each in a thread of
+  /// its own. Thread-safety: confined to one thread.
+  class Pages {
+   public:
+    /// The sections must outlive the pages.
+    explicit Pages(const LUXTokenSections& sections) : _sections(sections) {}
 
-  /// Writes the page to which add() has added; the next one begins.
-  void endPage();
+    /// Adds to the counts of a token in the page that is being written; it begins at the least of
+    /// the places that it is added with.
+    void add(LUXTokenKind kind, uint32_t token, uint32_t titleCount, uint32_t bodyCount,
+             uint8_t wordsBefore = LUXTokenCount::farDown) {
+      _page.push_back({_sections._numbers[static_cast<size_t>(kind)][token], titleCount, bodyCount,
+                       wordsBefore});
+    }
+
+    /// Writes the page to which add() has added; the next one begins.
+    void endPage();
+
+   private:
+    friend class LUXTokenSections;
+
+    const LUXTokenSections& _sections;
+    std::vector<LUXTokenCounts::Entry> _page;
+    LUXRecordsWriter _records;
+    LUXRecordsWriter _places;
+  };
+
+  /// Adds pages behind those that are there; they are not used afterwards.
+  void append(Pages& pages);
 
   /// The bytes of the three sections, when all pages are written.
   platform::Data tokenBytes() const { return _table->sectionBytes(); }
@@ -41,7 +60,6 @@ class LUXTokenSections {
   /// By kind and the caller's number, the number in the table.
   std::array<std::vector<uint32_t>, LUXTokenKindCount> _numbers;
   std::shared_ptr<const LUXTokenTable> _table;
-  std::vector<LUXTokenCounts::Entry> _page;
   LUXRecordsWriter _records;
   LUXRecordsWriter _places;
 };

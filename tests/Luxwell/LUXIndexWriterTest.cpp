@@ -122,6 +122,49 @@ std::vector<LUXDocument> example() {
 
 }  // namespace
 
+TEST(LUXIndexWriter, absorbedWritersMakeTheSameBytesAsOne) {
+  std::mt19937 random(3);
+  std::vector<LUXDocument> documents;
+  for (int i = 0; i < 200; ++i) {
+    std::string text;
+    for (int word = 0; word < 50; ++word) {
+      const uint32_t number = static_cast<uint32_t>(random());
+      text += (number % 3 == 0 ? "Word" : "word") + std::to_string(number / 3 % 90);
+      text += number % 11 == 0 ? ". The " : number % 7 == 0 ? " os.path " : " ";
+    }
+    documents.push_back(document("page" + std::to_string(i * 37 % 200),
+                                 "Title " + text.substr(0, 9), {text, "The print queue waits."}));
+  }
+  const Data bytes = written(documents);
+  const auto tokenizer = HelpTokenizer::tokenizerForLanguage("English");
+  for (const size_t count : {1, 2, 3, 70}) {
+    std::vector<std::unique_ptr<LUXIndexWriter>> writers;
+    for (size_t i = 0; i < count; ++i) {
+      writers.push_back(std::make_unique<LUXIndexWriter>(tokenizer));
+    }
+    for (const LUXDocument& added : documents) {
+      writers[random() % count]->addDocument(added);
+    }
+    for (size_t i = 1; i < count; ++i) {
+      writers[0]->absorb(*writers[i]);
+    }
+    EXPECT_EQ(writers[0]->documentCount(), documents.size());
+    // Threads that take part in writing change nothing either.
+    EXPECT_EQ(writers[0]->finish(count), bytes);
+  }
+}
+
+TEST(LUXIndexWriter, refusesToAbsorbAKeyThatIsThereAlready) {
+  const auto tokenizer = HelpTokenizer::tokenizerForLanguage("English");
+  LUXIndexWriter writer(tokenizer);
+  LUXIndexWriter other(tokenizer);
+  writer.addDocument(document("a", "One", {"one"}));
+  other.addDocument(document("a", "Two", {"two"}));
+  EXPECT_THROW(writer.absorb(other), platform::Exception);
+  EXPECT_EQ(writer.documentCount(), 1U);
+  EXPECT_EQ(other.documentCount(), 1U);
+}
+
 TEST(LUXIndexWriter, KeysStandInTheOrderOfTheirBytes) {
   const auto opened = index({document("b", "B", {}), document("a/z", "Z", {}),
                              document("a.html", "A", {}), document("\u00E4", "U", {})});

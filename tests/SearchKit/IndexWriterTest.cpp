@@ -52,6 +52,49 @@ TEST(IndexWriter, makesTheSameBytesInWhateverOrderDocumentsAreAdded) {
   }
 }
 
+TEST(IndexWriter, absorbedWritersMakeTheSameBytesAsOne) {
+  std::mt19937 random(5);
+  std::vector<Document> documents;
+  for (int i = 0; i < 80; ++i) {
+    std::string text = "everywhere own" + std::to_string(i);
+    for (int word = 0; word < 40; ++word) {
+      text += " word" + std::to_string(random() % 300);
+    }
+    documents.push_back(page("/page" + std::to_string(random()) + ".html", text));
+  }
+  const platform::Data bytes = indexData(documents);
+  for (const size_t count : {1, 2, 3, 7, 90}) {
+    std::vector<std::unique_ptr<IndexWriter>> writers;
+    for (size_t i = 0; i < count; ++i) {
+      writers.push_back(std::make_unique<IndexWriter>());
+    }
+    for (const Document& document : documents) {
+      writers[random() % count]->add(document);
+    }
+    for (size_t i = 1; i < count; ++i) {
+      if (i % 2 == 0) {
+        writers[i]->sortTerms();
+      }
+      writers[0]->absorb(*writers[i]);
+    }
+    EXPECT_EQ(writers[0]->documentCount(), documents.size());
+    EXPECT_EQ(writers[0]->finish(), bytes);
+  }
+}
+
+TEST(IndexWriter, refusesAPathOfAnAbsorbedWriter) {
+  IndexWriter writer;
+  IndexWriter first;
+  IndexWriter second;
+  first.add(page("/a", "one"));
+  second.add(page("/a", "two"));
+  writer.absorb(first);
+  EXPECT_THROW(writer.absorb(second), platform::Exception);
+  EXPECT_EQ(exceptionName(writer, page("/a", "three")), platform::invalidArgumentException);
+  EXPECT_EQ(writer.documentCount(), 1U);
+  EXPECT_EQ(second.documentCount(), 1U);
+}
+
 TEST(IndexWriter, refusesAPathThatIsThereAlready) {
   IndexWriter writer;
   writer.add(page("/a", "one"));

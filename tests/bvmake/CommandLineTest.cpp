@@ -108,6 +108,21 @@ TEST(CommandLine, inspectionTakesTermAnchorAndPages) {
   EXPECT_EQ(parsed({"--inspect", "file"}).inspect.term, std::nullopt);
 }
 
+TEST(CommandLine, checkTakesAFile) {
+  const CommandLine command = parsed({"--check", "file"});
+  EXPECT_EQ(command.action, CommandLine::Action::check);
+  EXPECT_EQ(command.checkedPath, "file");
+}
+
+TEST(CommandLine, jobsAreANumberFromOne) {
+  EXPECT_EQ(parsed({"--create", "--file", "o", "f"}).create.jobs, 0U);
+  EXPECT_EQ(parsed({"--create", "--file", "o", "--jobs", "3", "f"}).create.jobs, 3U);
+  for (const char* number : {"0", "-1", "257", "many", ""}) {
+    EXPECT_THAT(misuse({"--create", "--file", "o", "--jobs", number, "f"}), HasSubstr("--jobs"))
+        << number;
+  }
+}
+
 TEST(CommandLine, wrongNumbersAreMisuse) {
   for (const char* number : {"three", "-1", "3.5", "1000", "99999999999999999999999", "", "3x"}) {
     EXPECT_THAT(misuse({"--create", "--file", "o", "--min-term-length", number, "f"}),
@@ -117,13 +132,14 @@ TEST(CommandLine, wrongNumbersAreMisuse) {
 }
 
 TEST(CommandLine, whatIsMissingIsNamed) {
-  EXPECT_THAT(misuse({}), HasSubstr("--create or --inspect"));
-  EXPECT_THAT(misuse({"--file", "o", "f"}), HasSubstr("--create or --inspect"));
+  EXPECT_THAT(misuse({}), HasSubstr("--create, --inspect or --check"));
+  EXPECT_THAT(misuse({"--file", "o", "f"}), HasSubstr("--create, --inspect or --check"));
   EXPECT_THAT(misuse({"--create", "f"}), HasSubstr("--file"));
   EXPECT_THAT(misuse({"--create", "--file", "o"}), HasSubstr("FOLDER"));
   EXPECT_THAT(misuse({"--create", "--file"}), HasSubstr("--file"));
   EXPECT_THAT(misuse({"--create", "--file", "o", ""}), HasSubstr("empty"));
   EXPECT_THAT(misuse({"--inspect"}), HasSubstr("--inspect"));
+  EXPECT_THAT(misuse({"--check"}), HasSubstr("--check"));
 }
 
 TEST(CommandLine, whatIsTooMuchIsNamed) {
@@ -132,7 +148,12 @@ TEST(CommandLine, whatIsTooMuchIsNamed) {
   EXPECT_THAT(misuse({"--create", "--file", "o", "--unknown", "f"}), HasSubstr("--unknown"));
   EXPECT_THAT(misuse({"--create", "--inspect", "i", "--file", "o", "f"}), HasSubstr("exclude"));
   EXPECT_THAT(misuse({"--create", "--file", "o", "--term", "t", "f"}), HasSubstr("--inspect"));
-  EXPECT_THAT(misuse({"--inspect", "i", "f"}), HasSubstr("FOLDER"));
+  EXPECT_THAT(misuse({"--create", "--check", "i", "--file", "o", "f"}), HasSubstr("exclude"));
+  EXPECT_THAT(misuse({"--inspect", "i", "--check", "i"}), HasSubstr("exclude"));
+  EXPECT_THAT(misuse({"--check", "i", "--term", "t"}), HasSubstr("--inspect"));
+  EXPECT_THAT(misuse({"--inspect", "i", "f"}), HasSubstr("--inspect takes neither FOLDER"));
+  EXPECT_THAT(misuse({"--check", "i", "f"}), HasSubstr("--check takes neither FOLDER"));
+  EXPECT_THAT(misuse({"--check", "i", "--file", "o"}), HasSubstr("--check takes neither FOLDER"));
 }
 
 TEST(CommandLine, helpNamesEveryOptionAndSucceeds) {
@@ -142,8 +163,8 @@ TEST(CommandLine, helpNamesEveryOptionAndSucceeds) {
   EXPECT_EQ(result.errorOutput, "");
   for (const char* option :
        {"--create", "--anchors", "--generate-summaries", "--file", "--min-term-length",
-        "--append-LUX-only", "--language", "--lowered-priority", "--verbose", "--inspect", "--term",
-        "--anchor", "--pages", "--version", "FOLDER", "Exit status"}) {
+        "--append-LUX-only", "--language", "--jobs", "--lowered-priority", "--check", "--verbose",
+        "--inspect", "--term", "--anchor", "--pages", "--version", "FOLDER", "Exit status"}) {
     EXPECT_THAT(result.output, HasSubstr(option));
   }
 }

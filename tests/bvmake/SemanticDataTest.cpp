@@ -314,11 +314,11 @@ TEST_F(SemanticDataRun, theLanguageIsGuessedWherePagesSayNone) {
 }
 
 TEST_F(SemanticDataRun, pagesAfterTheSampleAreTokenisedLikeThoseBefore) {
-  for (size_t i = 0; i < SemanticData::languageSample + 5; ++i) {
+  for (size_t i = 0; i < languageSample + 5; ++i) {
     page("p" + std::to_string(1000 + i) + ".html", "<html lang=en><p>printers");
   }
   create();
-  ASSERT_EQ(index()->documentKeys().size(), SemanticData::languageSample + 5);
+  ASSERT_EQ(index()->documentKeys().size(), languageSample + 5);
   for (const std::string& key : index()->documentKeys()) {
     EXPECT_THAT(tokens(key, LUXTokenKind::stem), Contains("printer"));
   }

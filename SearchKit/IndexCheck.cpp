@@ -1,0 +1,257 @@
+#include "SearchKit/IndexCheck.h"
+
+#include <fmt/format.h>
+
+#include <cstdint>
+#include <span>
+#include <string_view>
+#include <utility>
+
+#include "SearchKit/IndexFormat.h"
+#include "SearchKit/IndexReader.h"
+#include "SearchKit/SKIndex.h"
+#include "platform/Strings.h"
+
+namespace searchkit {
+namespace {
+
+using format::Section;
+
+class Problems {
+ public:
+  explicit Problems(size_t maximumCount) : _maximumCount(maximumCount) {}
+
+  template <typename... Arguments>
+  void add(fmt::format_string<Arguments...> format, Arguments&&... arguments) {
+    if (!isFull()) {
+      _lines.push_back(fmt::format(format, std::forward<Arguments>(arguments)...));
+    }
+  }
+  bool isFull() const noexcept { return _lines.size() >= _maximumCount; }
+  std::vector<std::string> take() { return std::move(_lines); }
+
+ private:
+  size_t _maximumCount;
+  std::vector<std::string> _lines;
+};
+
+// Bytes of a section that are read from front to back.
+struct Bytes {
+  explicit Bytes(std::span<const uint8_t> section)
+      : begin(section.data()), at(begin), end(begin + section.size()) {}
+
+  size_t offset() const noexcept { return static_cast<size_t>(at - begin); }
+  size_t left() const noexcept { return static_cast<size_t>(end - at); }
+  bool number(uint32_t& value) noexcept { return format::readNumber(at, end, value); }
+
+  const uint8_t* begin;
+  const uint8_t* at;
+  const uint8_t* end;
+};
+
+class Check {
+ public:
+  Check(const SKIndex& index, Problems& problems)
+      : _index(index),
+        _view(index.view()),
+        _problems(problems),
+        _dictionary(_view.section(Section::dictionary)),
+        _postings(_view.section(Section::postings)),
+        _positions(_view.section(Section::positions)),
+        _words(_view.documentCount()) {}
+
+  void run() {
+    _checkSums();
+    _checkDocuments();
+    if (_checkTerms()) {
+      _checkEnds();
+      _checkLengths();
+    }
+  }
+
+ private:
+  void _checkSums() {
+    const IndexSummary summary = indexSummary(_index);
+    bool sectionsAreIntact = true;
+    for (const SectionInfo& section : summary.sections) {
+      sectionsAreIntact = sectionsAreIntact && section.isIntact;
+      if (!section.isIntact) {
+        _problems.add("the checksum of section {} ({}) is wrong", section.id, section.name);
+      }
+    }
+    if (sectionsAreIntact && !summary.isIntact) {
+      _problems.add("the checksum of the header is wrong");
+    }
+  }
+
+  void _checkDocuments() {
+    std::string_view before;
+    for (uint32_t id = 0; id < _view.documentCount() && !_problems.isFull(); ++id) {
+      const auto texts = _view.documentTexts(id);
+      if (!texts) {
+        _problems.add("page {}: its texts lie outside the stored text", id);
+        continue;
+      }
+      if (!texts->path.starts_with('/')) {
+        _problems.add("page {}: its path does not begin with a slash", id);
+      }
+      if (id > 0 && texts->path <= before) {
+        _problems.add("page {}: its path is not above that of the page before", id);
+      }
+      before = texts->path;
+      if (texts->title && !platform::isValidUTF8(*texts->title)) {
+        _problems.add("page {}: its title is not UTF-8", id);
+      }
+      if (texts->abstract && !platform::isValidUTF8(*texts->abstract)) {
+        _problems.add("page {}: its abstract is not UTF-8", id);
+      }
+    }
+  }
+
+  // False where the bytes are broken so that what follows means nothing.
+  bool _checkTerms() {
+    std::string term;
+    for (uint32_t number = 0; number < _view.termCount() && !_problems.isFull(); ++number) {
+      const bool beginsBlock = number % _view.termsPerBlock() == 0;
+      if (beginsBlock) {
+        _checkBlock(number / _view.termsPerBlock());
+      }
+      uint32_t postingsLength = 0;
+      uint32_t positionsLength = 0;
+      if (!_readTerm(beginsBlock, number, term) || !_dictionary.number(postingsLength) ||
+          !_dictionary.number(positionsLength)) {
+        _problems.add("term {}: its entry in the dictionary is broken", number + 1);
+        return false;
+      }
+      if (beginsBlock && _view.blockKey(number / _view.termsPerBlock()) != format::blockKey(term)) {
+        _problems.add("term {}: the key of its block is wrong", number + 1);
+      }
+      if (postingsLength > _postings.left() || positionsLength > _positions.left()) {
+        _problems.add("term {}: its postings or positions lie outside their section", number + 1);
+        return false;
+      }
+      _checkLists(number, postingsLength, positionsLength);
+    }
+    return !_problems.isFull();
+  }
+
+  void _checkBlock(uint32_t block) {
+    if (_view.blockOffset(block, format::blockDictionaryAt) != _dictionary.offset() ||
+        _view.blockOffset(block, format::blockPostingsAt) != _postings.offset() ||
+        _view.blockOffset(block, format::blockPositionsAt) != _positions.offset()) {
+      _problems.add("block {}: its offsets are wrong", block);
+    }
+  }
+
+  bool _readTerm(bool beginsBlock, uint32_t number, std::string& term) {
+    if (_dictionary.left() < 2) {
+      return false;
+    }
+    const size_t shared = *_dictionary.at++;
+    const size_t length = *_dictionary.at++;
+    if (length > _dictionary.left() || shared > (beginsBlock ? 0 : term.size()) ||
+        shared + length == 0 || shared + length > format::maximumTermBytes) {
+      return false;
+    }
+    std::string next = term.substr(0, shared);
+    next.append(reinterpret_cast<const char*>(_dictionary.at), length);
+    _dictionary.at += length;
+    if (number > 0 && next <= term) {
+      _problems.add("term {}: it is not above the term before", number + 1);
+    }
+    if (!platform::isValidUTF8(next)) {
+      _problems.add("term {}: it is not UTF-8", number + 1);
+    }
+    term = std::move(next);
+    return true;
+  }
+
+  void _checkLists(uint32_t number, uint32_t postingsLength, uint32_t positionsLength) {
+    Bytes postings({_postings.at, postingsLength});
+    Bytes positions({_positions.at, positionsLength});
+    _postings.at += postingsLength;
+    _positions.at += positionsLength;
+    uint32_t count = 0;
+    bool isSound = postings.number(count) && count > 0;
+    uint64_t next = 0;
+    for (uint32_t i = 0; isSound && i < count; ++i) {
+      uint32_t head = 0;
+      uint32_t weight = 2;
+      isSound = postings.number(head) && next + (head >> 1) < _view.documentCount() &&
+                ((head & 1) == 0 || postings.number(weight)) && weight >= 2 &&
+                weight <= format::maximumWeight;
+      if (isSound) {
+        next += head >> 1;
+        isSound = _checkPositions(positions, _words[static_cast<size_t>(next)]);
+        ++next;
+      }
+    }
+    if (!isSound || postings.left() != 0 || positions.left() != 0) {
+      _problems.add("term {}: its postings or positions are broken", number + 1);
+      _wordsAreKnown = false;
+    }
+  }
+
+  // The positions of one document, which are counted.
+  static bool _checkPositions(Bytes& positions, uint64_t& words) {
+    uint32_t length = 0;
+    if (!positions.number(length) || length == 0 || length > positions.left()) {
+      return false;
+    }
+    Bytes list({positions.at, length});
+    positions.at += length;
+    uint64_t position = 0;
+    for (bool isFirst = true; list.left() > 0; isFirst = false) {
+      uint32_t difference = 0;
+      if (!list.number(difference) || (difference == 0 && !isFirst)) {
+        return false;
+      }
+      position += difference;
+      if (position > UINT32_MAX) {
+        return false;
+      }
+      ++words;
+    }
+    return true;
+  }
+
+  void _checkEnds() {
+    if (_dictionary.left() != 0 || _postings.left() != 0 || _positions.left() != 0) {
+      _problems.add("dictionary, postings or positions go on behind the last term");
+    }
+  }
+
+  void _checkLengths() {
+    uint64_t sum = 0;
+    for (uint32_t id = 0; id < _view.documentCount(); ++id) {
+      sum += _view.documentLength(id);
+      if (_wordsAreKnown && _view.documentLength(id) != _words[id]) {
+        _problems.add("page {}: it has {} words, but its length says {}", id, _words[id],
+                      _view.documentLength(id));
+      }
+    }
+    if (sum != _view.wordCount()) {
+      _problems.add("the pages have {} words, but the header says {}", sum, _view.wordCount());
+    }
+  }
+
+  const SKIndex& _index;
+  const IndexView& _view;
+  Problems& _problems;
+  Bytes _dictionary;
+  Bytes _postings;
+  Bytes _positions;
+  // By document, how many positions its terms have.
+  std::vector<uint64_t> _words;
+  bool _wordsAreKnown = true;
+};
+
+}  // namespace
+
+std::vector<std::string> indexProblems(const SKIndex& index, size_t maximumCount) {
+  Problems problems(maximumCount);
+  Check(index, problems).run();
+  return problems.take();
+}
+
+}  // namespace searchkit
