@@ -3,45 +3,14 @@
 #include <sdbus-c++/sdbus-c++.h>
 
 #include <cerrno>
-#include <cstdlib>
-#include <optional>
 #include <set>
-#include <sstream>
+#include <string>
+#include <vector>
 
 #include "platform/Environment.h"
 #include "platform/Files.h"
 
 namespace platform {
-
-namespace {
-
-std::string variable(const char* name) {
-  const char* value = std::getenv(name);  // NOLINT(concurrency-mt-unsafe): never changed
-  return value == nullptr ? std::string() : value;
-}
-
-/// Folders for data of all applications, the most important first.
-std::vector<std::string> dataFolders() {
-  std::vector<std::string> folders;
-  if (const std::string own = variable("XDG_DATA_HOME"); !own.empty()) {
-    folders.push_back(own);
-  } else if (const std::string home = variable("HOME"); !home.empty()) {
-    folders.push_back(home + "/.local/share");
-  }
-  std::string shared = variable("XDG_DATA_DIRS");
-  if (shared.empty()) {
-    shared = "/usr/local/share:/usr/share";
-  }
-  std::istringstream list(shared);
-  for (std::string folder; std::getline(list, folder, ':');) {
-    if (folder.starts_with('/')) {
-      folders.push_back(folder);
-    }
-  }
-  return folders;
-}
-
-}  // namespace
 
 std::vector<std::string> systemRunningApplications() {
   std::vector<std::string> names;
@@ -60,7 +29,7 @@ std::vector<std::string> systemRunningApplications() {
 int LSCopyAllApplicationURLs(std::vector<URL>& applicationURLs) {
   bool anyFolder = false;
   std::set<std::string> seen;
-  for (const std::string& folder : dataFolders()) {
+  for (const std::string& folder : Environment::current()->dataDirectories) {
     const std::string applications = stringByAppendingPathComponent(folder, "applications");
     const auto names = Environment::current()->files->namesInDirectory(applications);
     anyFolder = anyFolder || names.has_value();

@@ -12,6 +12,7 @@
 
 #include "platform/Applications.h"
 #include "platform/DistributedNotificationCenter.h"
+#include "platform/Files.h"
 #include "platform/Network.h"
 #include "platform/Processes.h"
 #include "platform/UserDefaults.h"
@@ -81,6 +82,34 @@ std::optional<std::string> folderOfTheUser(const char* name, const char* standar
   return std::nullopt;
 }
 
+/// As the base-directory convention has them; applications of Flatpak are installed beside those.
+std::vector<std::string> sharedDataFolders() {
+  std::vector<std::string> folders;
+  const auto add = [&folders](const std::string& folder) {
+    std::string path = stringByStandardizingPath(folder);
+    if (folder.starts_with('/') &&
+        std::find(folders.begin(), folders.end(), path) == folders.end()) {
+      folders.push_back(std::move(path));
+    }
+  };
+  constexpr const char* exports = "flatpak/exports/share";
+  if (const auto own = folderOfTheUser("XDG_DATA_HOME", ".local/share")) {
+    add(*own);
+    add(stringByAppendingPathComponent(*own, exports));
+  }
+  std::string list = variable("XDG_DATA_DIRS");
+  if (list.empty()) {
+    list = "/usr/local/share:/usr/share";
+  }
+  for (size_t start = 0; start <= list.size();) {
+    const size_t end = std::min(list.find(':', start), list.size());
+    add(list.substr(start, end - start));
+    start = end + 1;
+  }
+  add(stringByAppendingPathComponent("/var/lib", exports));
+  return folders;
+}
+
 struct Current {
   std::mutex mutex;
   std::shared_ptr<const Environment> environment;
@@ -101,6 +130,7 @@ Environment Environment::system() {
   environment.log = standardErrorLogSink(2);
   environment.preferredLanguages = languagesOfTheUser();
   environment.cachesDirectory = folderOfTheUser("XDG_CACHE_HOME", ".cache");
+  environment.dataDirectories = sharedDataFolders();
   environment.processLauncher = systemProcessLauncher();
   environment.processTable = systemProcessTable();
   const auto settings = folderOfTheUser("XDG_CONFIG_HOME", ".config");

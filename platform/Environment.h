@@ -49,10 +49,15 @@ struct Environment {
   /// A file of certificates (PEM) to trust in place of the system's store; absent but in tests.
   std::optional<std::string> certificateAuthorityFile;
 
+  /// Folders of data that programs share, like /usr/share: the user's own first, then the
+  /// computer's. Not all of them need be there.
+  std::vector<std::string> dataDirectories;
+
   /// The real world: system clock, files and processes, log on standard error up to level 2,
   /// languages from LANGUAGE, LC_ALL, LC_MESSAGES and LANG, caches folder from XDG_CACHE_HOME or
-  /// HOME, settings from zeb/settings.plist under XDG_CONFIG_HOME or HOME, and notifications within
-  /// this process only (busNotificationCenter() reaches further).
+  /// HOME, data folders from XDG_DATA_HOME or HOME, XDG_DATA_DIRS and what Flatpak exports,
+  /// settings from zeb/settings.plist under XDG_CONFIG_HOME or HOME, and notifications within this
+  /// process only (busNotificationCenter() reaches further).
   static Environment system();
 
   /// The environment in force; the real one until it is replaced.

@@ -7,7 +7,7 @@
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "platform/Environment.h"
 #include "platform/Files.h"
-#include "zeb/BookFolder.h"
+#include "zebd/BookFolder.h"
 
 namespace zeb {
 
@@ -89,7 +89,8 @@ std::vector<BookEdition> editionsOfBook(const ZEBHelpBook& book, std::string& re
 std::vector<BookEdition> editionsOfFolder(const std::string& folder,
                                           const std::optional<std::string>& bookID,
                                           const std::string& language, std::string& reason) {
-  const std::optional<CatalogueEntry> entry = entryForFolder(folder, bookID, language, reason);
+  const std::optional<zebd::CatalogueEntry> entry =
+      zebd::entryForFolder(folder, bookID, language, reason);
   if (!entry) {
     return {};
   }

@@ -17,8 +17,6 @@
 #include "platform/Processes.h"
 #include "platform/Strings.h"
 #include "platform/WorkerThreads.h"
-#include "zeb/BookFolder.h"
-#include "zeb/Catalogue.h"
 #include "zeb/HelpSearch.h"
 #include "zeb/Indexing.h"
 #include "zeb/Interactive.h"
@@ -28,6 +26,8 @@
 #include "zeb/Publishing.h"
 #include "zeb/RemoteBooks.h"
 #include "zeb/Scan.h"
+#include "zebd/BookFolder.h"
+#include "zebd/Catalogue.h"
 
 namespace zeb {
 
@@ -257,12 +257,13 @@ ExitCode Session::operator()(const ModelsCommand& command) {
 ExitCode Session::operator()(const BooksCommand& command) {
   std::vector<ListedBook> books;
   for (CatalogueEntry& entry : _catalogue.entries()) {
-    const std::shared_ptr<ZEBHelpBook> book = bookOfEntry(entry);
+    const std::shared_ptr<ZEBHelpBook> book = zebd::bookOfEntry(entry);
     if (book != nullptr && entry.isRemote()) {
       // As it would be searched.
       entry.language = book->localization();
     }
-    books.push_back({std::move(entry), book == nullptr ? std::nullopt : indexPathOfBook(*book)});
+    books.push_back(
+        {std::move(entry), book == nullptr ? std::nullopt : zebd::indexPathOfBook(*book)});
   }
   if (command.json) {
     printBooksAsJSON(books, _console);
@@ -294,7 +295,7 @@ ExitCode Session::operator()(const IndexCommand& command) {
     const std::string folder = absolutePath(command.folders[i]);
     const auto bookID = command.bookIDs.empty() ? std::nullopt : std::optional(command.bookIDs[i]);
     std::string reason;
-    if (std::optional<CatalogueEntry> book = entryForFolder(folder, bookID, {}, reason)) {
+    if (std::optional<CatalogueEntry> book = zebd::entryForFolder(folder, bookID, {}, reason)) {
       books.push_back(std::move(*book));
     } else {
       _console.error(fmt::format("{}: {}", folder, reason));

@@ -15,8 +15,8 @@
 #include "platform/Strings.h"
 #include "platform/ThreadSafety.h"
 #include "platform/URL.h"
-#include "zeb/BookFolder.h"
 #include "zeb/RemoteBooks.h"
+#include "zebd/BookFolder.h"
 #include "zebd/Host.h"
 
 namespace zeb {
@@ -145,7 +145,7 @@ struct HelpSearch::Implementation {
 
   bool lacksIndex(const std::string& bookID) const {
     const auto book = host->bookshelf().bookWithID(bookID);
-    return book != nullptr && book->type() != ZEBHelpBookType4 && !indexPathOfBook(*book);
+    return book != nullptr && book->type() != ZEBHelpBookType4 && !zebd::indexPathOfBook(*book);
   }
 
   FoundPage pageOfResult(const ZEBResult& result) const {
@@ -289,7 +289,7 @@ std::unique_ptr<HelpSearch> HelpSearch::start(const std::vector<CatalogueEntry>&
         }
       });
   for (const CatalogueEntry& entry : entries) {
-    implementation->host->bookshelf().addBook(bookOfEntry(entry));
+    implementation->host->bookshelf().addBook(zebd::bookOfEntry(entry));
   }
   return std::unique_ptr<HelpSearch>(new HelpSearch(std::move(implementation)));
 }

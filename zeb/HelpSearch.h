@@ -11,10 +11,12 @@
 
 #include "platform/Clock.h"
 #include "platform/Error.h"
-#include "zeb/Catalogue.h"
 #include "zeb/Installation.h"
+#include "zebd/Catalogue.h"
 
 namespace zeb {
+
+using zebd::CatalogueEntry;
 
 /// A page that was found, ready to be shown.
 struct FoundPage {

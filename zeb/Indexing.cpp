@@ -13,8 +13,8 @@
 #include "platform/Environment.h"
 #include "platform/FileLock.h"
 #include "platform/Files.h"
-#include "zeb/BookFolder.h"
 #include "zeb/HelpSearch.h"
+#include "zebd/BookFolder.h"
 
 namespace zeb {
 
@@ -73,9 +73,9 @@ IndexingCounts Update::run(const std::vector<CatalogueEntry>& books,
 }
 
 bool Update::_isUpToDate(const CatalogueEntry& entry) const {
-  const std::shared_ptr<ZEBHelpBook> book = bookOfEntry(entry);
+  const std::shared_ptr<ZEBHelpBook> book = zebd::bookOfEntry(entry);
   return _catalogue.entry(entry.bookID) == entry && book != nullptr &&
-         (book->type() == ZEBHelpBookType4 || indexPathOfBook(*book));
+         (book->type() == ZEBHelpBookType4 || zebd::indexPathOfBook(*book));
 }
 
 void Update::_removeOldIndexes(HelpSearch& search, const std::vector<CatalogueEntry>& gone) {
@@ -85,9 +85,9 @@ void Update::_removeOldIndexes(HelpSearch& search, const std::vector<CatalogueEn
     bookIDs.push_back(entry.bookID);
   }
   for (const CatalogueEntry& entry : _changed) {
-    const std::shared_ptr<ZEBHelpBook> book = bookOfEntry(entry);
+    const std::shared_ptr<ZEBHelpBook> book = zebd::bookOfEntry(entry);
     // What is remembered of a book by this name may be its index in another language or place.
-    if (_catalogue.entry(entry.bookID) || (book != nullptr && indexPathOfBook(*book))) {
+    if (_catalogue.entry(entry.bookID) || (book != nullptr && zebd::indexPathOfBook(*book))) {
       bookIDs.push_back(entry.bookID);
     }
   }

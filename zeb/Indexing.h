@@ -7,12 +7,15 @@
 #include <vector>
 
 #include "platform/FileLock.h"
-#include "zeb/Catalogue.h"
 #include "zeb/CommandLine.h"
 #include "zeb/Console.h"
 #include "zeb/Installation.h"
+#include "zebd/Catalogue.h"
 
 namespace zeb {
+
+using zebd::Catalogue;
+using zebd::CatalogueEntry;
 
 class HelpSearch;
 

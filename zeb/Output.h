@@ -7,12 +7,14 @@
 #include <string_view>
 #include <vector>
 
-#include "zeb/Catalogue.h"
 #include "zeb/Console.h"
 #include "zeb/HelpSearch.h"
 #include "zeb/Models.h"
+#include "zebd/Catalogue.h"
 
 namespace zeb {
+
+using zebd::CatalogueEntry;
 
 /// Numbered pages with title, book, abstract and URL, and a last line that says how many more there
 /// are. Nothing at all for an answer without pages. What comes from books is made single lines.

@@ -18,9 +18,9 @@
 #include "platform/Files.h"
 #include "platform/RunLoop.h"
 #include "platform/ThreadSafety.h"
-#include "zeb/BookFolder.h"
 #include "zeb/HelpSearch.h"
 #include "zeb/Indexing.h"
+#include "zebd/BookFolder.h"
 #include "zebd/Host.h"
 
 namespace zeb {
@@ -155,8 +155,8 @@ std::optional<CatalogueEntry> entryToStore(const RNXCatalogueEntry& book,
 }
 
 bool hasIndex(const CatalogueEntry& entry) {
-  const auto book = bookOfEntry(entry);
-  return book != nullptr && indexPathOfBook(*book);
+  const auto book = zebd::bookOfEntry(entry);
+  return book != nullptr && zebd::indexPathOfBook(*book);
 }
 
 /// Fetches what the books need; returns whether all have an index then.
@@ -236,7 +236,7 @@ void forgetKnownIndicesWhenDue(const std::vector<CatalogueEntry>& entries) {
 void followLanguages(const Catalogue& catalogue, std::vector<CatalogueEntry>& entries) {
   std::vector<CatalogueEntry> changed;
   for (CatalogueEntry& entry : entries) {
-    const auto book = entry.isRemote() ? bookOfEntry(entry) : nullptr;
+    const auto book = entry.isRemote() ? zebd::bookOfEntry(entry) : nullptr;
     if (book == nullptr || book->localization() == entry.language) {
       continue;
     }

@@ -4,12 +4,15 @@
 #include <string>
 #include <vector>
 
-#include "zeb/Catalogue.h"
 #include "zeb/CommandLine.h"
 #include "zeb/Console.h"
 #include "zeb/Installation.h"
+#include "zebd/Catalogue.h"
 
 namespace zeb {
+
+using zebd::Catalogue;
+using zebd::CatalogueEntry;
 
 /// Enters the books of a publisher's catalogue into this one, each in the language that suits the
 /// user best, and has their indexes fetched. An installed book of the same identifier whose kind

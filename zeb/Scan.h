@@ -1,12 +1,14 @@
 // Brings the catalogue in line with the help folders that there are.
 #pragma once
 
-#include "zeb/Catalogue.h"
 #include "zeb/CommandLine.h"
 #include "zeb/Console.h"
 #include "zeb/Installation.h"
+#include "zebd/Catalogue.h"
 
 namespace zeb {
+
+using zebd::Catalogue;
 
 /// Indexes the command's folders, the books of the catalogue, and the computer's installed books,
 /// each once and only where something changed; of two folders with one identifier the one named

@@ -34,6 +34,8 @@ class Host {
   Host& operator=(const Host&) = delete;
 
   Bookshelf& bookshelf() { return *_bookshelf; }
+  /// For what may outlive the host.
+  std::shared_ptr<const Bookshelf> sharedBookshelf() const { return _bookshelf; }
   Owner& owner() { return *_owner; }
   const std::shared_ptr<ZEBPlugin>& plugin() const { return _plugin; }
 

@@ -53,24 +53,23 @@ void Owner::notifyBookshelfOfModificationsToBook(const std::shared_ptr<ZEBHelpBo
   }
 }
 
-void Owner::disableShutdown() {
-  const platform::MutexLock lock(_guardMutex);
-  ++_guardCount;
-}
+void Owner::disableShutdown() { _changeGuardCount(1); }
 
-void Owner::enableShutdown() {
+void Owner::enableShutdown() { _changeGuardCount(-1); }
+
+void Owner::_changeGuardCount(int64_t change) {
   const platform::Clock::Instant now = elapsedNow();
+  int64_t count = 0;
   {
     const platform::MutexLock lock(_guardMutex);
-    if (_guardCount > 0) {
-      if (--_guardCount == 0) {
-        _quietSince = now;
-      }
-      return;
+    count = _guardCount += change;
+    if (count == 0) {
+      _quietSince = now;
     }
   }
-  // A plug-in that gives back more than it took must not make the count useless for all others.
-  ZEBLog(1, "enableShutdown without disableShutdown");
+  if (count < 0) {
+    ZEBLog(1, "enableShutdown without disableShutdown");
+  }
 }
 
 int64_t Owner::shutdownGuardCount() const {

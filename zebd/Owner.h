@@ -77,7 +77,8 @@ class Owner : public ZEBPluginOwner {
   /// The search has returned: tells the receiver, and lets go of it.
   void endSearch(const std::string& queryID);
 
-  /// How many guards are held now.
+  /// How many guards are held now. Below zero when more were given back than taken: then something
+  /// is amiss, and the host does not count as quiet.
   int64_t shutdownGuardCount() const;
   /// Whether no guard has been held for `span`, and no operation of the process waits or runs. Work
   /// begets work, with gaps between.
@@ -87,6 +88,8 @@ class Owner : public ZEBPluginOwner {
   std::optional<platform::Seconds> idleTimeOutDelay() const;
 
  private:
+  void _changeGuardCount(int64_t change);
+
   struct Search {
     std::shared_ptr<SearchReceiver> receiver;
     bool finished = false;

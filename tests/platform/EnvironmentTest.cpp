@@ -86,6 +86,24 @@ TEST(Environment, withoutVariablesTheUserDatabaseKnowsTheHomeFolder) {
   }
 }
 
+TEST(Environment, dataDirectoriesFollowTheBaseDirectoryConventionAndEachIsThereOnce) {
+  const Variables variables({{"XDG_DATA_HOME", "/home/ada/data"},
+                             {"XDG_DATA_DIRS", "/opt/share/:relative::/usr/share:/opt/share"}});
+  EXPECT_EQ(
+      Environment::system().dataDirectories,
+      (std::vector<std::string>{"/home/ada/data", "/home/ada/data/flatpak/exports/share",
+                                "/opt/share", "/usr/share", "/var/lib/flatpak/exports/share"}));
+}
+
+TEST(Environment, withoutVariablesDataLieInTheHomeFolderAndInTheUsualPlaces) {
+  const Variables variables(
+      {{"XDG_DATA_HOME", std::nullopt}, {"XDG_DATA_DIRS", std::nullopt}, {"HOME", "/home/ada"}});
+  EXPECT_EQ(Environment::system().dataDirectories,
+            (std::vector<std::string>{
+                "/home/ada/.local/share", "/home/ada/.local/share/flatpak/exports/share",
+                "/usr/local/share", "/usr/share", "/var/lib/flatpak/exports/share"}));
+}
+
 TEST(Environment, theRealOneHasEveryService) {
   const Environment environment = Environment::system();
   EXPECT_NE(environment.clock, nullptr);

@@ -4,14 +4,14 @@
 #include <string>
 
 #include "tests/zeb/World.h"
-#include "zeb/Catalogue.h"
+#include "zebd/Catalogue.h"
 
 namespace {
 
 using testing::HasSubstr;
 using tests::Outcome;
-using zeb::Catalogue;
 using zeb::ExitCode;
+using zebd::Catalogue;
 
 class IndexCommandTest : public testing::Test {
  protected:

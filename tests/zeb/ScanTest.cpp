@@ -16,8 +16,8 @@ using testing::EndsWith;
 using testing::HasSubstr;
 using testing::Not;
 using tests::Outcome;
-using zeb::Catalogue;
 using zeb::ExitCode;
+using zebd::Catalogue;
 
 /// A computer with the help of two applications and one manual.
 class ScanTest : public testing::Test {

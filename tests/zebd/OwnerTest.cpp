@@ -88,12 +88,19 @@ TEST_F(OwnerTest, ShutdownGuardsCount) {
   EXPECT_TRUE(owner.isQuietFor(Seconds(0)));
 }
 
-TEST_F(OwnerTest, GuardThatWasNotTakenIsLoggedAndNotCounted) {
+TEST_F(OwnerTest, GuardThatWasNotTakenIsLoggedAndKeepsTheHostFromBeingQuiet) {
   owner.enableShutdown();
-  EXPECT_EQ(owner.shutdownGuardCount(), 0);
+  EXPECT_EQ(owner.shutdownGuardCount(), -1);
   EXPECT_THAT(environment.log().messages(1), ElementsAre("enableShutdown without disableShutdown"));
+  environment.clock().advance(Seconds(100));
+  EXPECT_FALSE(owner.isQuietFor(Seconds(1)));
+}
+
+TEST_F(OwnerTest, GuardThatIsGivenBackBeforeItIsTakenCountsOnce) {
+  owner.enableShutdown();
   owner.disableShutdown();
-  EXPECT_EQ(owner.shutdownGuardCount(), 1);
+  EXPECT_EQ(owner.shutdownGuardCount(), 0);
+  EXPECT_TRUE(owner.isQuietFor(Seconds(0)));
 }
 
 TEST_F(OwnerTest, IsQuietOnlyAfterASpanWithoutAnyGuard) {

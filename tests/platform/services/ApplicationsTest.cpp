@@ -89,7 +89,9 @@ TEST(RunningApplications, areNoneWithoutABus) {
 #endif
 }
 
+/// Under the variables as they are now.
 std::vector<std::string> installed(int* status = nullptr) {
+  const EnvironmentOverride environment(Environment::system());
   std::vector<URL> urls;
   const int result = LSCopyAllApplicationURLs(urls);
   if (status != nullptr) {

@@ -1,7 +1,6 @@
 // Searches in remote books whose indexes are on their way.
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <atomic>
 #include <thread>
 
@@ -67,19 +66,6 @@ class SearchDownloads : public testing::Test {
     });
   }
 
-  /// Until a search has begun to wait for the download, in the simulated time.
-  void waitUntilASearchWaitsFor(const std::string& bookID) {
-    const std::string line = "====== Waiting index download completion for " + bookID;
-    while (true) {
-      const auto lines = world.logged(3);
-      if (std::find(lines.begin(), lines.end(), line) != lines.end()) {
-        break;
-      }
-      std::this_thread::yield();
-    }
-    world.clock->waitForSleepers(1);
-  }
-
   void waitUntilDownloaded(const std::shared_ptr<ZEBHelpBook>& book) {
     const auto& shelf = world.controller->_shelf();
     while (shelf->isIndexDownloadingForBook(book)) {
@@ -100,7 +86,7 @@ TEST_F(SearchDownloads, AnIndexThatComesInTimeIsSearched) {
   addRemoteBook("r1");
   std::atomic<bool> ended{false};
   std::thread searcher = search({"r1"}, ended);
-  world.clock->waitForSleepers(1);
+  world.clock->waitForSleepOf(searcher.get_id(), 1);
   server.waitForRequests(1);
   EXPECT_FALSE(ended);
   mayAnswer.open();
@@ -118,7 +104,7 @@ TEST_F(SearchDownloads, AfterFiveSecondsASearchGoesOnWithoutTheIndex) {
   std::atomic<bool> ended{false};
   const auto start = world.clock->elapsed();
   std::thread searcher = search({"r1", "local"}, ended);
-  waitUntilASearchWaitsFor("r1");
+  world.clock->waitForSleepOf(searcher.get_id(), 1);
   world.clock->advance(platform::Seconds(4.999));
   EXPECT_FALSE(ended);
   world.clock->advance(platform::Seconds(0.001));
@@ -137,9 +123,9 @@ TEST_F(SearchDownloads, OfTwoSearchesThatWaitOneIsToldAndTheOtherWaitsToItsEnd) 
   addRemoteBook("r1");
   std::atomic<bool> ended[2] = {false, false};
   std::thread first = search({"r1"}, ended[0]);
-  world.clock->waitForSleepers(1);
+  world.clock->waitForSleepOf(first.get_id(), 1);
   std::thread second = search({"r1"}, ended[1]);
-  world.clock->waitForSleepers(2);
+  world.clock->waitForSleepOf(second.get_id(), 1);
   // One download for both.
   EXPECT_THAT(world.logged(4), Contains("Index download for r1 already in progress"));
   mayAnswer.open();
@@ -164,7 +150,7 @@ TEST_F(SearchDownloads, AnOlderIndexIsPolledForUntilTheNewerHasCome) {
   std::atomic<bool> ended{false};
   std::thread searcher = search({"r1"}, ended);
   server.waitForRequests(1);
-  world.clock->waitForSleepers(1);
+  world.clock->waitForSleepOf(searcher.get_id(), 1);
   mayAnswer.open();
   waitUntilDownloaded(book);
   while (!ended) {
@@ -182,12 +168,16 @@ TEST_F(SearchDownloads, AnOlderIndexIsSearchedAsItStandsAfterFiveSeconds) {
   const auto start = world.clock->elapsed();
   std::thread searcher = search({"r1"}, ended);
   server.waitForRequests(1);
-  waitUntilASearchWaitsFor("r1");
-  world.clock->advance(platform::Seconds(4.999));
+  // It looks every 10 ms.
+  for (size_t look = 1; look < 500; ++look) {
+    world.clock->waitForSleepOf(searcher.get_id(), look);
+    world.clock->advance(platform::Seconds(0.010));
+  }
+  world.clock->waitForSleepOf(searcher.get_id(), 500);
   EXPECT_FALSE(ended);
-  world.clock->advance(platform::Seconds(0.001));
+  world.clock->advance(platform::Seconds(0.011));
   searcher.join();
-  EXPECT_DOUBLE_EQ((world.clock->elapsed() - start).count(), 5.0);
+  EXPECT_NEAR((world.clock->elapsed() - start).count(), 5.0, 0.01);
   EXPECT_THAT(titlesOf(world.owner->records(0)), ElementsAre("Older"));
 }
 

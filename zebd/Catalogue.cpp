@@ -1,4 +1,4 @@
-#include "zeb/Catalogue.h"
+#include "zebd/Catalogue.h"
 
 #include <algorithm>
 
@@ -10,7 +10,7 @@
 #include "platform/Strings.h"
 #include "platform/Value.h"
 
-namespace zeb {
+namespace zebd {
 
 namespace {
 
@@ -166,4 +166,4 @@ void Catalogue::remove(const std::string& bookID) const {
   }
 }
 
-}  // namespace zeb
+}  // namespace zebd

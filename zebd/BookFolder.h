@@ -5,20 +5,23 @@
 #include <optional>
 #include <string>
 
-#include "zeb/Catalogue.h"
+#include "zebd/Catalogue.h"
 
 class ZEBHelpBook;
 
-namespace zeb {
+namespace zebd {
 
 /// What the catalogue is to say of a folder: a help book with an information list, or else any
 /// folder, which then needs the identifier and language given here (the name of the folder when
 /// there is none). A help book's own identifier wins. The title of a folder is that of the page
 /// that opens it. Absent, with `reason` set, for what is no folder, for one without help pages, for
-/// an information list that does not describe a book, and for an identifier that cannot be one.
+/// an information list that does not describe a book, and for an identifier that cannot be one. A
+/// help book names the page that opens it itself; of another folder that is `accessPage`, where it
+/// is not empty, or else its index page.
 std::optional<CatalogueEntry> entryForFolder(const std::string& folder,
                                              const std::optional<std::string>& bookID,
-                                             const std::string& language, std::string& reason);
+                                             const std::string& language, std::string& reason,
+                                             const std::string& accessPage = {});
 
 /// The book that the entry is about; one from a server in the language that suits its reader best
 /// now, of those that are known and here. Null when the folder's information list is no longer that
@@ -29,4 +32,4 @@ std::shared_ptr<ZEBHelpBook> bookOfEntry(const CatalogueEntry& entry);
 /// Absent when there is none yet.
 std::optional<std::string> indexPathOfBook(const ZEBHelpBook& book);
 
-}  // namespace zeb
+}  // namespace zebd

@@ -10,7 +10,7 @@
 
 #include "platform/Error.h"
 
-namespace zeb {
+namespace zebd {
 
 /// What is remembered of one book.
 struct CatalogueEntry {
@@ -73,4 +73,4 @@ class Catalogue {
   std::string _folder;
 };
 
-}  // namespace zeb
+}  // namespace zebd

@@ -1,10 +1,10 @@
-#include "zeb/Languages.h"
+#include "zebd/Languages.h"
 
 #include <algorithm>
 
 #include "platform/Strings.h"
 
-namespace zeb {
+namespace zebd {
 
 namespace {
 
@@ -64,4 +64,4 @@ std::optional<std::string> bestLanguage(const std::vector<std::string>& folders,
   return std::nullopt;
 }
 
-}  // namespace zeb
+}  // namespace zebd

@@ -1,4 +1,4 @@
-#include "zeb/BookFolder.h"
+#include "zebd/BookFolder.h"
 
 #include <fmt/format.h>
 
@@ -12,9 +12,9 @@
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "platform/Environment.h"
 #include "platform/Strings.h"
-#include "zeb/HelpFolders.h"
+#include "zebd/HelpFolders.h"
 
-namespace zeb {
+namespace zebd {
 
 namespace {
 
@@ -83,7 +83,8 @@ std::string pagesFolderOf(const CatalogueEntry& entry) {
 
 std::optional<CatalogueEntry> entryForFolder(const std::string& folder,
                                              const std::optional<std::string>& bookID,
-                                             const std::string& language, std::string& reason) {
+                                             const std::string& language, std::string& reason,
+                                             const std::string& accessPage) {
   if (!isFolder(folder)) {
     reason = "there is no such folder";
     return std::nullopt;
@@ -107,7 +108,7 @@ std::optional<CatalogueEntry> entryForFolder(const std::string& folder,
       return std::nullopt;
     }
     entry.language = language;
-    entry.accessPagePath = accessPageIn(folder);
+    entry.accessPagePath = accessPage.empty() ? accessPageIn(folder) : accessPage;
     entry.title = titleOfPage(entry.accessPagePath);
   }
   if (entry.title.empty()) {
@@ -187,4 +188,4 @@ std::optional<std::string> indexPathOfBook(const ZEBHelpBook& book) {
   return std::nullopt;
 }
 
-}  // namespace zeb
+}  // namespace zebd

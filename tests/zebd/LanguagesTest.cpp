@@ -1,12 +1,12 @@
-#include "zeb/Languages.h"
+#include "zebd/Languages.h"
 
 #include <gmock/gmock.h>
 
 namespace {
 
 using testing::ElementsAre;
-using zeb::bestLanguage;
-using zeb::languageFallbacks;
+using zebd::bestLanguage;
+using zebd::languageFallbacks;
 
 TEST(Languages, CountryFallsBackToLanguageThenEnglishThenOriginal) {
   EXPECT_THAT(languageFallbacks({"pt-BR"}), ElementsAre("pt_BR", "pt", "en", "C"));

@@ -1,4 +1,4 @@
-#include "zeb/Catalogue.h"
+#include "zebd/Catalogue.h"
 
 #include <gmock/gmock.h>
 
@@ -15,8 +15,8 @@ namespace {
 
 using testing::ElementsAre;
 using testing::IsEmpty;
-using zeb::Catalogue;
-using zeb::CatalogueEntry;
+using zebd::Catalogue;
+using zebd::CatalogueEntry;
 
 class CatalogueTest : public testing::Test {
  protected:

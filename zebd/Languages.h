@@ -5,7 +5,7 @@
 #include <string>
 #include <vector>
 
-namespace zeb {
+namespace zebd {
 
 /// The languages to look for, best first, in the spelling of folder names ("pt_BR"): each preferred
 /// one followed by itself without its country or script, and after all of them English and then
@@ -19,4 +19,4 @@ std::vector<std::string> languageFallbacks(const std::vector<std::string>& prefe
 std::optional<std::string> bestLanguage(const std::vector<std::string>& folders,
                                         const std::vector<std::string>& fallbacks);
 
-}  // namespace zeb
+}  // namespace zebd

@@ -1,4 +1,4 @@
-#include "zeb/HelpFolders.h"
+#include "zebd/HelpFolders.h"
 
 #include <gmock/gmock.h>
 
@@ -13,7 +13,7 @@ namespace {
 
 using testing::HasSubstr;
 using testing::IsEmpty;
-using zeb::HelpFolder;
+using zebd::HelpFolder;
 
 class HelpFoldersTest : public testing::Test {
  protected:
@@ -29,12 +29,12 @@ class HelpFoldersTest : public testing::Test {
   }
 
   std::vector<std::string> applications(const std::vector<std::string>& preferred = {"pt-BR"}) {
-    return described(
-        zeb::applicationHelpFolders(root.path(), zeb::languageFallbacks(preferred), passedOver));
+    return described(zebd::applicationHelpFolders({root.path("usr/share")},
+                                                  zebd::languageFallbacks(preferred), passedOver));
   }
 
   std::vector<std::string> manuals() {
-    return described(zeb::manualFolders(root.path(), passedOver));
+    return described(zebd::manualFolders({root.path("usr/share")}, passedOver));
   }
 
   void page(const std::string& name) { root.write("usr/share/" + name, "<p>page</p>"); }
@@ -50,7 +50,7 @@ class HelpFoldersTest : public testing::Test {
 
   tests::TemporaryFolder root;
   std::map<std::string, std::string> reasons;
-  zeb::PassedOver passedOver = [this](const std::string& folder, const std::string& reason) {
+  zebd::PassedOver passedOver = [this](const std::string& folder, const std::string& reason) {
     reasons[folder] = reason;
   };
 };
@@ -146,7 +146,7 @@ TEST_F(HelpFoldersTest, WhatDrownsOtherHelpIsPassedOver) {
 
 class FolderFingerprintTest : public testing::Test {
  protected:
-  std::string fingerprint() const { return zeb::folderFingerprint(folder.path()); }
+  std::string fingerprint() const { return zebd::folderFingerprint(folder.path()); }
 
   tests::TemporaryFolder folder;
 };
@@ -192,7 +192,7 @@ TEST_F(FolderFingerprintTest, LinkToItsOwnFolderIsNoTrap) {
 }
 
 TEST_F(FolderFingerprintTest, MissingFolderLooksLikeAnEmptyOne) {
-  EXPECT_EQ(zeb::folderFingerprint(folder.path("none")), fingerprint());
+  EXPECT_EQ(zebd::folderFingerprint(folder.path("none")), fingerprint());
 }
 
 }  // namespace

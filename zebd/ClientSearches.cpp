@@ -1,0 +1,216 @@
+#include "zebd/ClientSearches.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "host/Zebrine/ZEBConstants.h"
+#include "host/Zebrine/ZEBHelpBook.h"
+#include "host/Zebrine/ZEBQuery.h"
+#include "host/Zebrine/ZEBResult.h"
+#include "platform/Environment.h"
+#include "platform/RunLoop.h"
+#include "platform/URL.h"
+#include "platform/Value.h"
+#include "zebd/Host.h"
+
+namespace zebd {
+
+namespace {
+
+using platform::Value;
+using Records = std::vector<std::shared_ptr<ZEBResult>>;
+
+platform::Clock::Instant elapsedNow() { return platform::Environment::current()->clock->elapsed(); }
+
+/// A page without a title is shown by the name of its file.
+std::string nameOfPage(const std::string& url) {
+  const std::optional<platform::URL> parsed = platform::URL::URLWithString(url);
+  const std::string name = parsed ? parsed->lastPathComponent() : std::string();
+  return name.empty() ? url : name;
+}
+
+FoundItem itemOfRecord(const ZEBResult& record, const Bookshelf& bookshelf) {
+  FoundItem item;
+  item.kind = record.type();
+  item.title = record.title().value_or("");
+  item.relevance = record.relevance().doubleValue();
+  item.bookID = record.bookID().value_or("");
+  if (const auto book = bookshelf.bookWithID(item.bookID)) {
+    item.bookTitle = book->title();
+  }
+  item.url = record.payloadValueForKey(ZEBResultURLKey).stringValue().value_or("");
+  item.abstract = record.payloadValueForKey(ZEBResultAbstractKey).stringValue();
+  item.isExactMatch = record.payloadValueForKey(ZEBResultIsExactMatchKey).boolValue();
+  if (item.title.empty()) {
+    item.title = nameOfPage(item.url);
+  }
+  return item;
+}
+
+std::shared_ptr<ZEBQuery> queryOfRequest(const SearchRequest& request) {
+  auto query = ZEBQuery::initWithQueryString(request.text);
+  query->setScope(request.bookIDs);
+  query->setResultTypes(request.kinds);
+  query->setLimit(request.limit);
+  query->setPreferredLanguages(request.languages);
+  Value::Dictionary options;
+  if (request.bookIDs.empty()) {
+    // Without that, models that do not have the system's own manual would be passed over.
+    options[ZEBQuerySearchAllBooksOptionKey] = true;
+  }
+  if (request.isAnchor) {
+    options[ZEBQueryAnchorSearchOptionKey] = true;
+  }
+  query->setOptions(std::move(options));
+  return query;
+}
+
+}  // namespace
+
+struct ClientSearches::Search {
+  Client client;
+  std::shared_ptr<ZEBQuery> query;
+  platform::Clock::Instant asked;
+  /// Absent while it waits.
+  std::optional<platform::Clock::Instant> begun;
+};
+
+/// Hands on what one search finds.
+class ClientSearches::Receiver : public SearchReceiver {
+ public:
+  Receiver(std::weak_ptr<ClientSearches*> searches, Client client, Handle handle,
+           std::shared_ptr<ZEBQuery> query, std::shared_ptr<const Bookshelf> bookshelf,
+           std::shared_ptr<SearchListener> listener)
+      : _searches(std::move(searches)),
+        _client(std::move(client)),
+        _handle(handle),
+        _query(std::move(query)),
+        _bookshelf(std::move(bookshelf)),
+        _listener(std::move(listener)) {}
+
+  void foundResults(const ZEBResultBatch& batch) override {
+    if (_query->cancelled()) {
+      return;
+    }
+    std::vector<FoundItem> items;
+    if (const auto* records = std::get_if<Records>(&batch)) {
+      items.reserve(records->size());
+      for (const auto& record : *records) {
+        items.push_back(itemOfRecord(*record, *_bookshelf));
+      }
+    } else if (const auto* texts = std::get_if<std::vector<std::string>>(&batch)) {
+      for (const std::string& text : *texts) {
+        FoundItem item;
+        item.kind = ZEBHelpSuggestionResult;
+        item.title = text;
+        items.push_back(std::move(item));
+      }
+    }
+    if (!items.empty()) {
+      _listener->searchFound(_client, _handle, items);
+    }
+  }
+
+  void searchEnded(bool finished) override {
+    platform::RunLoop::main()->perform([searches = _searches, handle = _handle, finished] {
+      if (const auto self = searches.lock()) {
+        (*self)->_ended(handle, finished);
+      }
+    });
+  }
+
+ private:
+  const std::weak_ptr<ClientSearches*> _searches;
+  const Client _client;
+  const Handle _handle;
+  const std::shared_ptr<ZEBQuery> _query;
+  const std::shared_ptr<const Bookshelf> _bookshelf;
+  const std::shared_ptr<SearchListener> _listener;
+};
+
+ClientSearches::ClientSearches(Host& host, std::shared_ptr<SearchListener> listener)
+    : _host(host), _listener(std::move(listener)), _self(std::make_shared<ClientSearches*>(this)) {}
+
+ClientSearches::~ClientSearches() = default;
+
+std::optional<ClientSearches::Handle> ClientSearches::start(const Client& client,
+                                                            const SearchRequest& request) {
+  const bool isKnown = std::any_of(_searches.begin(), _searches.end(), [&](const auto& entry) {
+    return entry.second.client == client;
+  });
+  if (!isKnown && _searches.size() >= maximumClientCount) {
+    return std::nullopt;
+  }
+  const Handle handle = ++_lastHandle;
+  _searches[handle] = {client, queryOfRequest(request), elapsedNow(), std::nullopt};
+  const SearchSchedule::Replaced replaced = _schedule.add(client, handle);
+  if (replaced.waiting) {
+    _tellEnd(*replaced.waiting, SearchEnding::cancelled);
+  }
+  if (replaced.running) {
+    _searches.at(*replaced.running).query->cancel();
+  }
+  _runNext();
+  return handle;
+}
+
+bool ClientSearches::cancel(const Client& client, Handle handle) {
+  const auto found = _searches.find(handle);
+  if (found == _searches.end() || found->second.client != client) {
+    return false;
+  }
+  _cancel(handle);
+  return true;
+}
+
+void ClientSearches::clientLeft(const Client& client) {
+  std::vector<Handle> handles;
+  for (const auto& entry : _searches) {
+    if (entry.second.client == client) {
+      handles.push_back(entry.first);
+    }
+  }
+  for (const Handle handle : handles) {
+    _cancel(handle);
+  }
+}
+
+void ClientSearches::_cancel(Handle handle) {
+  const Search& search = _searches.at(handle);
+  search.query->cancel();
+  // One that runs ends by itself.
+  if (_schedule.removeWaiting(search.client, handle)) {
+    _tellEnd(handle, SearchEnding::cancelled);
+  }
+}
+
+void ClientSearches::_runNext() {
+  const std::optional<Handle> handle = _schedule.next();
+  if (!handle) {
+    return;
+  }
+  Search& search = _searches.at(*handle);
+  search.begun = elapsedNow();
+  _host.startSearch(search.query,
+                    std::make_shared<Receiver>(_self, search.client, *handle, search.query,
+                                               _host.sharedBookshelf(), _listener));
+}
+
+void ClientSearches::_ended(Handle handle, bool finished) {
+  _schedule.ended();
+  const bool isUnwanted = _searches.at(handle).query->cancelled();
+  _tellEnd(handle, isUnwanted ? SearchEnding::cancelled
+                   : finished ? SearchEnding::complete
+                              : SearchEnding::broken);
+  _runNext();
+}
+
+void ClientSearches::_tellEnd(Handle handle, SearchEnding ending) {
+  const auto found = _searches.find(handle);
+  const Search search = std::move(found->second);
+  _searches.erase(found);
+  const platform::Seconds waited = search.begun.value_or(elapsedNow()) - search.asked;
+  _listener->searchEnded(search.client, handle, ending, waited);
+}
+
+}  // namespace zebd
