@@ -36,6 +36,13 @@ std::optional<std::string> decodeString(platform::KeyedUnarchiver& coder, const 
   }
 }
 
+// Bytes that were an index and are not what was written any more. Searches would only find less and
+// could not tell why.
+bool isDamagedIndex(const std::optional<platform::Data>& data) {
+  const SKIndexRef index = data ? SKIndexOpenWithData(*data) : nullptr;
+  return index && !SKIndexVerifyChecksums(index);
+}
+
 bool isPlainPath(std::string_view path) {
   return path.size() > 1 && path.front() == '/' && path.back() != '/' &&
          path.find('%') == std::string_view::npos && path.find('\0') == std::string_view::npos;
@@ -162,6 +169,7 @@ bool ZEBHelpindexIndex::_populateWithDictionary(const platform::Value& dictionar
   }
   _luxIndexData = zebCheckClass<platform::Data>(dictionary[luxIndexDataKey]);
   _indexData = zebCheckClass<platform::Data>(dictionary[indexDataKey]);
+  _isIndexDamaged = isDamagedIndex(_indexData);
   // Taken for granted until an index is opened and tells its number of terms.
   _isSearchable.store(true);
   if (root) {
@@ -182,6 +190,7 @@ bool ZEBHelpindexIndex::_populateWithDictionary(const platform::Value& dictionar
 void ZEBHelpindexIndex::_disposeRetainedData() {
   _anchorDictionary.set({});
   _indexData.reset();
+  _isIndexDamaged = false;
   _hasPlainPages.reset();
   _luxIndexData.reset();
   _luxIndex.reset();
@@ -192,7 +201,7 @@ SKIndexRef ZEBHelpindexIndex::copyIndexRef() {
   if (!_indexData) {
     return _indexRef.lock();
   }
-  SKIndexRef opened = SKIndexOpenWithData(*_indexData);
+  SKIndexRef opened = _isIndexDamaged ? nullptr : SKIndexOpenWithData(*_indexData);
   _indexRef = opened;
   if (opened) {
     _isSearchable.store(SKIndexGetMaximumTermID(opened) >= 1);

@@ -69,9 +69,10 @@ class ZEBHelpindexIndex : public ZEBIndex, public platform::KeyedCodable {
   /// leaves the record empty. Failures are logged.
   bool reinitializeWithData(const platform::Data& data) override;
 
-  /// Opens the keyword index anew. Null when the data is no index; isSearchable() then stays as it
-  /// is, otherwise it now tells whether the index has terms. A record without keyword data gives
-  /// what the last call gave, as long as somebody still holds that.
+  /// Opens the keyword index anew. Null when the data is no index, or one whose checksums were
+  /// wrong when the record took it in, which is when they are looked at; isSearchable() then stays
+  /// as it is, otherwise it now tells whether the index has terms. A record without keyword data
+  /// gives what the last call gave, as long as somebody still holds that.
   SKIndexRef copyIndexRef();
 
   /// Gives back what copyIndexRef() gave; the reference is null afterwards.
@@ -117,6 +118,8 @@ class ZEBHelpindexIndex : public ZEBIndex, public platform::KeyedCodable {
 
   mutable platform::Monitor _monitor;
   std::optional<platform::Data> _indexData GUARDED_BY(_monitor);
+  /// Its checksums are wrong: it is not opened.
+  bool _isIndexDamaged GUARDED_BY(_monitor) = false;
   /// Of _indexData; absent until asked for.
   std::optional<bool> _hasPlainPages GUARDED_BY(_monitor);
   /// Not owned: those who were handed it are its owners.
