@@ -39,7 +39,7 @@ int main(int argc, char** argv) {
   const auto program = std::filesystem::read_symlink("/proc/self/exe", unknown);
   const std::vector<std::string> arguments(argv + (argc > 0 ? 1 : 0), argv + argc);
   const zeb::ExitCode code =
-      zeb::run(arguments, zeb::Installation::ofProgramAtPath(program.string()), console);
+      zeb::run(arguments, zebd::Installation::ofProgramAtPath(program.string()), console);
   // What must not be cut short is not.
   platform::ProcessInfo::processInfo()->waitUntilSuddenTerminationIsEnabled(platform::Seconds(5));
   // Background work may be going on, and would find what it uses destroyed.
