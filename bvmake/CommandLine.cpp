@@ -14,8 +14,8 @@ namespace {
 constexpr const char* program = "bvmake";
 
 constexpr const char* description =
-    "Makes the help index of a folder of help pages (HTML, XHTML, Mallard), or shows what is in "
-    "one.";
+    "Makes the help index of a folder of help pages (HTML, XHTML, Mallard, DocBook), shows what is "
+    "in one, or checks whether one is sound.";
 
 constexpr const char* footer =
     "Exit status: 0 done (pages that could not be read were reported), 1 failure, 2 wrong command "

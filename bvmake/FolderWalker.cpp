@@ -26,6 +26,11 @@ uint64_t sizeOfFile(const std::string& file) {
   return code ? 0 : size;
 }
 
+/// "index.docbook#start.html": the pages of a document have such names.
+bool hasNameOfPart(std::string_view name) {
+  return name.starts_with(docBookFileName) && name.substr(docBookFileName.size()).starts_with('#');
+}
+
 class Walk {
  public:
   Walk(std::string folder, Report& report)
@@ -91,7 +96,7 @@ class Walk {
       return;
     }
     const std::optional<PageKind> kind = pageKindOfFileName(name);
-    if (!kind) {
+    if (!kind || hasNameOfPart(name)) {
       return;
     }
     if (!platform::isValidUTF8(path)) {

@@ -15,6 +15,7 @@
 #include "bvmake/ASCII.h"
 #include "bvmake/MallardPageBuilder.h"
 #include "bvmake/MarkupGuard.h"
+#include "bvmake/PosedEntity.h"
 
 namespace bvmake {
 
@@ -27,31 +28,12 @@ constexpr size_t longestEntity = 4096;
 
 constexpr std::string_view xmlNamespace = "http://www.w3.org/XML/1998/namespace";
 
-/// An entity as the parser wants to be handed it: posing as a predefined one, whose text it takes
-/// as it is and never looks into.
-struct Entity {
-  std::string name;
-  std::string content;
-  xmlEntity node = {};
-
-  Entity(std::string entityName, std::string text)
-      : name(std::move(entityName)), content(std::move(text)) {
-    node.type = XML_ENTITY_DECL;
-    node.etype = XML_INTERNAL_PREDEFINED_ENTITY;
-    node.name = reinterpret_cast<const xmlChar*>(name.c_str());
-    node.content = reinterpret_cast<xmlChar*>(content.data());
-    // The parser hands over the raw text of entities that have none yet, and nobody would free it.
-    node.orig = node.content;
-    node.length = static_cast<int>(content.size());
-  }
-};
-
 /// What the parser's call-backs work on. Exceptions may not cross the parser, which is C: they wait
 /// here until it has returned.
 struct Session {
   xmlParserCtxtPtr parser = nullptr;
   MallardPageBuilder builder;
-  std::unordered_map<std::string, std::unique_ptr<Entity>> entities;
+  std::unordered_map<std::string, std::unique_ptr<PosedEntity>> entities;
   size_t entityText = 0;
   /// Name spaces that each open element declares, and their sum.
   std::vector<size_t> namespaces;
@@ -148,7 +130,7 @@ void declareEntity(void* context, const xmlChar* name, int type, const xmlChar*,
     std::string key(view(name));
     // Of two declarations the first counts.
     if (session.entities.find(key) == session.entities.end()) {
-      session.entities.emplace(key, std::make_unique<Entity>(key, std::move(text)));
+      session.entities.emplace(key, std::make_unique<PosedEntity>(key, std::move(text)));
     }
   });
 }

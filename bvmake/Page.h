@@ -36,6 +36,9 @@ struct Page {
   std::vector<TextBlock> body;
   /// Names by which places in the page can be addressed, each once, in document order.
   std::vector<std::string> anchors;
+  /// Of a page that is a part of its file: the name of the place where it begins, one of the
+  /// anchors. Empty for the page that begins with its file.
+  std::string fragment;
   /// The tag of the language that the page says it is in, as written; empty when it does not say.
   std::string language;
   /// The page asks not to be found.

@@ -13,11 +13,20 @@ namespace bvmake {
 
 namespace {
 
-std::optional<Page> refuse(platform::Error* error, std::string description) {
-  if (error != nullptr) {
-    *error = platform::formatError(std::move(description));
+std::optional<std::string> textOfPage(std::string_view bytes, Markup markup,
+                                      platform::Error* error) {
+  // Two threads that begin with their first page at once could wait for each other for ever if
+  // libxml2 were left to set itself up when it is first used.
+  [[maybe_unused]] static const bool initialized = (xmlInitParser(), true);
+  std::optional<std::string> text;
+  if (bytes.size() <= maximumPageSize) {
+    text = textFromBytes(bytes, markup);
   }
-  return std::nullopt;
+  if (!text && error != nullptr) {
+    *error = bytes.size() > maximumPageSize ? tooLargeError()
+                                            : platform::formatError("no text, but binary data");
+  }
+  return text;
 }
 
 }  // namespace
@@ -30,7 +39,7 @@ std::optional<PageKind> pageKindOfFileName(std::string_view name) {
   if (extension == "page") {
     return PageKind::mallard;
   }
-  return std::nullopt;
+  return name == docBookFileName ? std::optional(PageKind::docBook) : std::nullopt;
 }
 
 platform::Error tooLargeError() {
@@ -38,19 +47,18 @@ platform::Error tooLargeError() {
 }
 
 std::optional<Page> readPage(PageKind kind, std::string_view bytes, platform::Error* error) {
-  if (bytes.size() > maximumPageSize) {
-    return refuse(error, tooLargeError().description);
-  }
-  // Two threads that begin with their first page at once could wait for each other for ever if
-  // libxml2 were left to set itself up when it is first used.
-  [[maybe_unused]] static const bool initialized = (xmlInitParser(), true);
-  const Markup markup = kind == PageKind::html ? Markup::html : Markup::xml;
-  std::optional<std::string> text = textFromBytes(bytes, markup);
+  const bool isHTML = kind == PageKind::html;
+  std::optional<std::string> text = textOfPage(bytes, isHTML ? Markup::html : Markup::xml, error);
   if (!text) {
-    return refuse(error, "no text, but binary data");
+    return std::nullopt;
   }
-  return kind == PageKind::html ? readHTMLPage(std::move(*text), error)
-                                : readMallardPage(std::move(*text), error);
+  return isHTML ? readHTMLPage(std::move(*text), error) : readMallardPage(std::move(*text), error);
+}
+
+std::optional<DocBookPages> readDocBookPages(const std::string& name, std::string_view bytes,
+                                             const DocBookLoader& load, platform::Error* error) {
+  std::optional<std::string> text = textOfPage(bytes, Markup::xml, error);
+  return text ? readDocBook({name, std::move(*text)}, load, error) : std::nullopt;
 }
 
 }  // namespace bvmake

@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <memory>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "bvmake/FolderWalker.h"
@@ -17,6 +18,7 @@ class FileManager;
 
 namespace bvmake {
 
+class IncludedFiles;
 class Summarizer;
 
 /// Something to tell when its turn comes.
@@ -61,7 +63,9 @@ struct PreparationOptions {
 /// Reads files of a book, one after the other. Thread-safety: confined to one thread.
 class FilePreparer {
  public:
-  FilePreparer(const PreparationOptions& options, std::shared_ptr<platform::FileManager> files);
+  /// `folder` is the one that documents may include files of.
+  FilePreparer(const PreparationOptions& options, const std::string& folder,
+               std::shared_ptr<platform::FileManager> files);
   ~FilePreparer();
   FilePreparer(const FilePreparer&) = delete;
   FilePreparer& operator=(const FilePreparer&) = delete;
@@ -71,11 +75,14 @@ class FilePreparer {
 
  private:
   bool _read(const FoundPage& found, PreparedFile& file, platform::Error* error);
+  bool _readDocBook(const FoundPage& found, std::string_view bytes, PreparedFile& file,
+                    platform::Error* error);
   void _addPage(const FoundPage& found, Page page, PreparedFile& file);
   void _tell(int verbosity, std::string text, PreparedFile& file) const;
 
   const PreparationOptions _options;
   const std::shared_ptr<platform::FileManager> _files;
+  const std::unique_ptr<IncludedFiles> _includedFiles;
   const std::unique_ptr<Summarizer> _summarizer;
 };
 

@@ -75,7 +75,8 @@ class Run {
     }
     _pages = std::move(*pages);
     for (size_t worker = 0; worker < _workerCount; ++worker) {
-      _preparers.push_back(std::make_unique<FilePreparer>(_preparationOptions(), _files));
+      _preparers.push_back(
+          std::make_unique<FilePreparer>(_preparationOptions(), _options.folder, _files));
     }
     _tokenizer = tokenizerForBook(_options.folder, _options.language);
     if (_tokenizer == nullptr) {

@@ -16,4 +16,11 @@ UChar32 nextCharacter(std::string_view text, size_t& at) noexcept {
   return character;
 }
 
+std::string utf8OfCharacter(UChar32 character) {
+  char bytes[U8_MAX_LENGTH];
+  size_t length = 0;
+  U8_APPEND_UNSAFE(bytes, length, character);
+  return {bytes, length};
+}
+
 }  // namespace bvmake

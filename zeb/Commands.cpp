@@ -195,7 +195,7 @@ ExitCode Session::_searchInteractively(const SearchCommand& command) {
       // The handler may take its time, or not be there; neither is to stop the typing.
       platform::startNamedThread("open-page", [url] {
         platform::Environment::current()->processLauncher->launchAndWait("/usr/bin/xdg-open",
-                                                                         {url});
+                                                                         {addressForViewer(url)});
       });
     });
     return true;

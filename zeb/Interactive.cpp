@@ -214,4 +214,15 @@ void searchInteractively(HelpSearch& search, const std::vector<std::string>& boo
   }
 }
 
+std::string addressForViewer(std::string url) {
+  constexpr std::string_view document = "/index.docbook";
+  constexpr std::string_view escaped = "%23";
+  const size_t found = url.rfind(document);
+  if (found != std::string::npos &&
+      std::string_view(url).substr(found + document.size()).starts_with(escaped)) {
+    url.replace(found + document.size(), escaped.size(), "#");
+  }
+  return url;
+}
+
 }  // namespace zeb

@@ -52,4 +52,8 @@ void searchInteractively(HelpSearch& search, const std::vector<std::string>& boo
                          Terminal& terminal,
                          const std::function<void(const std::string&)>& openPage);
 
+/// The address under which a viewer shows a result: that of a page in a DocBook document names the
+/// place behind a '#', which in the result's URL is escaped like any other in a path.
+std::string addressForViewer(std::string url);
+
 }  // namespace zeb

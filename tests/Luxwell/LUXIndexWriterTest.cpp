@@ -137,7 +137,7 @@ TEST(LUXIndexWriter, absorbedWritersMakeTheSameBytesAsOne) {
   }
   const Data bytes = written(documents);
   const auto tokenizer = HelpTokenizer::tokenizerForLanguage("English");
-  for (const size_t count : {1, 2, 3, 70}) {
+  for (const size_t count : {1U, 2U, 3U, 70U}) {
     std::vector<std::unique_ptr<LUXIndexWriter>> writers;
     for (size_t i = 0; i < count; ++i) {
       writers.push_back(std::make_unique<LUXIndexWriter>(tokenizer));

@@ -63,7 +63,7 @@ TEST(IndexWriter, absorbedWritersMakeTheSameBytesAsOne) {
     documents.push_back(page("/page" + std::to_string(random()) + ".html", text));
   }
   const platform::Data bytes = indexData(documents);
-  for (const size_t count : {1, 2, 3, 7, 90}) {
+  for (const size_t count : {1U, 2U, 3U, 7U, 90U}) {
     std::vector<std::unique_ptr<IndexWriter>> writers;
     for (size_t i = 0; i < count; ++i) {
       writers.push_back(std::make_unique<IndexWriter>());

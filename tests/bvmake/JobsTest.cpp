@@ -90,7 +90,7 @@ TEST_F(Jobs, anyNumberOfThemGivesTheSameBytesMessagesAndFigures) {
   EXPECT_EQ(one.outcome.leftOutCount, 2U);
   EXPECT_EQ(one.report.warnings.size(), 3U);
   EXPECT_THAT(one.report.messages, Contains(Pair(2, "/0/0.html")));
-  for (const size_t jobs : {2, 3, 8, 0}) {
+  for (const size_t jobs : {2U, 3U, 8U, 0U}) {
     expectTheSame(make(jobs), one);
   }
 }

@@ -18,6 +18,16 @@ std::vector<Key> keysOf(const std::string& bytes) {
   return decoder.take(true);
 }
 
+TEST(AddressForViewerTest, PageOfADocumentIsNamedAsViewersDo) {
+  EXPECT_EQ(zeb::addressForViewer("file:///book/index.docbook%23printing"),
+            "file:///book/index.docbook#printing");
+  for (const char* const url :
+       {"file:///book/index.docbook", "file:///book/a%23b.html", "file:///index.docbook/a.html",
+        "https://host/index.docbookx%23a"}) {
+    EXPECT_EQ(zeb::addressForViewer(url), url);
+  }
+}
+
 TEST(KeyDecoderTest, TextArrivesInOnePiece) {
   EXPECT_THAT(keysOf("caf\xC3\xA9 \xF0\x9F\xA6\x93"),
               ElementsAre(Key{Kind::text, "caf\xC3\xA9 \xF0\x9F\xA6\x93"}));
