@@ -153,10 +153,11 @@ std::optional<bool> Session::_show(const std::string& asked, const std::optional
 }
 
 ExitCode Session::_ask(const std::vector<std::string>& bookIDs, const Question& question) {
-  const std::vector<CatalogueEntry> entries = _catalogue.entries();
+  std::vector<CatalogueEntry> entries = _catalogue.entries();
   if (!_knowsBooks(entries, bookIDs)) {
     return ExitCode::failure;
   }
+  followLanguages(_catalogue, entries);
   platform::Error error;
   const std::unique_ptr<HelpSearch> search = HelpSearch::start(entries, _installation, error);
   if (search == nullptr) {
@@ -257,6 +258,10 @@ ExitCode Session::operator()(const BooksCommand& command) {
   std::vector<ListedBook> books;
   for (CatalogueEntry& entry : _catalogue.entries()) {
     const std::shared_ptr<ZEBHelpBook> book = zebd::bookOfEntry(entry);
+    if (book != nullptr && entry.isRemote()) {
+      // As it would be searched.
+      entry.language = book->localization();
+    }
     books.push_back(
         {std::move(entry), book == nullptr ? std::nullopt : zebd::indexPathOfBook(*book)});
   }

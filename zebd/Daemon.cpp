@@ -14,7 +14,6 @@
 #include "platform/Environment.h"
 #include "platform/Files.h"
 #include "platform/Log.h"
-#include "platform/ProcessInfo.h"
 #include "platform/Processes.h"
 #include "platform/RunLoop.h"
 #include "platform/WorkerThreads.h"
@@ -37,8 +36,6 @@ using platform::stringByAppendingPathComponent;
 constexpr platform::Seconds loadPace{60};
 /// Requests that the bus had delivered before it heard that the daemon leaves arrive within this.
 constexpr platform::Seconds lastRequests{0.1};
-/// For what must not be cut short.
-constexpr platform::Seconds endLimit{5};
 
 platform::Environment environmentOfDaemon(const DaemonOptions& options,
                                           const Installation& installation) {
@@ -199,7 +196,6 @@ int runDaemon(const DaemonOptions& options, const Installation& installation) {
     ZEBLog(1, "%@", error.description);
     return 1;
   }
-  platform::ProcessInfo::processInfo()->waitUntilSuddenTerminationIsEnabled(endLimit);
   return 0;
 }
 

@@ -1,4 +1,3 @@
-#include <cstdlib>
 #include <filesystem>
 #include <iostream>
 #include <string>
@@ -6,6 +5,7 @@
 #include <vector>
 
 #include "zebd/Daemon.h"
+#include "zebd/Host.h"
 
 int main(int argc, char** argv) {
   int exitCode = 0;
@@ -16,6 +16,5 @@ int main(int argc, char** argv) {
     exitCode = zebd::runDaemon(*options, zebd::Installation::ofProgramAtPath(program.string()));
   }
   std::cout.flush();
-  // Background work may be going on, and would find what it uses destroyed.
-  std::_Exit(exitCode);
+  zebd::Host::endProcess(exitCode);
 }
