@@ -54,6 +54,7 @@ void BookKeeper::begin() {
   platform::removeAbandonedFiles(_catalogue.folder());
   for (const CatalogueEntry& entry : _catalogue.entries()) {
     _host.bookshelf().addBook(bookOfEntry(entry));
+    _announced[entry.bookID] = entry;
   }
   _host.announceBooks();
 }
@@ -140,13 +141,10 @@ void BookKeeper::_enter(CatalogueEntry entry, BookChanges& changes) {
     // The folder does not say that the user subscribed.
     entry.catalogueURL = former->catalogueURL;
   }
-  const bool isOnShelf = _host.bookshelf().bookWithID(entry.bookID) != nullptr;
-  if (former == entry) {
+  const auto announced = _announced.find(entry.bookID);
+  const bool isOnShelf = announced != _announced.end();
+  if (former == entry && isOnShelf && announced->second == entry) {
     ++changes.unchanged;
-    if (!isOnShelf) {
-      _host.bookshelf().addBook(bookOfEntry(entry));
-      _host.plugin()->finishPopulatingBookWithID(entry.bookID);
-    }
     return;
   }
   const auto book = bookOfEntry(entry);
@@ -156,7 +154,8 @@ void BookKeeper::_enter(CatalogueEntry entry, BookChanges& changes) {
   }
   ++changes.changed;
   _host.bookshelf().addBook(book);
-  if (former || isOnShelf || indexPathOfBook(*book)) {
+  const bool isNewToUs = former == entry && !isOnShelf;
+  if (!isNewToUs && (former || isOnShelf || indexPathOfBook(*book))) {
     // What is remembered of a book by this name may be its index in another language or place.
     _dropping[entry.bookID] = entry;
     platform::Environment::current()->notificationCenter->postNotification(
@@ -170,6 +169,7 @@ void BookKeeper::_forget(const std::string& bookID, BookChanges& changes) {
   ++changes.forgotten;
   _host.removeIndexOfBook(bookID);
   _host.bookshelf().removeBook(bookID);
+  _announced.erase(bookID);
 }
 
 void BookKeeper::_registrationChanged(const std::string& bookID) {
@@ -190,6 +190,7 @@ void BookKeeper::_store(const CatalogueEntry& entry) {
     ZEBLog(1, "Cannot remember the book %@: %@", entry.bookID, error->description);
     ++_changes.failed;
   }
+  _announced[entry.bookID] = entry;
   _host.plugin()->finishPopulatingBookWithID(entry.bookID);
 }
 

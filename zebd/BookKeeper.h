@@ -91,6 +91,8 @@ class BookKeeper {
   std::vector<Done> _current;
   BookChanges _changes;
   std::optional<platform::FileLock> _lock;
+  /// The books as the plug-in was told of them: other programs change the catalogue as well.
+  std::map<std::string, CatalogueEntry> _announced;
   /// Books whose old indexes are being dropped.
   std::map<std::string, CatalogueEntry> _dropping;
 };

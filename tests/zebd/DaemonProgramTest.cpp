@@ -49,7 +49,8 @@ std::string contents(const std::string& path) {
 /// A session of its own, with a bus that starts the real daemon when somebody asks for it.
 class DaemonProgramTest : public testing::Test {
  protected:
-  DaemonProgramTest() {
+  explicit DaemonProgramTest(const std::string& options = "--idle 3600")
+      : bus(_configuration(options)) {
     page("garden", "Roses", "Cut roses in spring.");
     page("kitchen", "Boiling", "Put water into a pot.");
   }
@@ -133,21 +134,26 @@ class DaemonProgramTest : public testing::Test {
     }
     return paths;
   }
-  void writeServiceFile(const std::string& options) const {
-    folder.write("services/org.zeb.zebd.service",
-                 "[D-BUS Service]\nName=org.zeb.zebd\nExec=" ZEB_DAEMON " " + options + "\n");
-  }
-
   tests::TemporaryFolder folder;
   const Variable cache{"XDG_CACHE_HOME", folder.path("cache")};
   const Variable data{"XDG_DATA_HOME", folder.path("own")};
   const Variable shared{"XDG_DATA_DIRS", folder.path("share")};
   const Variable config{"XDG_CONFIG_HOME", folder.path("config")};
   const Variable language{"LANGUAGE", "en"};
-  const std::string services = folder.write("services/org.zeb.zebd.service",
-                                            "[D-BUS Service]\nName=org.zeb.zebd\n"
-                                            "Exec=" ZEB_DAEMON " --idle 3600\n");
-  tests::PrivateBus bus{"<servicedir>" + folder.path("services") + "</servicedir>"};
+  tests::PrivateBus bus;
+
+ private:
+  /// The bus reads its service files when it starts, and notices changes late.
+  std::string _configuration(const std::string& options) const {
+    folder.write("services/org.zeb.zebd.service",
+                 "[D-BUS Service]\nName=org.zeb.zebd\nExec=" ZEB_DAEMON " " + options + "\n");
+    return "<servicedir>" + folder.path("services") + "</servicedir>";
+  }
+};
+
+class HastyDaemonTest : public DaemonProgramTest {
+ protected:
+  HastyDaemonTest() : DaemonProgramTest("--idle 0.5") {}
 };
 
 TEST_F(DaemonProgramTest, BusStartsTheDaemonForWhoeverAsksAndItIndexesTheBooks) {
@@ -158,8 +164,7 @@ TEST_F(DaemonProgramTest, BusStartsTheDaemonForWhoeverAsksAndItIndexesTheBooks) 
   EXPECT_THAT(gdbus({"org.zeb.Help1.StartSearch", "spring", "{}"}), StartsWith("(uint64 "));
 }
 
-TEST_F(DaemonProgramTest, DaemonLeavesWhenItHasNothingToDoAndComesBackWhenItIsAsked) {
-  writeServiceFile("--idle 0.5");
+TEST_F(HastyDaemonTest, DaemonLeavesWhenItHasNothingToDoAndComesBackWhenItIsAsked) {
   EXPECT_TRUE(waitUntilIndexed("2"));
   EXPECT_TRUE(waitFor([this] { return !isThere(); }));
   EXPECT_THAT(status(), HasSubstr("'indexed': <uint64 2>")) << "it has kept what it made";

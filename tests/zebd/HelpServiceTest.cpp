@@ -9,6 +9,7 @@
 
 #include "host/Zebrine/ZEBConstants.h"
 #include "tests/zebd/HostWorld.h"
+#include "zebd/BookFolder.h"
 
 namespace {
 
@@ -219,6 +220,32 @@ TEST_F(HelpServiceTest, NothingIsDoneAgainWhereNothingHasChanged) {
   EXPECT_EQ(changes.unchanged, 2U);
   EXPECT_EQ(changes.forgotten, 0U);
   EXPECT_EQ(changes.failed, 0U);
+}
+
+TEST_F(HelpServiceTest, BookThatAnotherProgramHasEnteredIsServed) {
+  start();
+  waitUntilFound("spring", {"Roses"});
+  writePage("elsewhere/index.html", "Painting", "Paint the wall.");
+  std::string reason;
+  const auto entry = zebd::entryForFolder(folder.path("elsewhere"), "painting", "en", reason);
+  ASSERT_TRUE(entry.has_value()) << reason;
+  zebd::Catalogue(folder.path("caches/zeb/books")).store(*entry);
+  EXPECT_TRUE(runUntil([this] { return service->books().size() == 3; }));
+  waitUntilFound("wall", {"Painting"});
+}
+
+TEST_F(HelpServiceTest, BookThatAnotherProgramHasBroughtUpToDateIsLookedAtAnew) {
+  start();
+  waitUntilFound("spring", {"Roses"});
+  // Before the watcher tells, the catalogue says already what the pages are.
+  writePage("share/help/en/garden/index.html", "Roses", "Cut roses in autumn, all of them.");
+  std::string reason;
+  const auto entry =
+      zebd::entryForFolder(folder.path("share/help/en/garden"), "garden", "en", reason);
+  ASSERT_TRUE(entry.has_value()) << reason;
+  zebd::Catalogue(folder.path("caches/zeb/books")).store(*entry);
+  EXPECT_EQ(scan().changed, 1U);
+  waitUntilFound("autumn", {"Roses"});
 }
 
 TEST_F(HelpServiceTest, SecondServiceKnowsTheBooksBeforeItHasLookedForThem) {
