@@ -20,7 +20,6 @@
 #include "zeb/HelpSearch.h"
 #include "zeb/Indexing.h"
 #include "zeb/Interactive.h"
-#include "zeb/Models.h"
 #include "zeb/Output.h"
 #include "zeb/Paths.h"
 #include "zeb/Publishing.h"
@@ -28,6 +27,7 @@
 #include "zeb/Scan.h"
 #include "zebd/BookFolder.h"
 #include "zebd/Catalogue.h"
+#include "zebd/Models.h"
 
 namespace zeb {
 
@@ -243,7 +243,7 @@ ExitCode Session::operator()(const AnchorCommand& command) {
 }
 
 ExitCode Session::operator()(const ModelsCommand& command) {
-  const std::vector<ListedModel> models = savedModels();
+  const std::vector<ListedModel> models = zebd::savedModels();
   if (command.json) {
     printModelsAsJSON(models, _console);
   } else if (models.empty()) {

@@ -9,13 +9,14 @@
 #include "platform/FileLock.h"
 #include "zeb/CommandLine.h"
 #include "zeb/Console.h"
-#include "zeb/Installation.h"
 #include "zebd/Catalogue.h"
+#include "zebd/Installation.h"
 
 namespace zeb {
 
 using zebd::Catalogue;
 using zebd::CatalogueEntry;
+using zebd::Installation;
 
 class HelpSearch;
 

@@ -6,13 +6,14 @@
 
 #include "zeb/CommandLine.h"
 #include "zeb/Console.h"
-#include "zeb/Installation.h"
 #include "zebd/Catalogue.h"
+#include "zebd/Installation.h"
 
 namespace zeb {
 
 using zebd::Catalogue;
 using zebd::CatalogueEntry;
+using zebd::Installation;
 
 /// Enters the books of a publisher's catalogue into this one, each in the language that suits the
 /// user best, and has their indexes fetched. An installed book of the same identifier whose kind

@@ -39,6 +39,6 @@ int main(int argc, char** argv) {
   const auto program = std::filesystem::read_symlink("/proc/self/exe", unknown);
   const std::vector<std::string> arguments(argv + (argc > 0 ? 1 : 0), argv + argc);
   const zeb::ExitCode code =
-      zeb::run(arguments, zeb::Installation::ofProgramAtPath(program.string()), console);
+      zeb::run(arguments, zebd::Installation::ofProgramAtPath(program.string()), console);
   zebd::Host::endProcess(static_cast<int>(code));
 }
