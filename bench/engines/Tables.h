@@ -14,7 +14,8 @@ struct Settings {
   std::string folder;
   size_t questionCount = 200;
   uint32_t seed = 1;
-  /// Which of "engine", "plugin", "letters", "opening", "size", "building", "memory"; all when empty.
+  /// Which of "engine", "plugin", "letters", "opening", "size", "building", "memory"; all when
+  /// empty.
   std::vector<std::string> tables;
 };
 
