@@ -51,15 +51,15 @@ class BitWriter {
 
   /// As many ones, at most 32.
   void appendOnes(uint32_t count) {
-    append(count == 32 ? UINT32_MAX : (uint32_t{1} << count) - 1, count);
+    append(static_cast<uint32_t>((uint64_t{1} << count) - 1), count);
   }
 
   /// A number of at least 1: in unary how many bits follow the highest, then these.
   void appendCount(uint32_t number) {
-    const auto bits = static_cast<uint32_t>(std::bit_width(number)) - 1;
+    const uint32_t bits = static_cast<uint32_t>(std::bit_width(number | 1)) - 1;
     appendOnes(bits);
     append(0, 1);
-    append(number & ((uint32_t{1} << bits) - 1), bits);
+    append(number & static_cast<uint32_t>((uint64_t{1} << bits) - 1), bits);
   }
 
   void appendDistance(uint32_t distance, uint32_t lowBits) {
@@ -71,7 +71,7 @@ class BitWriter {
     }
     appendOnes(high);
     append(0, 1);
-    append(distance & ((uint32_t{1} << lowBits) - 1), lowBits);
+    append(distance & static_cast<uint32_t>((uint64_t{1} << lowBits) - 1), lowBits);
   }
 
   uint64_t bitCount() const noexcept { return _bytes.size() * 8 + _count; }
