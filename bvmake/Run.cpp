@@ -20,6 +20,7 @@
 #include "bvmake/Report.h"
 #include "bvmake/SemanticData.h"
 #include "host/Luxwell/HelpTokenizer.h"
+#include "platform/AbandonedFiles.h"
 #include "platform/Environment.h"
 #include "platform/Exception.h"
 
@@ -111,6 +112,10 @@ class Run {
       _fail(fmt::format("cannot write {}: {}", _options.outputPath, error->description));
       return false;
     }
+    // What runs have left that were killed while they wrote this file.
+    const std::string folder = platform::stringByDeletingLastPathComponent(_options.outputPath);
+    platform::removeAbandonedFiles(folder.empty() ? "." : folder,
+                                   platform::lastPathComponent(_options.outputPath));
     return true;
   }
 
