@@ -310,24 +310,28 @@ struct Attributes {
   Attributes(Document& document, int count, const xmlChar** attributes) {
     for (int i = 0; i < count; ++i, attributes += 5) {
       const char* const begin = reinterpret_cast<const char*>(attributes[3]);
-      std::string value(begin, reinterpret_cast<const char*>(attributes[4]));
-      if (value.find('&') != std::string::npos) {
-        value = document.flattened(value);
-      }
+      const std::string_view value(
+          begin, static_cast<size_t>(reinterpret_cast<const char*>(attributes[4]) - begin));
       const std::string_view name = view(attributes[0]);
       const std::string_view space = view(attributes[2]);
       if (name == "id" && (space.empty() || space == xmlNamespace)) {
-        id = value;
+        id = _text(document, value);
       } else if (name == "lang" && (space.empty() || space == xmlNamespace)) {
-        language = value;
+        language = _text(document, value);
       } else if (name == "href" && space.empty()) {
-        reference = value;
+        reference = _text(document, value);
       } else if (name == "parse" && space.empty()) {
         asText = value == "text";
       } else if (name == "xpointer" && space.empty()) {
         hasPointer = true;
       }
     }
+  }
+
+ private:
+  static std::string _text(Document& document, std::string_view value) {
+    return value.find('&') == std::string_view::npos ? std::string(value)
+                                                     : document.flattened(value);
   }
 };
 
