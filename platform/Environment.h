@@ -46,6 +46,9 @@ struct Environment {
   /// The user's caches folder; absent when there is none (no home folder).
   std::optional<std::string> cachesDirectory;
 
+  /// A file of certificates (PEM) to trust in place of the system's store; absent but in tests.
+  std::optional<std::string> certificateAuthorityFile;
+
   /// Folders of data that programs share, like /usr/share: the user's own first, then the
   /// computer's. Not all of them need be there.
   std::vector<std::string> dataDirectories;

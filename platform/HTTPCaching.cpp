@@ -128,6 +128,19 @@ std::string_view opaqueTag(std::string_view tag) {
   return tag.starts_with("W/") ? tag.substr(2) : tag;
 }
 
+/// Credentials are not kept with answers, so nothing could tell later whose such an answer is.
+bool isForThisUserAlone(const URLRequest& request, const URLResponse& response) {
+  if (!request.credential() && !request.valueForHTTPHeaderField("Authorization")) {
+    return false;
+  }
+  bool varies = false;
+  const std::string fields = response.valueForHTTPHeaderField("Vary").value_or("");
+  forEachDirective(fields, [&](std::string_view name, std::string_view) {
+    varies = varies || isSameHTTPFieldName(name, "Authorization");
+  });
+  return varies;
+}
+
 }  // namespace
 
 std::optional<system_clock::time_point> timeFromText(const std::string& text) {
@@ -153,6 +166,7 @@ bool concernsCache(const URLRequest& request) {
 
 bool mayStore(const URLRequest& request, const URLResponse& response) {
   return concernsCache(request) && response.statusCode() == 200 &&
+         !isForThisUserAlone(request, response) &&
          !directivesOf(response.allHeaderFields()).noStore &&
          !directivesOf(request.allHTTPHeaderFields()).noStore;
 }

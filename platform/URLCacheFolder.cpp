@@ -6,6 +6,7 @@
 #include <utility>
 #include <vector>
 
+#include "platform/AbandonedFiles.h"
 #include "platform/Environment.h"
 #include "platform/Files.h"
 
@@ -32,7 +33,7 @@ bool isNameOfLeftover(const std::string& name) {
   return name.starts_with('.') && name.ends_with(".tmp") && name.find(suffix) != std::string::npos;
 }
 
-/// No write takes that long.
+/// No write takes that long, whoever has the number of the process that began it by now.
 constexpr std::chrono::hours ageOfLeftovers{1};
 
 std::shared_ptr<const FileManager> files() { return Environment::current()->files; }
@@ -91,6 +92,9 @@ void URLCacheFolder::_noteUseOfName(const std::string& name) {
 
 void URLCacheFolder::_becomeAcquainted() {
   const auto manager = files();
+  if (!std::exchange(_knowsLeftovers, true)) {
+    removeAbandonedFiles(_path);
+  }
   std::vector<std::string> names =
       manager->namesInDirectory(_path).value_or(std::vector<std::string>());
   for (const std::string& name : names) {

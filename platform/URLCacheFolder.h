@@ -49,6 +49,8 @@ class URLCacheFolder {
   const std::string _path;
   /// Held over changes to files; comes before the other.
   Mutex _writing;
+  /// Whether what processes left there that had ended before this one has been deleted.
+  bool _knowsLeftovers GUARDED_BY(_writing) = false;
   mutable Mutex _mutex;
   std::map<std::string, Entry> _entries GUARDED_BY(_mutex);
   uint64_t _useCount GUARDED_BY(_mutex) = 0;

@@ -24,6 +24,10 @@ URLSessionConfiguration URLSessionConfiguration::defaultSessionConfiguration() {
   return configuration;
 }
 
+std::optional<std::string> URLSessionConfiguration::certificateAuthorityFile() const {
+  return _authorityFile ? _authorityFile : Environment::current()->certificateAuthorityFile;
+}
+
 std::shared_ptr<platform::URLCache> URLSessionConfiguration::URLCache() const {
   return _usesSharedCache ? platform::URLCache::sharedURLCache() : _cache;
 }

@@ -60,8 +60,9 @@ class URLSessionConfiguration {
     _protocolClasses = std::move(classes);
   }
 
-  /// A file of certificates (PEM) to trust in place of the system's store. For tests.
-  const std::optional<std::string>& certificateAuthorityFile() const { return _authorityFile; }
+  /// A file of certificates (PEM) to trust in place of the system's store; what the environment
+  /// says at the time until it is set. For tests.
+  std::optional<std::string> certificateAuthorityFile() const;
   void setCertificateAuthorityFile(std::optional<std::string> path) {
     _authorityFile = std::move(path);
   }

@@ -20,7 +20,6 @@
 #include "zeb/HelpSearch.h"
 #include "zeb/Indexing.h"
 #include "zeb/Interactive.h"
-#include "zeb/Models.h"
 #include "zeb/Output.h"
 #include "zeb/Paths.h"
 #include "zeb/Publishing.h"
@@ -28,6 +27,7 @@
 #include "zeb/Scan.h"
 #include "zebd/BookFolder.h"
 #include "zebd/Catalogue.h"
+#include "zebd/Models.h"
 
 namespace zeb {
 
@@ -153,10 +153,11 @@ std::optional<bool> Session::_show(const std::string& asked, const std::optional
 }
 
 ExitCode Session::_ask(const std::vector<std::string>& bookIDs, const Question& question) {
-  const std::vector<CatalogueEntry> entries = _catalogue.entries();
+  std::vector<CatalogueEntry> entries = _catalogue.entries();
   if (!_knowsBooks(entries, bookIDs)) {
     return ExitCode::failure;
   }
+  followLanguages(_catalogue, entries);
   platform::Error error;
   const std::unique_ptr<HelpSearch> search = HelpSearch::start(entries, _installation, error);
   if (search == nullptr) {
@@ -242,7 +243,7 @@ ExitCode Session::operator()(const AnchorCommand& command) {
 }
 
 ExitCode Session::operator()(const ModelsCommand& command) {
-  const std::vector<ListedModel> models = savedModels();
+  const std::vector<ListedModel> models = zebd::savedModels();
   if (command.json) {
     printModelsAsJSON(models, _console);
   } else if (models.empty()) {
@@ -257,6 +258,10 @@ ExitCode Session::operator()(const BooksCommand& command) {
   std::vector<ListedBook> books;
   for (CatalogueEntry& entry : _catalogue.entries()) {
     const std::shared_ptr<ZEBHelpBook> book = zebd::bookOfEntry(entry);
+    if (book != nullptr && entry.isRemote()) {
+      // As it would be searched.
+      entry.language = book->localization();
+    }
     books.push_back(
         {std::move(entry), book == nullptr ? std::nullopt : zebd::indexPathOfBook(*book)});
   }

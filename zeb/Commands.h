@@ -6,9 +6,11 @@
 
 #include "zeb/CommandLine.h"
 #include "zeb/Console.h"
-#include "zeb/Installation.h"
+#include "zebd/Installation.h"
 
 namespace zeb {
+
+using zebd::Installation;
 
 /// Runs one command line (the program's name not among the arguments). Results go to the console's
 /// output, all that is wrong to its messages. Nothing is thrown. Runs the main loop; to be called

@@ -11,12 +11,13 @@
 
 #include "platform/Clock.h"
 #include "platform/Error.h"
-#include "zeb/Installation.h"
 #include "zebd/Catalogue.h"
+#include "zebd/Installation.h"
 
 namespace zeb {
 
 using zebd::CatalogueEntry;
+using zebd::Installation;
 
 /// A page that was found, ready to be shown.
 struct FoundPage {

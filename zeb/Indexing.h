@@ -9,13 +9,14 @@
 #include "platform/FileLock.h"
 #include "zeb/CommandLine.h"
 #include "zeb/Console.h"
-#include "zeb/Installation.h"
 #include "zebd/Catalogue.h"
+#include "zebd/Installation.h"
 
 namespace zeb {
 
 using zebd::Catalogue;
 using zebd::CatalogueEntry;
+using zebd::Installation;
 
 class HelpSearch;
 
@@ -32,6 +33,9 @@ struct IndexingCounts {
 /// Has the catalogue to itself among programs, as long as the result lives; waits for that, saying
 /// so on the console. Absent where no lock can be had.
 std::optional<platform::FileLock> lockCatalogue(const Catalogue& catalogue, Console& console);
+
+/// The file that is locked for that.
+std::string lockPathOfCatalogue(const Catalogue& catalogue);
 
 /// One bringing up to date. Runs the main loop; confined to the main thread.
 class Update {

@@ -9,12 +9,13 @@
 
 #include "zeb/Console.h"
 #include "zeb/HelpSearch.h"
-#include "zeb/Models.h"
 #include "zebd/Catalogue.h"
+#include "zebd/Models.h"
 
 namespace zeb {
 
 using zebd::CatalogueEntry;
+using zebd::ListedModel;
 
 /// Numbered pages with title, book, abstract and URL, and a last line that says how many more there
 /// are. Nothing at all for an answer without pages. What comes from books is made single lines.

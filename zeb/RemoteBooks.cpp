@@ -73,14 +73,20 @@ std::optional<platform::URL> addressOfCatalogue(const std::string& typed) {
   return isWeb && !ZEBOriginOfURL(*url).empty() ? url : std::nullopt;
 }
 
-std::shared_ptr<const RNXCatalogue> loadCatalogue(const platform::URL& url, const Waiting& waiting,
-                                                  Console& console) {
+/// Asks for the catalogue, and waits for what becomes of that.
+std::shared_ptr<const Answer> askForCatalogue(const platform::URL& url, const Waiting& waiting) {
   const auto answer = std::make_shared<Answer>();
   RNXObjectManager::sharedObjectManager()->loadCatalogue(
       url,
       [answer](const std::shared_ptr<const RNXCatalogue>& catalogue,
                const std::optional<platform::Error>& error) { answer->set(catalogue, error); });
   zebd::Host::runMainLoopUntil([&] { return answer->isThere(); }, platform::Seconds(waiting.limit));
+  return answer;
+}
+
+std::shared_ptr<const RNXCatalogue> loadCatalogue(const platform::URL& url, const Waiting& waiting,
+                                                  Console& console) {
+  const auto answer = askForCatalogue(url, waiting);
   auto catalogue = answer->catalogue();
   if (catalogue == nullptr) {
     console.error(fmt::format("{}: {}", url.absoluteString(), answer->reason()));
@@ -112,7 +118,8 @@ std::vector<const RNXCatalogueEntry*> chosenEntries(const RNXCatalogue& catalogu
   return chosen;
 }
 
-CatalogueEntry remoteEntry(const RNXCatalogueEntry& book, const platform::URL& catalogueURL) {
+CatalogueEntry remoteEntry(const RNXCatalogueEntry& book, const platform::URL& catalogueURL,
+                           const std::vector<std::string>& languages) {
   CatalogueEntry entry;
   entry.bookID = book.identifier;
   entry.title = book.title;
@@ -122,6 +129,7 @@ CatalogueEntry remoteEntry(const RNXCatalogueEntry& book, const platform::URL& c
   entry.accessPagePath = stringByAppendingPathComponent(entry.folder, "index.html");
   entry.language = book.locale.value_or("");
   entry.catalogueURL = catalogueURL.absoluteString();
+  entry.languages = languages;
   if (book.pages) {
     entry.pagesURL = book.pages->absoluteString();
   }
@@ -131,10 +139,11 @@ CatalogueEntry remoteEntry(const RNXCatalogueEntry& book, const platform::URL& c
 /// What is to be remembered of the book; absent, and told, when another one has its place.
 std::optional<CatalogueEntry> entryToStore(const RNXCatalogueEntry& book,
                                            const platform::URL& catalogueURL,
-                                           const Catalogue& catalogue, Console& console) {
+                                           const AddCommand& command, const Catalogue& catalogue,
+                                           Console& console) {
   std::optional<CatalogueEntry> former = catalogue.entry(book.identifier);
   if (!former || former->isRemote()) {
-    return remoteEntry(book, catalogueURL);
+    return remoteEntry(book, catalogueURL, command.languages);
   }
   if (former->type == ZEBHelpBookType3) {
     former->catalogueURL = catalogueURL.absoluteString();
@@ -224,6 +233,32 @@ void forgetKnownIndicesWhenDue(const std::vector<CatalogueEntry>& entries) {
   }
 }
 
+void followLanguages(const Catalogue& catalogue, std::vector<CatalogueEntry>& entries) {
+  std::vector<CatalogueEntry> changed;
+  for (CatalogueEntry& entry : entries) {
+    const auto book = entry.isRemote() ? zebd::bookOfEntry(entry) : nullptr;
+    if (book == nullptr || book->localization() == entry.language) {
+      continue;
+    }
+    entry.language = book->localization();
+    const std::optional<platform::URL> pages = book->remoteURL();
+    entry.pagesURL = pages ? std::optional(pages->absoluteString()) : std::nullopt;
+    changed.push_back(entry);
+  }
+  if (changed.empty()) {
+    return;
+  }
+  forgetKnownIndices();
+  // Whoever has the catalogue to himself may be removing one of them; the next time will do.
+  if (const auto lock = platform::FileLock::tryLock(lockPathOfCatalogue(catalogue))) {
+    for (const CatalogueEntry& entry : changed) {
+      if (catalogue.entry(entry.bookID)) {
+        (void)catalogue.store(entry);
+      }
+    }
+  }
+}
+
 ExitCode addBooks(const AddCommand& command, const Catalogue& catalogue,
                   const Installation& installation, const Waiting& waiting, Console& console) {
   const std::optional<platform::URL> url = addressOfCatalogue(command.url);
@@ -239,7 +274,7 @@ ExitCode addBooks(const AddCommand& command, const Catalogue& catalogue,
   const auto chosen = chosenEntries(*published, command, console);
   std::vector<CatalogueEntry> entries;
   for (const RNXCatalogueEntry* book : chosen) {
-    std::optional<CatalogueEntry> entry = entryToStore(*book, *url, catalogue, console);
+    std::optional<CatalogueEntry> entry = entryToStore(*book, *url, command, catalogue, console);
     if (!entry) {
       continue;
     }
@@ -319,12 +354,22 @@ ExitCode removeBooks(const RemoveCommand& command, const Catalogue& catalogue,
 
 size_t refreshRemoteBooks(const Catalogue& catalogue, const Installation& installation,
                           const Waiting& waiting, Console& console) {
-  std::vector<CatalogueEntry> remote = catalogue.entries();
-  std::erase_if(remote, [](const CatalogueEntry& entry) { return !entry.isRemote(); });
-  if (!remote.empty() && waiting.waits) {
-    (void)fetchIndexes(remote, installation, waiting, console);
+  std::vector<CatalogueEntry> concerned = catalogue.entries();
+  std::erase_if(concerned, [](const CatalogueEntry& entry) { return !entry.catalogueURL; });
+  followLanguages(catalogue, concerned);
+  if (!concerned.empty() && waiting.waits) {
+    // Installed books go by what is known of their catalogues when the plug-in looks at them.
+    for (const CatalogueEntry& entry : concerned) {
+      const auto url = platform::URL::URLWithString(*entry.catalogueURL);
+      if (url && !entry.isRemote()) {
+        (void)askForCatalogue(*url, waiting);
+      }
+    }
+    (void)fetchIndexes(concerned, installation, waiting, console);
   }
-  return remote.size();
+  return static_cast<size_t>(
+      std::count_if(concerned.begin(), concerned.end(),
+                    [](const CatalogueEntry& entry) { return entry.isRemote(); }));
 }
 
 }  // namespace zeb

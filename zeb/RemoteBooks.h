@@ -6,13 +6,14 @@
 
 #include "zeb/CommandLine.h"
 #include "zeb/Console.h"
-#include "zeb/Installation.h"
 #include "zebd/Catalogue.h"
+#include "zebd/Installation.h"
 
 namespace zeb {
 
 using zebd::Catalogue;
 using zebd::CatalogueEntry;
+using zebd::Installation;
 
 /// Enters the books of a publisher's catalogue into this one, each in the language that suits the
 /// user best, and has their indexes fetched. An installed book of the same identifier whose kind
@@ -26,10 +27,15 @@ ExitCode addBooks(const AddCommand& command, const Catalogue& catalogue,
 ExitCode removeBooks(const RemoveCommand& command, const Catalogue& catalogue,
                      const Installation& installation, Console& console);
 
-/// Has all remote books looked for on their servers now, and what has changed fetched. Returns how
-/// many there are.
+/// Has all remote books, and installed books that are renewed from servers, looked for there now,
+/// and what has changed fetched. Returns how many remote books there are.
 size_t refreshRemoteBooks(const Catalogue& catalogue, const Installation& installation,
                           const Waiting& waiting, Console& console);
+
+/// Has the entries of remote books say in which language each is now, in the catalogue, too: the
+/// best of those that are here. Where one has changed, the plug-in of the next host looks at every
+/// book anew: what it remembers is the former index.
+void followLanguages(const Catalogue& catalogue, std::vector<CatalogueEntry>& entries);
 
 /// Has the plug-in of the next host look at every book anew, which is when it asks servers: at
 /// once, or (when due) when it has not done so for some hours and there are books that a server may

@@ -3,12 +3,13 @@
 
 #include "zeb/CommandLine.h"
 #include "zeb/Console.h"
-#include "zeb/Installation.h"
 #include "zebd/Catalogue.h"
+#include "zebd/Installation.h"
 
 namespace zeb {
 
 using zebd::Catalogue;
+using zebd::Installation;
 
 /// Indexes the command's folders, the books of the catalogue, and the computer's installed books,
 /// each once and only where something changed; of two folders with one identifier the one named

@@ -9,8 +9,8 @@
 
 #include "platform/DistributedNotificationCenter.h"
 #include "platform/Environment.h"
-#include "platform/ProcessInfo.h"
 #include "zeb/Commands.h"
+#include "zebd/Host.h"
 
 namespace {
 
@@ -39,9 +39,6 @@ int main(int argc, char** argv) {
   const auto program = std::filesystem::read_symlink("/proc/self/exe", unknown);
   const std::vector<std::string> arguments(argv + (argc > 0 ? 1 : 0), argv + argc);
   const zeb::ExitCode code =
-      zeb::run(arguments, zeb::Installation::ofProgramAtPath(program.string()), console);
-  // What must not be cut short is not.
-  platform::ProcessInfo::processInfo()->waitUntilSuddenTerminationIsEnabled(platform::Seconds(5));
-  // Background work may be going on, and would find what it uses destroyed.
-  std::_Exit(static_cast<int>(code));
+      zeb::run(arguments, zebd::Installation::ofProgramAtPath(program.string()), console);
+  zebd::Host::endProcess(static_cast<int>(code));
 }

@@ -6,6 +6,7 @@
 #include <system_error>
 
 #include "bvmake/PageReader.h"
+#include "host/Zebrine/RNXObjectManager.h"
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBGeneratedFiles.h"
 #include "host/Zebrine/ZEBHelpBook.h"
@@ -133,12 +134,15 @@ std::shared_ptr<ZEBHelpBook> remoteBookOfEntry(const CatalogueEntry& entry) {
   book->setTitle(entry.title);
   book->setLocalization(entry.language);
   book->setCatalogueURL(platform::URL::URLWithString(*entry.catalogueURL));
+  book->setPreferredLanguages(entry.languages);
   book->setRemoteURL(platform::URL::URLWithString(entry.pagesURL.value_or("")));
   if (const std::optional<std::string> root = ZEBGeneratedRoot()) {
     const std::string list =
         ZEBGeneratedFilePath(*root, book->bookID(), entry.language, ZEBExactMatchListExtension);
     book->setExactMatchPath(isFile(list) ? std::optional(list) : std::nullopt);
   }
+  // The user's languages may be others than when the book was added.
+  RNXObjectManager::sharedObjectManager()->takeLocalization(book);
   return book;
 }
 

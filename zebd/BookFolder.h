@@ -23,8 +23,9 @@ std::optional<CatalogueEntry> entryForFolder(const std::string& folder,
                                              const std::string& language, std::string& reason,
                                              const std::string& accessPage = {});
 
-/// The book that the entry is about. Null when the folder's information list is no longer that of
-/// this book.
+/// The book that the entry is about; one from a server in the language that suits its reader best
+/// now, of those that are known and here. Null when the folder's information list is no longer that
+/// of this book.
 std::shared_ptr<ZEBHelpBook> bookOfEntry(const CatalogueEntry& entry);
 
 /// The help-index file of the book that is there now: a generated one, or the one that it ships.

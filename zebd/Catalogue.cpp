@@ -27,6 +27,7 @@ constexpr const char* accessPageKey = "accessPage";
 constexpr const char* languageKey = "language";
 constexpr const char* fingerprintKey = "fingerprint";
 constexpr const char* catalogueURLKey = "catalogueURL";
+constexpr const char* languagesKey = "languages";
 constexpr const char* pagesURLKey = "pagesURL";
 
 /// Paths are bytes, strings of a property list are text: a path that is no printable text is kept
@@ -66,6 +67,9 @@ Value propertyList(const CatalogueEntry& entry) {
   if (entry.catalogueURL) {
     list[catalogueURLKey] = *entry.catalogueURL;
   }
+  if (!entry.languages.empty()) {
+    list[languagesKey] = Value::Array(entry.languages.begin(), entry.languages.end());
+  }
   if (entry.pagesURL) {
     list[pagesURLKey] = *entry.pagesURL;
   }
@@ -91,6 +95,13 @@ std::optional<CatalogueEntry> entryFromPropertyList(const Value& list) {
   entry.fingerprint = list[fingerprintKey].stringValue().value_or("");
   entry.catalogueURL = list[catalogueURLKey].stringValue();
   entry.pagesURL = list[pagesURLKey].stringValue();
+  if (const Value::Array* languages = list[languagesKey].arrayIf()) {
+    for (const Value& language : *languages) {
+      if (const std::string* tag = language.stringIf()) {
+        entry.languages.push_back(*tag);
+      }
+    }
+  }
   return entry;
 }
 

@@ -30,6 +30,9 @@ struct CatalogueEntry {
   /// Of a book from a server, and of an installed one that is renewed from there: where the
   /// publisher's catalogue is.
   std::optional<std::string> catalogueURL;
+  /// In which languages a book from a server is wanted; empty for the user's own, whichever they
+  /// are at the time.
+  std::vector<std::string> languages;
   /// Where the server has the book's pages.
   std::optional<std::string> pagesURL;
 

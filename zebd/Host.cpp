@@ -1,14 +1,17 @@
 #include "zebd/Host.h"
 
 #include <algorithm>
+#include <cstdlib>
 #include <utility>
 
 #include "host/Luxwell/HelpLUXModel.h"
+#include "host/Zebrine/RNXObjectManager.h"
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "host/Zebrine/ZEBPlugin.h"
 #include "host/Zebrine/ZEBQuery.h"
 #include "platform/Environment.h"
+#include "platform/ProcessInfo.h"
 #include "platform/RunLoop.h"
 #include "platform/UserDefaults.h"
 #include "platform/WorkerThreads.h"
@@ -26,6 +29,9 @@ constexpr const char* modelGroupsKey = "ModelGroups";
 
 /// How soon the main thread notices what no block of its loop tells it.
 constexpr platform::Seconds pace{0.01};
+
+/// For a file that is being written; no more than somebody who ends a program waits for.
+constexpr platform::Seconds patienceAtTheEnd{5};
 
 }  // namespace
 
@@ -76,6 +82,19 @@ void Host::announceBooks() {
   _plugin->finishPopulatingKnownBooks();
 }
 
+void Host::userLanguagesDidChange() {
+  const auto service = RNXObjectManager::sharedObjectManager();
+  for (const auto& entry : _bookshelf->books()) {
+    if (entry.second->type() == ZEBHelpBookType4) {
+      // What the service said of it was said for the former languages.
+      entry.second->setRemoteBookInfo({});
+      service->takeLocalization(entry.second);
+    }
+  }
+  _plugin->notifyEvent(ZEBPluginEventLanguageChanged, {});
+  announceBooks();
+}
+
 void Host::removeIndexOfBook(const std::string& bookID) {
   _plugin->removeIndexForBookWithID(bookID);
 }
@@ -91,6 +110,11 @@ bool Host::runMainLoopUntil(const std::function<bool()>& condition, platform::Se
     platform::RunLoop::main()->runFor(std::min(pace, platform::Seconds(deadline - now)));
   }
   return true;
+}
+
+void Host::endProcess(int status) {
+  platform::ProcessInfo::processInfo()->waitUntilSuddenTerminationIsEnabled(patienceAtTheEnd);
+  std::_Exit(status);
 }
 
 }  // namespace zebd

@@ -56,6 +56,12 @@ class Host {
   /// Tells the plug-in that the host has read all its books. They are registered at leisure.
   void announceBooks();
 
+  /// The user's languages (platform::Environment) are others than before: remote books are looked
+  /// for in those from now on, and the plug-in forgets what it knows of all books, which are
+  /// announced to it anew. A remote book that is not here in the new language stays in the former
+  /// until its index has come.
+  void userLanguagesDidChange();
+
   /// Has the book's index forgotten, and deleted where it was generated, a little later. On the
   /// main thread. The owner's handler hears when it is done.
   void removeIndexOfBook(const std::string& bookID);
@@ -63,6 +69,10 @@ class Host {
   /// Runs the main loop, on the main thread, until `condition` holds or `limit` has passed; returns
   /// whether it holds. The condition is tested on the main thread, often.
   static bool runMainLoopUntil(const std::function<bool()>& condition, platform::Seconds limit);
+
+  /// Ends the process at once, but for what must not be cut short (platform::ProcessInfo), which it
+  /// gives a few seconds. Nothing is destroyed: background work may be going on.
+  [[noreturn]] static void endProcess(int status);
 
  private:
   Host(std::shared_ptr<Bookshelf> bookshelf, std::shared_ptr<Owner> owner);

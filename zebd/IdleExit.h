@@ -25,8 +25,8 @@ class Owner;
 /// Thread-safety: confined to the thread of its run loop.
 class IdleExit {
  public:
-  /// `isInUse` tells of work that has no guard; whoever ends it notes activity. The owner and what the functions use must outlive
-  /// this.
+  /// `isInUse` tells of work that has no guard; whoever ends it notes activity. The owner and what
+  /// the functions use must outlive this.
   IdleExit(std::shared_ptr<platform::RunLoop> loop, const Owner& owner, platform::Seconds delay,
            std::function<bool()> isInUse, std::function<void()> leave);
   ~IdleExit();

@@ -2,6 +2,7 @@
 
 #include <utility>
 
+#include "host/Zebrine/RNXObjectManager.h"
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "host/Zebrine/ZEBLog.h"
 #include "host/Zebrine/ZEBQuery.h"
@@ -40,6 +41,8 @@ void Owner::setBookModifiedHandler(BookModified handler) {
 }
 
 void Owner::notifyBookshelfOfModificationsToBook(const std::shared_ptr<ZEBHelpBook>& book) {
+  // What has come may be the index in the language that the book was waiting for.
+  RNXObjectManager::sharedObjectManager()->takeLocalization(book);
   BookModified handler;
   {
     const platform::MutexLock lock(_handlerMutex);

@@ -272,15 +272,14 @@ const RNXCatalogueEntry* RNXCatalogue::bookWithIdentifier(
       available.push_back(entry.locale.value_or(""));
     }
   }
-  if (available.empty()) {
-    return nullptr;
-  }
-  const bool isThere =
-      std::find(available.begin(), available.end(), localization) != available.end();
-  const std::string best =
-      isThere ? std::string(localization) : ZEBBestLocalization(available, languages).value_or("");
+  const auto best = ZEBBestLocalization(available, languages, localization);
+  return best ? bookInLocalization(identifier, *best) : nullptr;
+}
+
+const RNXCatalogueEntry* RNXCatalogue::bookInLocalization(std::string_view identifier,
+                                                          std::string_view localization) const {
   const auto found = std::find_if(books.begin(), books.end(), [&](const RNXCatalogueEntry& entry) {
-    return entry.identifier == identifier && entry.locale.value_or("") == best;
+    return entry.identifier == identifier && entry.locale.value_or("") == localization;
   });
   return found == books.end() ? nullptr : &*found;
 }

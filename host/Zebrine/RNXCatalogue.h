@@ -57,9 +57,13 @@ struct RNXCatalogue {
   /// whatever order, give the same bytes.
   std::string text() const;
 
-  /// The book in the localization, if the catalogue has it in that, else in the one that suits a
-  /// reader of these languages best (ZEBBestLocalization). Null when there is no such book.
+  /// The book in the localization that suits a reader of these languages best, and where none does,
+  /// in this one (ZEBBestLocalization). Null when there is no such book.
   const RNXCatalogueEntry* bookWithIdentifier(std::string_view identifier,
                                               std::string_view localization,
                                               std::span<const std::string> languages) const;
+
+  /// The book in that very localization, empty for a book without languages; else null.
+  const RNXCatalogueEntry* bookInLocalization(std::string_view identifier,
+                                              std::string_view localization) const;
 };

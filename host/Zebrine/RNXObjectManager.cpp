@@ -12,6 +12,7 @@
 #include "host/Zebrine/ZEBGeneratedFiles.h"
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "platform/Environment.h"
+#include "platform/Files.h"
 #include "platform/URLCache.h"
 #include "platform/URLProtocol.h"
 #include "platform/URLSession.h"
@@ -68,14 +69,45 @@ void expectAssetsOfEntry(const RNXCatalogueEntry& entry) {
   expect(entry.exactMatch, Kind::exactMatch, ZEBExactMatchListExtension);
 }
 
-/// What the catalogue says becomes what the book is.
-std::shared_ptr<RNXBook> bookOfEntry(const RNXCatalogueEntry& entry, ZEBHelpBook& helpBook) {
-  expectAssetsOfEntry(entry);
+std::vector<std::string> languagesOfReader(const ZEBHelpBook& helpBook) {
+  std::vector<std::string> languages = helpBook.preferredLanguages();
+  return languages.empty() ? platform::Environment::current()->preferredLanguages : languages;
+}
+
+bool hasGeneratedFile(const ZEBHelpBook& helpBook, const std::string& localization,
+                      std::string_view extension) {
+  const std::optional<std::string> root = ZEBGeneratedRoot();
+  return root && platform::Environment::current()->files->fileExistsAtPath(
+                     ZEBGeneratedFilePath(*root, helpBook.bookID(), localization, extension));
+}
+
+/// The book's pages are where those of its index are: neither changes before the other.
+void takeLocalizationOfEntry(const RNXCatalogueEntry& entry, ZEBHelpBook& helpBook) {
+  const std::string localization = entry.locale.value_or("");
+  const std::string former = helpBook.localization();
+  if (localization != former) {
+    if (!hasGeneratedFile(helpBook, localization, ZEBHelpindexExtension) &&
+        hasGeneratedFile(helpBook, former, ZEBHelpindexExtension)) {
+      return;
+    }
+    helpBook.setLocalization(localization);
+    const std::string list =
+        ZEBGeneratedFilePath(ZEBGeneratedRoot().value_or("/"), helpBook.bookID(), localization,
+                             ZEBExactMatchListExtension);
+    helpBook.setExactMatchPath(hasGeneratedFile(helpBook, localization, ZEBExactMatchListExtension)
+                                   ? std::optional(list)
+                                   : std::nullopt);
+    helpBook.setRemoteURL(std::nullopt);
+  }
   if (entry.pages) {
     helpBook.setRemoteURL(entry.pages->absoluteURL());
   }
-  // Downloads go by the localization that the catalogue has, look-ups by the book's.
-  helpBook.setLocalization(entry.locale.value_or(""));
+}
+
+/// What the catalogue says becomes what the book is.
+std::shared_ptr<RNXBook> bookOfEntry(const RNXCatalogueEntry& entry, ZEBHelpBook& helpBook) {
+  expectAssetsOfEntry(entry);
+  takeLocalizationOfEntry(entry, helpBook);
   helpBook.setMiscAttributes(attributesOfEntry(entry));
   auto book =
       RNXBook::bookWithID(entry.identifier, entry.version, entry.locale, attributesOfEntry(entry));
@@ -144,9 +176,8 @@ void RNXObjectManager::_requestBookWithHelpBook(const std::shared_ptr<ZEBHelpBoo
       completionHandler(nullptr, error);
       return;
     }
-    const RNXCatalogueEntry* entry =
-        catalogue->bookWithIdentifier(helpBook->bookID(), helpBook->localization(),
-                                      platform::Environment::current()->preferredLanguages);
+    const RNXCatalogueEntry* entry = catalogue->bookWithIdentifier(
+        helpBook->bookID(), helpBook->localization(), languagesOfReader(*helpBook));
     if (entry == nullptr) {
       completionHandler(nullptr,
                         serviceError(RNXErrorNoSuchBook, "the catalogue " + url.absoluteString() +
@@ -157,6 +188,19 @@ void RNXObjectManager::_requestBookWithHelpBook(const std::shared_ptr<ZEBHelpBoo
   });
 }
 
+void RNXObjectManager::takeLocalization(const std::shared_ptr<ZEBHelpBook>& helpBook) {
+  const std::optional<platform::URL> url =
+      helpBook && helpBook->type() == ZEBHelpBookType4 ? helpBook->catalogueURL() : std::nullopt;
+  const auto catalogue = url ? knownCatalogue(*url) : nullptr;
+  const RNXCatalogueEntry* entry =
+      catalogue ? catalogue->bookWithIdentifier(helpBook->bookID(), helpBook->localization(),
+                                                languagesOfReader(*helpBook))
+                : nullptr;
+  if (entry != nullptr) {
+    takeLocalizationOfEntry(*entry, *helpBook);
+  }
+}
+
 void RNXObjectManager::loadCatalogue(const platform::URL& url, const CatalogueHandler& handler) {
   const platform::Clock::Instant now = platform::Environment::current()->clock->elapsed();
   std::shared_ptr<const RNXCatalogue> fresh;
@@ -164,7 +208,7 @@ void RNXObjectManager::loadCatalogue(const platform::URL& url, const CatalogueHa
   {
     const platform::MutexLock lock(_mutex);
     Entry& entry = _entries[url.absoluteString()];
-    if (entry.catalogue && !entry.isLoading && now - entry.loaded < freshness) {
+    if (entry.catalogue && !entry.isLoading && entry.loaded && now - *entry.loaded < freshness) {
       fresh = entry.catalogue;
     } else {
       entry.waiting.push_back(handler);
@@ -257,5 +301,15 @@ std::shared_ptr<const RNXCatalogue> RNXObjectManager::knownCatalogue(const platf
     return nullptr;
   }
   auto read = RNXCatalogue::catalogueWithData(cached->data(), url);
-  return read ? std::make_shared<const RNXCatalogue>(std::move(*read)) : nullptr;
+  if (!read) {
+    return nullptr;
+  }
+  auto catalogue = std::make_shared<const RNXCatalogue>(std::move(*read));
+  const platform::MutexLock lock(_mutex);
+  Entry& entry = _entries[url.absoluteString()];
+  if (!entry.catalogue) {
+    // For all other books in it; its server is asked all the same.
+    entry.catalogue = std::move(catalogue);
+  }
+  return entry.catalogue;
 }

@@ -50,15 +50,25 @@ class RNXObjectManager : public std::enable_shared_from_this<RNXObjectManager> {
   RNXObjectManager(const RNXObjectManager&) = delete;
   RNXObjectManager& operator=(const RNXObjectManager&) = delete;
 
-  /// Asks the book's catalogue for the book. The completion gets a book or an error, once, on some
-  /// thread, possibly before this returns. A book that was found has learnt where its pages are and
-  /// which localization there is, and nothing but the files that the catalogue names is taken from
-  /// their URLs from then on.
+  /// Asks the book's catalogue for the book, in the language that suits its reader best. The
+  /// completion gets a book or an error, once, on some thread, possibly before this returns.
+  ///
+  /// A book that was found has learnt where its pages are and which localization it is in; but one
+  /// whose index is here in another localization only stays in that until the new index has come
+  /// (takeLocalization()). Nothing but the files that the catalogue names is taken from their URLs
+  /// from then on.
   virtual void _requestBookWithHelpBook(const std::shared_ptr<ZEBHelpBook>& helpBook,
                                         CompletionHandler completionHandler);
 
   /// The catalogue at a URL: as it was asked for less than a minute ago, else from the server.
   void loadCatalogue(const platform::URL& url, const CatalogueHandler& handler);
+
+  /// Has a type-4 book be in the language that suits its reader best of those that its catalogue is
+  /// known to have, unless the book's index is on this machine in its present language only. With
+  /// the language go the address of its pages and its exact-match list. Asks no server; for hosts,
+  /// before the plug-in sees the book and whenever its files have changed. Other books stay as they
+  /// are, and so does a book of which no catalogue is known.
+  void takeLocalization(const std::shared_ptr<ZEBHelpBook>& helpBook);
 
   /// What is known of the catalogue without asking anybody: from this process or, in the URL cache,
   /// from an earlier one. Null when that is nothing.
@@ -70,7 +80,8 @@ class RNXObjectManager : public std::enable_shared_from_this<RNXObjectManager> {
  private:
   struct Entry {
     std::shared_ptr<const RNXCatalogue> catalogue;
-    platform::Clock::Instant loaded{0};
+    /// When its server gave it; absent for one that an earlier process was given.
+    std::optional<platform::Clock::Instant> loaded;
     bool isLoading = false;
     std::vector<CatalogueHandler> waiting;
   };

@@ -22,12 +22,10 @@ std::optional<RNXCatalogueEntry> entryOfBook(const ZEBHelpBook& book) {
   const auto service = RNXObjectManager::sharedObjectManager();
   const std::shared_ptr<const RNXCatalogue> catalogue = service->knownCatalogue(*url);
   service->loadCatalogue(*url, nullptr);
-  const std::string localization = book.localization();
-  const RNXCatalogueEntry* entry =
-      catalogue ? catalogue->bookWithIdentifier(book.bookID(), localization, {}) : nullptr;
   // Another language is no newer version of this one.
-  return entry != nullptr && entry->locale.value_or("") == localization ? std::optional(*entry)
-                                                                        : std::nullopt;
+  const RNXCatalogueEntry* entry =
+      catalogue ? catalogue->bookInLocalization(book.bookID(), book.localization()) : nullptr;
+  return entry == nullptr ? std::nullopt : std::optional(*entry);
 }
 
 /// The index that is in use: the one that was generated or fetched, else the one that the book has.

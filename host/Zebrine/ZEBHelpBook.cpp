@@ -16,6 +16,7 @@ struct ZEBHelpBook::Properties {
   std::optional<std::string> suggestionsPath;
   std::optional<platform::URL> remoteURL;
   std::optional<platform::URL> catalogueURL;
+  std::vector<std::string> preferredLanguages;
   bool usesExternalViewer = false;
   std::optional<std::string> appBundleID;
   std::optional<std::string> appBundleVersion;
@@ -131,6 +132,13 @@ std::optional<platform::URL> ZEBHelpBook::catalogueURL() const {
 }
 void ZEBHelpBook::setCatalogueURL(std::optional<platform::URL> catalogueURL) {
   _set(&Properties::catalogueURL, std::move(catalogueURL));
+}
+
+std::vector<std::string> ZEBHelpBook::preferredLanguages() const {
+  return _get(&Properties::preferredLanguages);
+}
+void ZEBHelpBook::setPreferredLanguages(std::vector<std::string> languages) {
+  _set(&Properties::preferredLanguages, std::move(languages));
 }
 
 std::optional<platform::URL> ZEBHelpBook::remoteURL() const { return _get(&Properties::remoteURL); }

@@ -101,6 +101,11 @@ class ZEBHelpBook {
   std::optional<platform::URL> catalogueURL() const;
   void setCatalogueURL(std::optional<platform::URL> catalogueURL);
 
+  /// In which languages the reader wants the remote book, the favourite first; empty for those of
+  /// platform::Environment::preferredLanguages.
+  std::vector<std::string> preferredLanguages() const;
+  void setPreferredLanguages(std::vector<std::string> languages);
+
   /// Whether another program shows the book's pages, from remoteURL.
   bool usesExternalViewer() const;
   void setUsesExternalViewer(bool usesExternalViewer);

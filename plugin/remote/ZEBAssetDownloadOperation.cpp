@@ -7,6 +7,7 @@
 #include "host/Zebrine/RNXConfig.h"
 #include "host/Zebrine/ZEBAuthChallengeHandler.h"
 #include "host/Zebrine/ZEBLog.h"
+#include "platform/AbandonedFiles.h"
 #include "platform/Environment.h"
 #include "platform/Files.h"
 #include "platform/URLError.h"
@@ -123,7 +124,9 @@ void ZEBAssetDownloadOperation::_keep(const platform::Data& data) {
   _isUpdated = !former || data != *former;
   const std::string path = destinationFilePath().value_or(std::string());
   const auto files = platform::Environment::current()->files;
-  (void)files->createDirectoryWithParents(platform::stringByDeletingLastPathComponent(path));
+  const std::string folder = platform::stringByDeletingLastPathComponent(path);
+  (void)files->createDirectoryWithParents(folder);
+  platform::removeAbandonedFiles(folder);
   if (files->writeAtomically(path, data)) {
     ZEBLog(1, "Couldn't write updated asset data to %@", path);
   }

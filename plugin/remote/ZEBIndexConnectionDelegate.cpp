@@ -5,6 +5,7 @@
 
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "host/Zebrine/ZEBLog.h"
+#include "platform/AbandonedFiles.h"
 #include "platform/Environment.h"
 #include "platform/Files.h"
 #include "platform/ProcessInfo.h"
@@ -184,11 +185,15 @@ void ZEBIndexConnectionDelegate::_keep(const platform::Data& data) {
   _index->setLoadedFromGeneratedCache(true);
   const std::string path = _generatedIndexPath().value_or(std::string());
   const auto files = platform::Environment::current()->files;
-  (void)files->createDirectoryWithParents(platform::stringByDeletingLastPathComponent(path));
+  const std::string folder = platform::stringByDeletingLastPathComponent(path);
+  (void)files->createDirectoryWithParents(folder);
+  platform::removeAbandonedFiles(folder);
   if (files->writeAtomically(path, data)) {
     ZEBLog(1, "Couldn't write updated index data to %@", path);
-  } else {
-    (void)_index->setPath(path);
+  } else if (_index->path() != path && _index->setPath(path)) {
+    // What is remembered of a record over a restart is its file, and the queue of fetches, which
+    // has it remembered, has drained by now.
+    _indexshelf->archiveKnownIndices();
   }
 }
 

@@ -212,7 +212,13 @@ void ZEBIndexshelf::_searchIndexDownloadDidFinish(const ZEBAssetDownloadOperatio
   record->setLoadedFromGeneratedCache(true);
   if (existingIndex && download.isUpdated()) {
     const auto data = platform::Environment::current()->files->contentsMappedAtPath(*path);
-    (void)existingIndex->reinitializeWithData(data.value_or(platform::Data()));
+    const bool isRefilled = existingIndex->reinitializeWithData(data.value_or(platform::Data()));
+    if (isRefilled && existingIndex->path() != path) {
+      // The book is in another language now. What is remembered of a record over a restart is its
+      // file, and that of before may have been written down meanwhile.
+      (void)existingIndex->setPath(*path);
+      archiveKnownIndices();
+    }
     _notifyObserversOfChange(ZEBIndexChangeUpdated, record);
   } else {
     _addIndex(record, book->bookID());

@@ -4,6 +4,7 @@
 
 #include "host/Zebrine/ZEBCheckClass.h"
 #include "host/Zebrine/ZEBLog.h"
+#include "platform/AbandonedFiles.h"
 #include "platform/Environment.h"
 #include "platform/Files.h"
 #include "platform/KeyedArchive.h"
@@ -86,10 +87,11 @@ void ZEBIndexshelf::archiveKnownIndices() {
     coder.encodeObject(platform::Value(cacheVersion), cacheVersionKey);
     const platform::Data bytes = coder.finishEncoding();
     const auto files = platform::Environment::current()->files;
+    const std::string folder = platform::stringByDeletingLastPathComponent(*_cachePath);
     if (!files->fileExistsAtPath(*_cachePath)) {
-      (void)files->createDirectoryWithParents(
-          platform::stringByDeletingLastPathComponent(*_cachePath));
+      (void)files->createDirectoryWithParents(folder);
     }
+    platform::removeAbandonedFiles(folder);
     if (const auto error = files->writeAtomically(*_cachePath, bytes)) {
       ZEBLog(1, "Failed to save indexindex to: %@ (error: %@)", *_cachePath, *error);
     }

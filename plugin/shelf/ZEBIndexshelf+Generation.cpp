@@ -5,6 +5,7 @@
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "host/Zebrine/ZEBLog.h"
+#include "platform/AbandonedFiles.h"
 #include "platform/Environment.h"
 #include "platform/Files.h"
 #include "platform/Processes.h"
@@ -75,6 +76,7 @@ std::shared_ptr<ZEBIndex> ZEBIndexshelf::_generateIndexForBook(
     ZEBLog(1, "Error creating directory at path <%@>: %@", folder, *error);
     return nullptr;
   }
+  platform::removeAbandonedFiles(folder);
   ZEBLog(3, "Writing generated index out to path: %@", *atPath);
   const std::vector<std::string> arguments = toolArguments(*book, *atPath, onlyGenerateLUXIndex);
   if (statusOfOtherRuns(*atPath) > 0) {

@@ -8,8 +8,7 @@
 #include "host/Zebrine/ZEBAuthChallengeHandler.h"
 #include "platform/ClassicArchive.h"
 #include "platform/PropertyList.h"
-#include "platform/URLError.h"
-#include "tests/host/RemoteHostWorld.h"
+#include "tests/host/AssetLoading.h"
 #include "tests/support/ScriptedServer.h"
 
 using testing::IsEmpty;
@@ -44,32 +43,13 @@ std::string listBytes() {
 
 class RNXAssetURLProtocolTest : public testing::Test {
  protected:
-  struct Result {
-    std::optional<platform::Data> data;
-    std::shared_ptr<const platform::URLResponse> response;
-    std::optional<platform::Error> error;
-  };
-
   RNXAssetURLProtocolTest() {
     RNXAssetURLProtocol::registerProtocolWithAuthHandler(
         ZEBAuthChallengeHandler::initWithServiceName("org.zeb.help"));
   }
 
-  static Result load(const std::string& url, bool marked = true) {
-    auto request = *platform::URLRequest::requestWithURL(urlOf(url));
-    if (marked) {
-      platform::URLProtocol::setProperty(true, RNXAssetURLProtocolRequest, request);
-    }
-    Result result;
-    tests::Latch done;
-    const auto task = platform::URLSession::sharedSession()->dataTaskWithRequest(
-        request, [&](auto data, auto response, auto error) {
-          result = {std::move(data), std::move(response), std::move(error)};
-          done.open();
-        });
-    task->resume();
-    EXPECT_TRUE(done.wait());
-    return result;
+  static tests::LoadedAsset load(const std::string& url, bool marked = true) {
+    return tests::loadAsset(url, marked);
   }
 
   static void expect(const std::string& url, const std::string& bytes,
@@ -79,7 +59,7 @@ class RNXAssetURLProtocolTest : public testing::Test {
                                        {kind, platform::sha256Digest(bytes), std::move(localPath)});
   }
 
-  static void expectFailure(const Result& result, platform::URLErrorCode code) {
+  static void expectFailure(const tests::LoadedAsset& result, platform::URLErrorCode code) {
     EXPECT_EQ(result.data, std::nullopt);
     ASSERT_TRUE(result.error);
     EXPECT_TRUE(platform::isURLError(*result.error, code)) << result.error->description;
@@ -92,7 +72,7 @@ class RNXAssetURLProtocolTest : public testing::Test {
 TEST_F(RNXAssetURLProtocolTest, passesOnTheFileThatTheCatalogueNames) {
   const auto server = ScriptedServer::sending(httpAnswer(200, index));
   expect(server->URL("/i"), index);
-  const Result result = load(server->URL("/i"));
+  const tests::LoadedAsset result = load(server->URL("/i"));
   EXPECT_EQ(result.error, std::nullopt);
   ASSERT_TRUE(result.data);
   EXPECT_EQ(result.data->view(), index);
@@ -113,7 +93,7 @@ TEST_F(RNXAssetURLProtocolTest, passesNothingOnOfATruncatedFile) {
         "HTTP/1.1 200 OK\r\nConnection: close\r\n\r\n" + index.substr(0, 100)}) {
     const auto server = ScriptedServer::sending(answer);
     expect(server->URL("/i"), index);
-    const Result result = load(server->URL("/i"));
+    const tests::LoadedAsset result = load(server->URL("/i"));
     EXPECT_EQ(result.data, std::nullopt);
     EXPECT_TRUE(result.error);
   }
@@ -161,7 +141,7 @@ TEST_F(RNXAssetURLProtocolTest, passesOnAnswersOfOtherStatusesAsTheyAre) {
   for (const int status : {304, 404, 500}) {
     const auto server = ScriptedServer::sending(httpAnswer(status, status == 304 ? "" : "page"));
     expect(server->URL("/i"), index);
-    const Result result = load(server->URL("/i"));
+    const tests::LoadedAsset result = load(server->URL("/i"));
     EXPECT_EQ(result.error, std::nullopt);
     ASSERT_NE(result.response, nullptr);
     EXPECT_EQ(result.response->statusCode(), status);
@@ -173,7 +153,7 @@ TEST_F(RNXAssetURLProtocolTest, aFileThatIsHereAlreadyIsNotAskedFor) {
   const auto server = ScriptedServer::sending(httpAnswer(500, ""));
   const std::string path = world.folder.write("kept", index);
   expect(server->URL("/i"), index, Kind::searchIndex, path);
-  const Result result = load(server->URL("/i"));
+  const tests::LoadedAsset result = load(server->URL("/i"));
   EXPECT_EQ(result.response->statusCode(), 200);
   EXPECT_EQ(result.data->view(), index);
   EXPECT_THAT(server->requests(), IsEmpty());
@@ -197,7 +177,7 @@ TEST_F(RNXAssetURLProtocolTest, whatTheCacheHasRevalidatedComesAsTheCachedAnswer
       });
   expect(server->URL("/i"), index);
   for (int i = 0; i < 3; ++i) {
-    const Result result = load(server->URL("/i"));
+    const tests::LoadedAsset result = load(server->URL("/i"));
     ASSERT_TRUE(result.data);
     EXPECT_EQ(result.response->statusCode(), 200);
     EXPECT_EQ(result.data->view(), index);

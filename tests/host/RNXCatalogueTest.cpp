@@ -213,7 +213,7 @@ TEST_F(RNXCatalogueTest, whatIsWrittenIsReadAgainWhateverTheOrder) {
   EXPECT_EQ(again->books[2].title, "B \" \\ ü");
 }
 
-TEST_F(RNXCatalogueTest, aBookIsFoundInItsLocalizationElseInTheBestLanguage) {
+TEST_F(RNXCatalogueTest, aBookIsFoundInTheBestLanguageElseInItsLocalization) {
   RNXCatalogue catalogue;
   for (const char* locale : {"de", "en", "pt_BR"}) {
     RNXCatalogueEntry entry;
@@ -222,10 +222,26 @@ TEST_F(RNXCatalogueTest, aBookIsFoundInItsLocalizationElseInTheBestLanguage) {
     catalogue.books.push_back(entry);
   }
   const std::vector<std::string> languages = {"pt", "de"};
-  EXPECT_EQ(catalogue.bookWithIdentifier("a", "en", languages)->locale, "en");
   EXPECT_EQ(catalogue.bookWithIdentifier("a", "", languages)->locale, "pt_BR");
+  EXPECT_EQ(catalogue.bookWithIdentifier("a", "en", languages)->locale, "pt_BR");
+  const std::vector<std::string> others = {"sv", "fi"};
+  EXPECT_EQ(catalogue.bookWithIdentifier("a", "de", others)->locale, "de");
+  EXPECT_EQ(catalogue.bookWithIdentifier("a", "", others)->locale, "en");
   EXPECT_EQ(catalogue.bookWithIdentifier("a", "xx", {})->locale, "en");
   EXPECT_EQ(catalogue.bookWithIdentifier("b", "en", languages), nullptr);
+}
+
+TEST_F(RNXCatalogueTest, aBookIsFoundInOneVeryLocalization) {
+  const auto catalogue = read(R"({"format": 1, "books": [
+      {"identifier": "a", "version": "1", "locale": "pt_BR"},
+      {"identifier": "b", "version": "2"}]})");
+  ASSERT_TRUE(catalogue) << error.description;
+  EXPECT_EQ(catalogue->bookInLocalization("a", "pt_BR")->version, "1");
+  EXPECT_EQ(catalogue->bookInLocalization("b", "")->version, "2");
+  for (const auto& [identifier, localization] :
+       {std::pair{"a", ""}, std::pair{"a", "pt"}, std::pair{"b", "en"}, std::pair{"c", ""}}) {
+    EXPECT_EQ(catalogue->bookInLocalization(identifier, localization), nullptr);
+  }
 }
 
 TEST_F(RNXCatalogueTest, aBookWithoutLanguagesIsFoundInAny) {

@@ -10,7 +10,9 @@
 #include "host/Zebrine/RNXExpectedAssets.h"
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBHelpBook.h"
+#include "platform/URLError.h"
 #include "tests/host/RemoteHostWorld.h"
+#include "tests/support/DigestGate.h"
 #include "tests/support/NginxServer.h"
 #include "tests/support/ScriptedServer.h"
 
@@ -29,6 +31,17 @@ std::string catalogue(const std::string& locale = "en", const std::string& versi
          R"(", "locale": ")" + locale + R"(", "title": "One", "pages": "one/pages/",
           "searchIndex": {"url": "one/i", "sha256": ")" +
          digest + R"("}, "exactMatch": {"url": "one/e", "sha256": ")" + digest + R"("}}]})";
+}
+
+/// The book in several languages.
+std::string catalogueIn(const std::vector<std::string>& locales) {
+  std::string entries;
+  for (const std::string& locale : locales) {
+    entries += (entries.empty() ? "" : ", ") +
+               std::string(R"({"identifier": "org.one", "version": "1", "locale": ")") + locale +
+               R"(", "pages": ")" + locale + R"(/pages/"})";
+  }
+  return R"({"format": 1, "books": [)" + entries + "]}";
 }
 
 class RNXObjectManagerTest : public testing::Test {
@@ -219,7 +232,135 @@ TEST_F(RNXObjectManagerTest, sendsTheUsersCredentialsForTheCatalogue) {
   EXPECT_EQ(server.requests().at(0).header("Authorization"), "Bearer secret");
 }
 
-TEST_F(RNXObjectManagerTest, takesTheLocalizationOfTheBookElseWhatTheCatalogueHas) {
+TEST_F(RNXObjectManagerTest, readsACatalogueBehindADigestPassword) {
+  const tests::DigestGate gate("SHA-256", "reader", "secret");
+  const ScriptedServer server(gate.before(tests::answering(httpAnswer(200, catalogue()))));
+  EXPECT_THAT(request(book(server.URL("/catalogue.json"))).error->description, HasSubstr("401"));
+  world.setCredential({{"Host", "127.0.0.1"},
+                       {"Port", server.port()},
+                       {"Scheme", "digest"},
+                       {"User", "reader"},
+                       {"Password", "secret"}});
+  EXPECT_NE(request(book(server.URL("/catalogue.json"))).book, nullptr);
+}
+
+TEST_F(RNXObjectManagerTest, readsACatalogueThatHasMovedElsewhereWithoutCredentials) {
+  ScriptedServer other([](const auto&, tests::ScriptedConnection& connection) {
+    connection.send(httpAnswer(200, catalogue()));
+  });
+  const auto server =
+      ScriptedServer::sending(httpAnswer(302, "", {"Location: " + other.URL("/moved.json")}));
+  world.setCredential(
+      {{"Host", "127.0.0.1"}, {"Port", server->port()}, {"Scheme", "bearer"}, {"Token", "secret"}});
+  const Answer answer = request(book(server->URL("/catalogue.json")));
+  ASSERT_NE(answer.book, nullptr);
+  // What it names is still relative to where it was asked for.
+  EXPECT_EQ(answer.book->remoteSearchIndex()->absoluteString(), server->URL("/one/i"));
+  EXPECT_EQ(other.requests().at(0).header("Authorization"), std::nullopt);
+}
+
+TEST_F(RNXObjectManagerTest, readsCataloguesOfServersWithARightCertificateAlone) {
+  const auto& authority = tests::TestAuthority::shared();
+  world.trustedAuthority = authority.certificateFile();
+  world.setDefaults({});
+  const tests::NginxServer right({}, authority.serverIdentity());
+  right.write("catalogue.json", catalogue());
+  EXPECT_NE(request(book(right.URL("/catalogue.json"))).book, nullptr);
+  const tests::NginxServer wrong({}, authority.foreignIdentity());
+  wrong.write("catalogue.json", catalogue());
+  const Answer answer = request(book(wrong.URL("/catalogue.json")));
+  EXPECT_EQ(answer.book, nullptr);
+  ASSERT_TRUE(answer.error);
+  EXPECT_TRUE(platform::isURLError(*answer.error, platform::URLErrorServerCertificateUntrusted));
+  EXPECT_TRUE(wrong.accessLog().empty());
+}
+
+TEST_F(RNXObjectManagerTest, aBookTurnsToTheLanguageOfItsReader) {
+  const auto server = ScriptedServer::sending(httpAnswer(200, catalogueIn({"de", "fr"})));
+  const auto helpBook = book(server->URL("/catalogue.json"));
+  helpBook->setLocalization("de");
+  helpBook->setExactMatchPath("/de.exactmatch.plist");
+  world.speak({"fr"});
+  EXPECT_EQ(request(helpBook).book->locale(), "fr");
+  EXPECT_EQ(helpBook->localization(), "fr");
+  EXPECT_EQ(helpBook->remoteURL()->absoluteString(), server->URL("/fr/pages/"));
+  EXPECT_EQ(helpBook->exactMatchPath(), std::nullopt);
+  // Nor is it asked for in another language than it is in where that is all the same.
+  world.speak({"sv"});
+  EXPECT_EQ(request(helpBook).book->locale(), "fr");
+}
+
+TEST_F(RNXObjectManagerTest, theBooksOwnLanguagesComeBeforeTheUsers) {
+  const auto server = ScriptedServer::sending(httpAnswer(200, catalogueIn({"de", "fr"})));
+  const auto helpBook = book(server->URL("/catalogue.json"));
+  world.speak({"fr"});
+  helpBook->setPreferredLanguages({"sv", "de"});
+  EXPECT_EQ(request(helpBook).book->locale(), "de");
+}
+
+TEST_F(RNXObjectManagerTest, aBookThatIsHereInOneLanguageStaysInItUntilTheOtherHasCome) {
+  const auto server = ScriptedServer::sending(httpAnswer(200, catalogueIn({"de", "fr"})));
+  const std::string kept = "caches/org.zeb.zebd/GeneratedIndexes/org.one/";
+  world.folder.write(kept + "de.helpindex", "index");
+  const auto helpBook = book(server->URL("/catalogue.json"));
+  helpBook->setLocalization("de");
+  helpBook->setRemoteURL(urlOf("https://a.example/de/"));
+  world.speak({"fr"});
+  EXPECT_EQ(request(helpBook).book->locale(), "fr");
+  EXPECT_EQ(helpBook->localization(), "de");
+  EXPECT_EQ(helpBook->remoteURL()->absoluteString(), "https://a.example/de/");
+  world.folder.write(kept + "fr.exactmatch.plist", "list");
+  manager->takeLocalization(helpBook);
+  EXPECT_EQ(helpBook->localization(), "de");
+  world.folder.write(kept + "fr.helpindex", "index");
+  manager->takeLocalization(helpBook);
+  EXPECT_EQ(helpBook->localization(), "fr");
+  EXPECT_EQ(helpBook->remoteURL()->absoluteString(), server->URL("/fr/pages/"));
+  EXPECT_EQ(helpBook->exactMatchPath(), world.folder.path(kept + "fr.exactmatch.plist"));
+}
+
+TEST_F(RNXObjectManagerTest, takingALocalizationAsksNobody) {
+  const auto server = ScriptedServer::sending(httpAnswer(200, catalogueIn({"de", "fr"})));
+  const auto helpBook = book(server->URL("/catalogue.json"));
+  helpBook->setLocalization("de");
+  world.speak({"fr"});
+  manager->takeLocalization(helpBook);
+  EXPECT_EQ(helpBook->localization(), "de");
+  EXPECT_EQ(server->requests().size(), 0U);
+  request(book(server->URL("/catalogue.json")));
+  manager->takeLocalization(helpBook);
+  EXPECT_EQ(helpBook->localization(), "fr");
+  EXPECT_EQ(server->requests().size(), 1U);
+}
+
+TEST_F(RNXObjectManagerTest, onlyBooksOfServersTakeALocalization) {
+  const auto server = ScriptedServer::sending(httpAnswer(200, catalogueIn({"de", "fr"})));
+  request(book(server->URL("/catalogue.json")));
+  const auto installed = ZEBHelpBook::bookWithID("org.one", ZEBHelpBookType3, "/books/one");
+  installed->setCatalogueURL(urlOf(server->URL("/catalogue.json")));
+  installed->setLocalization("en");
+  manager->takeLocalization(installed);
+  EXPECT_EQ(installed->localization(), "en");
+  manager->takeLocalization(nullptr);
+  const auto withdrawn = book(server->URL("/catalogue.json"), "org.withdrawn");
+  withdrawn->setLocalization("en");
+  manager->takeLocalization(withdrawn);
+  EXPECT_EQ(withdrawn->localization(), "en");
+}
+
+TEST_F(RNXObjectManagerTest, whatAnEarlierProcessKnewIsReadOnceAndItsServerAskedAllTheSame) {
+  const auto server = ScriptedServer::sending(httpAnswer(200, catalogue(), {"ETag: \"a\""}));
+  const auto url = urlOf(server->URL("/catalogue.json"));
+  request(book(server->URL("/catalogue.json")));
+  const auto next = RNXObjectManager::init();
+  EXPECT_EQ(next->knownCatalogue(url), next->knownCatalogue(url));
+  tests::Latch done;
+  next->loadCatalogue(url, [&](const auto&, const auto&) { done.open(); });
+  EXPECT_TRUE(done.wait());
+  EXPECT_THAT(server->requests(), SizeIs(2));
+}
+
+TEST_F(RNXObjectManagerTest, takesWhatTheCatalogueHasWhereItHasNoneOfTheLanguages) {
   const auto server = ScriptedServer::sending(httpAnswer(200, catalogue("de")));
   const auto helpBook = book(server->URL("/catalogue.json"));
   helpBook->setLocalization("fr");

@@ -5,6 +5,7 @@
 #include <optional>
 #include <string>
 #include <utility>
+#include <vector>
 
 #include "host/Zebrine/RNXObjectManager.h"
 #include "platform/Digest.h"
@@ -28,10 +29,16 @@ class RemoteHostWorld {
     environment.clock = clock;
     environment.log = std::make_shared<platform::CapturingLogSink>();
     environment.cachesDirectory = folder.path("caches");
-    environment.preferredLanguages = {"en"};
+    environment.preferredLanguages = languages;
     environment.userDefaults = platform::userDefaultsFromDictionary(std::move(settings));
+    environment.certificateAuthorityFile = trustedAuthority;
     _override.reset();
     _override.emplace(std::move(environment));
+  }
+  /// The user prefers these languages from now on.
+  void speak(std::vector<std::string> preferred) {
+    languages = std::move(preferred);
+    setDefaults({});
   }
   /// Settings with one credential for the standard service.
   void setCredential(platform::Value::Dictionary entry) {
@@ -39,6 +46,11 @@ class RemoteHostWorld {
         {{"RemoteServices", platform::Value::Dictionary{
                                 {"org.zeb.help", platform::Value::Array{std::move(entry)}}}}});
   }
+
+  // In force from the next change of settings on.
+  std::vector<std::string> languages = {"en"};
+  /// The system's where there is none.
+  std::optional<std::string> trustedAuthority;
 
   TemporaryFolder folder;
   const std::shared_ptr<platform::SimulatedClock> clock =

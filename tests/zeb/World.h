@@ -26,7 +26,7 @@ inline std::string shippedBook(const std::string& name) {
 }
 
 /// The parts of this build.
-inline zeb::Installation installation() { return {ZEB_PLUGIN_BUNDLE, ZEB_TOOL}; }
+inline zebd::Installation installation() { return {ZEB_PLUGIN_BUNDLE, ZEB_TOOL}; }
 
 class World {
  public:

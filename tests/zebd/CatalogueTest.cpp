@@ -55,6 +55,7 @@ TEST_F(CatalogueTest, KeepsWhereAServerHasABook) {
   CatalogueEntry remote = entry("a");
   remote.type = 4;
   remote.catalogueURL = "https://help.example.org/catalogue.json";
+  remote.languages = {"pt-BR", "de"};
   remote.pagesURL = "https://help.example.org/pages/";
   ASSERT_EQ(catalogue.store(remote), std::nullopt);
   EXPECT_EQ(catalogue.entry("a"), remote);

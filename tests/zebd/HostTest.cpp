@@ -13,25 +13,20 @@
 #include "host/Zebrine/ZEBPlugin.h"
 #include "host/Zebrine/ZEBQuery.h"
 #include "host/Zebrine/ZEBResult.h"
-#include "platform/DistributedNotificationCenter.h"
 #include "platform/Environment.h"
 #include "platform/Exception.h"
-#include "platform/Processes.h"
 #include "platform/RunLoop.h"
 #include "platform/UserDefaults.h"
 #include "platform/WorkerThreads.h"
-#include "tests/platform/QuickClock.h"
-#include "tests/platform/TemporaryFolder.h"
+#include "tests/zebd/HostWorld.h"
 
 namespace {
 
 using platform::Seconds;
 using testing::ElementsAre;
 using testing::IsEmpty;
+using tests::ample;
 using zebd::Host;
-
-/// Time enough for anything that ends at all.
-constexpr Seconds ample{600};
 
 /// Keeps what a search delivers.
 class Receiver : public zebd::SearchReceiver {
@@ -77,9 +72,9 @@ class Receiver : public zebd::SearchReceiver {
 };
 
 /// A host over two small books, which the real plug-in has indexed by the real tool.
-class HostTest : public testing::Test {
+class HostTest : public testing::Test, protected tests::HostWorld {
  protected:
-  HostTest() : _environment(_made()) {
+  HostTest() {
     writePage("garden/roses.html", "Roses", "Cut roses in spring.");
     writePage("kitchen/boiling.html", "Boiling", "Put water into a pot.");
     host = startHost();
@@ -94,25 +89,12 @@ class HostTest : public testing::Test {
     }
   }
 
-  std::unique_ptr<Host> startHost() const {
-    platform::Error error;
-    std::unique_ptr<Host> started =
-        Host::start(ZEB_PLUGIN_BUNDLE, {true, false, folder.path("caches/help")}, error);
-    EXPECT_NE(started, nullptr) << error.description;
-    return started;
-  }
-  void writePage(const std::string& name, const std::string& title, const std::string& body) const {
-    folder.write(name, "<html><head><title>" + title + "</title></head><body><h1 id=\"" + title +
-                           "\">" + title + "</h1><p>" + body + "</p></body></html>");
-  }
   void addBook(Host& onHost, const std::string& name) const {
     const auto book = ZEBHelpBook::bookWithID(name, ZEBHelpBookType1, folder.path(name));
     book->setAccessPagePath(folder.path(name) + "/index.html");
     onHost.bookshelf().addBook(book);
   }
-  static bool waitUntilQuiet(Host& aHost) {
-    return Host::runMainLoopUntil([&] { return aHost.owner().isQuietFor(Seconds(0.5)); }, ample);
-  }
+  static bool waitUntilQuiet(Host& aHost) { return HostWorld::waitUntilQuiet(aHost.owner()); }
   static std::vector<std::string> search(Host& onHost, const std::string& words) {
     const auto query = ZEBQuery::initWithQueryString(words);
     query->setResultTypes({ZEBHelpArticleResult});
@@ -130,33 +112,8 @@ class HostTest : public testing::Test {
     EXPECT_THAT(receiver->titles(), IsEmpty());
     EXPECT_TRUE(waitUntilQuiet(onHost));
   }
-  bool hasIndex(const std::string& name) const {
-    return std::filesystem::exists(folder.path("caches/org.zeb.zebd/GeneratedIndexes/") + name +
-                                   "/" + name + ".helpindex");
-  }
+  bool hasIndex(const std::string& name) const { return HostWorld::hasIndex(name, name); }
 
-  tests::TemporaryFolder folder;
-
- private:
-  platform::Environment _made() const {
-    platform::Environment environment = platform::Environment::system();
-    environment.clock = std::make_shared<tests::QuickClock>(20);
-    environment.log = log;
-    environment.processLauncher =
-        platform::substitutingProcessLauncher("/usr/bin/bvmake", ZEB_TOOL);
-    environment.notificationCenter = platform::localNotificationCenter();
-    environment.standardOutput = [](const std::string&) {};
-    environment.cachesDirectory = folder.path("caches");
-    return environment;
-  }
-
- protected:
-  std::shared_ptr<platform::CapturingLogSink> log = std::make_shared<platform::CapturingLogSink>();
-
- private:
-  platform::EnvironmentOverride _environment;
-
- protected:
   std::unique_ptr<Host> host;
 };
 

@@ -127,6 +127,19 @@ TEST_F(HTTPCachingTest, StoresWholeAnswersToPlainRequests) {
   EXPECT_FALSE(httpcaching::mayStore(head, *response({})));
 }
 
+TEST_F(HTTPCachingTest, StoresNoAnswerThatDependsOnCredentialsThatWereShown) {
+  const URLRequest plain = requestOf("http://books.example/");
+  const auto varying = response({{"Vary", "Accept-Encoding, authorization"}});
+  URLRequest withCredential = plain;
+  withCredential.setCredential(URLCredential{URLCredential::Scheme::basic, "reader", "secret"});
+  URLRequest withField = plain;
+  withField.setValueForHTTPHeaderField("Bearer token", "Authorization");
+  EXPECT_TRUE(httpcaching::mayStore(plain, *varying));
+  EXPECT_FALSE(httpcaching::mayStore(withCredential, *varying));
+  EXPECT_FALSE(httpcaching::mayStore(withField, *varying));
+  EXPECT_TRUE(httpcaching::mayStore(withCredential, *response({{"Vary", "Accept-Encoding"}})));
+}
+
 TEST_F(HTTPCachingTest, AsksByWhatTheAnswerHas) {
   URLRequest request = requestOf("http://books.example/");
   EXPECT_FALSE(httpcaching::makeConditional(request, *response({})));

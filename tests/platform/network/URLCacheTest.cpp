@@ -2,7 +2,10 @@
 
 #include <gmock/gmock.h>
 
+#include <unistd.h>
+
 #include <filesystem>
+#include <fstream>
 #include <thread>
 
 #include "platform/URLCacheRecord.h"
@@ -322,6 +325,19 @@ TEST_F(URLCacheTest, ClearsAwayWhatACrashedWriterLeft) {
   EXPECT_FALSE(fs::exists(directory + "/" + leftover));
   kept->removeAllCachedResponses();
   EXPECT_TRUE(fs::exists(directory + "/notes.txt"));
+}
+
+TEST_F(URLCacheTest, ClearsAwayAtOnceWhatAProcessLeftThatHasEnded) {
+  cache()->storeCachedResponse(answer("body"), request("a"));
+  const std::string name = directory + "/." + filesOnDisk().at(0).filename().string();
+  const std::string running = name + "." + std::to_string(::getpid()) + ".5.tmp";
+  // Greater than any process number is.
+  const std::string ended = name + ".2000000000.5.tmp";
+  std::ofstream(running) << "half";
+  std::ofstream(ended) << "half";
+  cache()->storeCachedResponse(answer("body"), request("b"));
+  EXPECT_TRUE(fs::exists(running));
+  EXPECT_FALSE(fs::exists(ended));
 }
 
 TEST_F(URLCacheTest, IsUsedByManyThreads) {

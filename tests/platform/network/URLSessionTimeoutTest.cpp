@@ -47,6 +47,30 @@ TEST_F(URLSessionTimeoutTest, GivesUpASilentServerAfterTheTimeout) {
   server.waitUntilAllClientsAreGone();
 }
 
+TEST_F(URLSessionTimeoutTest, HearsOfTheClockWhenNothingElseWakesIt) {
+  ScriptedServer silent([](const ScriptedRequest&, ScriptedConnection& connection) {
+    connection.waitUntilClientIsGone();
+  });
+  start(silent, Seconds(1000));
+  silent.waitForRequests(1);
+  // The transfer library has timers of its own at the beginning of each transfer, by the machine's
+  // clock. Where nobody told of this leap, they would; they have gone off with that, or are not
+  // needed, and the end of another transfer takes its own along.
+  const auto shorter = std::make_shared<RecordingDelegate>();
+  URLRequest request = requestOf(silent.URL("/"));
+  request.setTimeoutInterval(Seconds(30));
+  sessionWithDelegate(shorter)->dataTaskWithRequest(request)->resume();
+  silent.waitForRequests(2);
+  clock->advance(Seconds(31));
+  ASSERT_TRUE(shorter->completed.wait());
+  const auto quick = ScriptedServer::sending(httpAnswer(200, "body"));
+  EXPECT_EQ(fetch(URLSession::sharedSession(), requestOf(quick->URL("/"))).body(), "body");
+  EXPECT_FALSE(delegate->completed.isOpen());
+  clock->advance(Seconds(1000));
+  ASSERT_TRUE(delegate->completed.wait());
+  EXPECT_EQ(delegate->code(), URLErrorTimedOut);
+}
+
 TEST_F(URLSessionTimeoutTest, BeginsAnewWithEachPieceOfTheBody) {
   Counter wanted;
   constexpr size_t pieces = 5;

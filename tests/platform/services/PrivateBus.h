@@ -18,7 +18,8 @@ namespace tests {
 /// Runs a bus daemon on a socket in a temporary folder, from construction to stop() or the end.
 class PrivateBus {
  public:
-  PrivateBus() {
+  /// `more` goes into the configuration.
+  explicit PrivateBus(const std::string& more = {}) {
     const std::string configuration = _folder.write(
         "bus.conf",
         "<!DOCTYPE busconfig PUBLIC \"-//freedesktop//DTD D-Bus Bus Configuration 1.0//EN\" "
@@ -27,7 +28,8 @@ class PrivateBus {
             _folder.path("bus") +
             "</listen><auth>EXTERNAL</auth><policy context=\"default\">"
             "<allow send_destination=\"*\" eavesdrop=\"true\"/><allow eavesdrop=\"true\"/>"
-            "<allow own=\"*\"/></policy></busconfig>");
+            "<allow own=\"*\"/><allow user=\"*\"/></policy>" +
+            more + "</busconfig>");
     int ends[2];
     if (::pipe2(ends, O_CLOEXEC) != 0) {
       throw std::runtime_error("no pipe");
@@ -70,6 +72,7 @@ class PrivateBus {
   PrivateBus& operator=(const PrivateBus&) = delete;
 
   const std::string& address() const { return _address; }
+  std::string socketPath() const { return _folder.path("bus"); }
 
   void stop() {
     if (const pid_t process = std::exchange(_process, 0); process != 0) {

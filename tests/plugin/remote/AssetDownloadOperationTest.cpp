@@ -137,6 +137,17 @@ TEST_F(AssetDownloadOperation, makesAllFoldersAboveTheDestination) {
   EXPECT_EQ(ShelfWorld::contents(deep), "bytes");
 }
 
+TEST_F(AssetDownloadOperation, deletesWhatHostsLeftThatWereKilledWhileTheyWrote) {
+  world.processes->add(77, "host");
+  world.folder.write("book/.en.helpindex.76.0.tmp", "half");
+  world.folder.write("book/.fr.exactmatch.plist.76.1.tmp", "half");
+  world.folder.write("book/.en.helpindex.77.0.tmp", "being written");
+  const auto server = ScriptedServer::sending(httpAnswer(200, "bytes"));
+  run(make(server->URL("/index"), world.folder.path("book/en.helpindex")));
+  EXPECT_EQ(world.files->namesInDirectory(world.folder.path("book")),
+            (std::vector<std::string>{".en.helpindex.77.0.tmp", "en.helpindex"}));
+}
+
 TEST_F(AssetDownloadOperation, otherAnswersThan200EndInAnErrorAndLeaveTheFile) {
   for (const int status : {201, 204, 304, 403, 404, 500, 503}) {
     world.folder.write("asset", "old bytes");

@@ -313,6 +313,18 @@ TEST_F(IndexConnectionDelegate, aNewIndexRefillsTheRecordAndIsTold) {
           LogEntry{4, "Index download: response has been cached for task (null) ((null))"}));
 }
 
+TEST_F(IndexConnectionDelegate, aNewIndexIsTheOneThatIsRememberedOverARestart) {
+  const auto delegate = make();
+  world.shelf->_addIndex(record, bookID);
+  world.shelf->archiveKnownIndices();
+  receive(*delegate, ShelfWorld::indexBytes(luxData()));
+  complete(*delegate);
+  const auto known = world.shelf->unarchiveKnownIndices();
+  ASSERT_TRUE(known);
+  ASSERT_THAT(known->at(bookID), SizeIs(1));
+  EXPECT_EQ(known->at(bookID).front()->path(), generatedPath());
+}
+
 TEST_F(IndexConnectionDelegate, aNewIndexGivesTheBookItsRemoteRoot) {
   const auto delegate = make();
   platform::Value::Dictionary content = luxData();
@@ -414,6 +426,16 @@ TEST_F(IndexConnectionDelegate, anIndexThatCannotBeWrittenIsLoggedAndInUseAllThe
   EXPECT_THAT(world.messages(1),
               ElementsAre("Couldn't write updated index data to " + generatedPath()));
   EXPECT_THAT(world.observer->kinds(), ElementsAre(ZEBIndexChangeUpdated));
+}
+
+TEST_F(IndexConnectionDelegate, deletesWhatHostsLeftThatWereKilledWhileTheyWrote) {
+  const auto delegate = make();
+  const std::string folder = platform::stringByDeletingLastPathComponent(generatedPath());
+  ASSERT_EQ(world.files->createDirectoryWithParents(folder), std::nullopt);
+  ASSERT_EQ(world.files->writeAtomically(folder + "/.fr.helpindex.76.0.tmp", {}), std::nullopt);
+  receive(*delegate, ShelfWorld::indexBytes(luxData()));
+  complete(*delegate);
+  EXPECT_EQ(world.files->namesInDirectory(folder), std::vector<std::string>{"fr.helpindex"});
 }
 
 TEST_F(IndexConnectionDelegate, addsGenerationsUnderTheLockOfTheShelf) {

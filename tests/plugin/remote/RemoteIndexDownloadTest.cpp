@@ -242,6 +242,30 @@ TEST_F(RemoteIndexDownload, aNewerIndexRefillsTheExistingRecordAndTellsOfTheOpen
   EXPECT_TRUE(opened->loadedFromGeneratedCache());
 }
 
+TEST_F(RemoteIndexDownload, anIndexInAnotherLanguageIsTheOneThatIsRememberedOverARestart) {
+  tests::Latch mayAnswer;
+  ScriptedServer slow([&](const auto&, tests::ScriptedConnection& connection) {
+    mayAnswer.wait();
+    connection.send(httpAnswer(200, bytesOfIndex("gadget")));
+    connection.close();
+  });
+  const auto existing =
+      ZEBIndex::indexWithPath(world.writeIndex(world.generatedPath(bookID, "de")));
+  existing->setBookID(bookID);
+  world.shelf->_addIndex(existing, bookID);
+  const auto book = world.makeRemoteBook(bookID, slow.URL("/index"));
+  world.shelf->_addIndexDownloadOperationForType4Book(book, existing);
+  // Everything that drains has drained, and what was known then is written down.
+  EXPECT_TRUE(world.runMainLoopUntil([&] { return ShelfWorld::exists(world.cachePath()); }));
+  EXPECT_EQ(world.shelf->unarchiveKnownIndices()->at(bookID).front()->path(),
+            world.generatedPath(bookID, "de"));
+  mayAnswer.open();
+  EXPECT_TRUE(world.finishDownload(book));
+  EXPECT_EQ(existing->path(), world.generatedPath(bookID, "en"));
+  EXPECT_EQ(world.shelf->unarchiveKnownIndices()->at(bookID).front()->path(),
+            world.generatedPath(bookID, "en"));
+}
+
 TEST_F(RemoteIndexDownload, anUnchangedIndexIsAddedAnewAndToldAsAdded) {
   serve("/index", httpAnswer(200, bytesOfIndex()));
   const std::string former = world.writeIndex(world.generatedPath(bookID, "en"));

@@ -43,8 +43,9 @@ class SteppingFiles : public platform::FileManager {
     takeStep();
     if (steps + 1 == lastStep) {
       // What a process leaves that ends while it writes.
-      std::ofstream(platform::stringByDeletingLastPathComponent(path) + "/.half." +
-                        std::to_string(::getpid()) + ".tmp",
+      std::ofstream(platform::stringByDeletingLastPathComponent(path) + "/." +
+                        platform::lastPathComponent(path) + "." + std::to_string(::getpid()) +
+                        ".99.tmp",
                     std::ios::binary)
           << data.view().substr(0, data.length() / 2);
     }

@@ -273,6 +273,12 @@ TEST_F(Cache, isWrittenWithoutMakingFoldersWhereAFileExistsAlready) {
   EXPECT_THAT(world.logged(), IsEmpty());
 }
 
+TEST_F(Cache, isWrittenWhereNothingIsLeftOfHostsThatWereKilledWhileTheyWrote) {
+  const std::string left = world.folder.write("caches/help/.HelpindexCache.plist.76.0.tmp", "half");
+  writeCache();
+  EXPECT_FALSE(ShelfWorld::exists(left));
+}
+
 TEST_F(Cache, thatCannotBeWrittenIsLoggedAndTheEarlierFileStays) {
   writeCache();
   const std::string before = ShelfWorld::contents(world.cachePath());

@@ -69,6 +69,22 @@ TEST_F(Generation, runsTheInstalledToolWithTheExactCommandLine) {
                           "--lowered-priority", book->path()));
 }
 
+TEST_F(Generation, deletesWhatHostsAndToolsLeftThatWereKilledWhileTheyWrote) {
+  world.processes->add(77, "host");
+  const std::string folder =
+      platform::stringByDeletingLastPathComponent(world.generatedPath("org.one", "de"));
+  ASSERT_EQ(world.files->createDirectoryWithParents(folder), std::nullopt);
+  for (const char* name : {"/.de.helpindex.76.0.tmp", "/.de.helpindex.77.0.tmp"}) {
+    ASSERT_EQ(world.files->writeAtomically(folder + name, {}), std::nullopt);
+  }
+  const auto book = world.makeBook("org.one");
+  book->setLocalization("de");
+  world.makeShelf();
+  generate(book);
+  EXPECT_EQ(world.files->namesInDirectory(folder),
+            std::vector<std::string>{".de.helpindex.77.0.tmp"});
+}
+
 TEST_F(Generation, asksForSemanticDataAloneWithOneMoreWord) {
   const auto book = world.makeBookWithIndex("org.one");
   const auto record = world.makeShelf(false).indicesForBook(book).front();

@@ -1,4 +1,4 @@
-#include "zeb/Models.h"
+#include "zebd/Models.h"
 
 #include <filesystem>
 #include <system_error>
@@ -10,7 +10,7 @@
 #include "platform/Environment.h"
 #include "platform/Files.h"
 
-namespace zeb {
+namespace zebd {
 
 namespace {
 
@@ -55,4 +55,4 @@ std::vector<ListedModel> savedModels() {
   return models;
 }
 
-}  // namespace zeb
+}  // namespace zebd

@@ -1,9 +1,9 @@
-#include "zeb/Installation.h"
+#include "zebd/Installation.h"
 
 #include "platform/Environment.h"
 #include "platform/Strings.h"
 
-namespace zeb {
+namespace zebd {
 
 namespace {
 
@@ -29,4 +29,4 @@ Installation Installation::ofProgramAtPath(const std::string& programPath) {
   return installation;
 }
 
-}  // namespace zeb
+}  // namespace zebd

@@ -3,7 +3,7 @@
 
 #include <string>
 
-namespace zeb {
+namespace zebd {
 
 /// Absolute paths; empty for what is not there.
 struct Installation {
@@ -17,4 +17,4 @@ struct Installation {
   static Installation ofProgramAtPath(const std::string& programPath);
 };
 
-}  // namespace zeb
+}  // namespace zebd

@@ -1,4 +1,4 @@
-#include "zeb/Installation.h"
+#include "zebd/Installation.h"
 
 #include <gmock/gmock.h>
 
@@ -6,7 +6,7 @@
 
 namespace {
 
-using zeb::Installation;
+using zebd::Installation;
 
 TEST(InstallationTest, ProgramOfABuildFolderUsesItsOwnParts) {
   const tests::TemporaryFolder folder;

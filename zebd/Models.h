@@ -7,7 +7,7 @@
 #include <string>
 #include <vector>
 
-namespace zeb {
+namespace zebd {
 
 /// One model.
 struct ListedModel {
@@ -32,4 +32,4 @@ struct ListedModel {
 /// the first time.
 std::vector<ListedModel> savedModels();
 
-}  // namespace zeb
+}  // namespace zebd

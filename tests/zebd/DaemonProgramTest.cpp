@@ -1,0 +1,281 @@
+#include <gmock/gmock.h>
+#include <signal.h>
+#include <unistd.h>
+
+#include <chrono>
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <optional>
+#include <random>
+#include <sstream>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "tests/platform/TemporaryFolder.h"
+#include "tests/platform/services/PrivateBus.h"
+#include "tests/support/ChildProcess.h"
+#include "zebd/Daemon.h"
+
+namespace {
+
+using testing::AllOf;
+using testing::HasSubstr;
+using testing::StartsWith;
+
+namespace fs = std::filesystem;
+
+/// Sets a variable of this process, and so of its children, for a while.
+class Variable {
+ public:
+  Variable(const char* name, const std::string& value) : _name(name) {
+    ::setenv(name, value.c_str(), 1);
+  }
+  ~Variable() { ::unsetenv(_name); }
+  Variable(const Variable&) = delete;
+  Variable& operator=(const Variable&) = delete;
+
+ private:
+  const char* const _name;
+};
+
+std::string contents(const std::string& path) {
+  std::ifstream file(path);
+  return {std::istreambuf_iterator<char>(file), {}};
+}
+
+/// A session of its own, with a bus that starts the real daemon when somebody asks for it.
+class DaemonProgramTest : public testing::Test {
+ protected:
+  explicit DaemonProgramTest(const std::string& options = "--idle 3600")
+      : bus(_configuration(options)) {
+    page("garden", "Roses", "Cut roses in spring.");
+    page("kitchen", "Boiling", "Put water into a pot.");
+  }
+  ~DaemonProgramTest() override {
+    if (const pid_t process = daemonProcess(); process > 0) {
+      ::kill(process, SIGKILL);
+    }
+  }
+
+  void page(const std::string& book, const std::string& title, const std::string& text) const {
+    folder.write(
+        "share/help/en/" + book + "/index.html",
+        "<title>" + title + "</title><h1 id=\"top\">" + title + "</h1><p>" + text + "</p>");
+  }
+  /// Answers of the daemon, started by the bus where it does not run.
+  std::string gdbus(const std::vector<std::string>& arguments) const {
+    const std::string output = folder.path("output");
+    fs::remove(output);
+    std::vector<std::string> line = {
+        "call",   "--address",    bus.address(),   "--timeout",     "60",
+        "--dest", "org.zeb.zebd", "--object-path", "/org/zeb/Help", "--method"};
+    line.insert(line.end(), arguments.begin(), arguments.end());
+    tests::ChildProcess("/usr/bin/gdbus", line, output).wait();
+    return contents(output);
+  }
+  std::string status() const { return gdbus({"org.zeb.Help1.Status"}); }
+  bool isThere() const {
+    const std::string output = folder.path("owner");
+    fs::remove(output);
+    tests::ChildProcess(
+        "/usr/bin/gdbus",
+        {"call", "--address", bus.address(), "--dest", "org.freedesktop.DBus", "--object-path", "/",
+         "--method", "org.freedesktop.DBus.NameHasOwner", "org.zeb.zebd"},
+        output)
+        .wait();
+    return contents(output) == "(true,)\n";
+  }
+  /// The daemon that runs; 0 where none does.
+  pid_t daemonProcess() const {
+    const std::string output = folder.path("pid");
+    fs::remove(output);
+    tests::ChildProcess(
+        "/usr/bin/gdbus",
+        {"call", "--address", bus.address(), "--dest", "org.freedesktop.DBus", "--object-path", "/",
+         "--method", "org.freedesktop.DBus.GetConnectionUnixProcessID", "org.zeb.zebd"},
+        output)
+        .wait();
+    const std::string answer = contents(output);
+    constexpr std::string_view start = "(uint32 ";
+    return answer.starts_with(start) ? std::atoi(answer.c_str() + start.size()) : 0;
+  }
+  /// Waits for a state that is bound to come; false when that takes unreasonably long.
+  template <typename Condition>
+  static bool waitFor(const Condition& condition) {
+    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(120);
+    while (!condition()) {
+      if (std::chrono::steady_clock::now() > end) {
+        return false;
+      }
+      std::this_thread::sleep_for(std::chrono::milliseconds(20));
+    }
+    return true;
+  }
+  bool waitUntilIndexed(const std::string& count) const {
+    return waitFor(
+        [&] { return status().find("'indexed': <uint64 " + count) != std::string::npos; });
+  }
+  bool waitUntilGone(pid_t process) const {
+    return waitFor([&] { return daemonProcess() != process; });
+  }
+  /// Files that a writer leaves behind when it is killed.
+  std::vector<std::string> temporaryFiles() const {
+    std::vector<std::string> paths;
+    std::error_code error;
+    for (fs::recursive_directory_iterator entry(folder.path("cache"), error), end;
+         !error && entry != end; entry.increment(error)) {
+      const std::string name = entry->path().filename().string();
+      if (name.find(".tmp") != std::string::npos || name.find(".new") != std::string::npos) {
+        paths.push_back(entry->path().string());
+      }
+    }
+    return paths;
+  }
+  tests::TemporaryFolder folder;
+  const Variable cache{"XDG_CACHE_HOME", folder.path("cache")};
+  const Variable data{"XDG_DATA_HOME", folder.path("own")};
+  const Variable shared{"XDG_DATA_DIRS", folder.path("share")};
+  const Variable config{"XDG_CONFIG_HOME", folder.path("config")};
+  const Variable language{"LANGUAGE", "en"};
+  tests::PrivateBus bus;
+
+ private:
+  /// The bus reads its service files when it starts, and notices changes late.
+  std::string _configuration(const std::string& options) const {
+    folder.write("services/org.zeb.zebd.service",
+                 "[D-BUS Service]\nName=org.zeb.zebd\nExec=" ZEB_DAEMON " " + options + "\n");
+    return "<servicedir>" + folder.path("services") + "</servicedir>";
+  }
+};
+
+class HastyDaemonTest : public DaemonProgramTest {
+ protected:
+  HastyDaemonTest() : DaemonProgramTest("--idle 0.5") {}
+};
+
+TEST_F(DaemonProgramTest, BusStartsTheDaemonForWhoeverAsksAndItIndexesTheBooks) {
+  EXPECT_FALSE(isThere());
+  EXPECT_THAT(status(), HasSubstr("'process'"));
+  EXPECT_TRUE(isThere());
+  EXPECT_TRUE(waitUntilIndexed("2"));
+  EXPECT_THAT(gdbus({"org.zeb.Help1.StartSearch", "spring", "{}"}), StartsWith("(uint64 "));
+}
+
+TEST_F(HastyDaemonTest, DaemonLeavesWhenItHasNothingToDoAndComesBackWhenItIsAsked) {
+  EXPECT_TRUE(waitUntilIndexed("2"));
+  EXPECT_TRUE(waitFor([this] { return !isThere(); }));
+  EXPECT_THAT(status(), HasSubstr("'indexed': <uint64 2>")) << "it has kept what it made";
+}
+
+TEST_F(DaemonProgramTest, DaemonEndsWhenItIsToldTo) {
+  EXPECT_THAT(status(), HasSubstr("'process'"));
+  const pid_t process = daemonProcess();
+  ASSERT_GT(process, 0);
+  ASSERT_EQ(::kill(process, SIGTERM), 0);
+  EXPECT_TRUE(waitFor([this] { return !isThere(); }));
+}
+
+TEST_F(DaemonProgramTest, DaemonEndsWithItsBus) {
+  EXPECT_THAT(status(), HasSubstr("'process'"));
+  const pid_t process = daemonProcess();
+  ASSERT_GT(process, 0);
+  bus.stop();
+  // Whose child it is depends on the bus; that it is no program any more, the kernel tells.
+  EXPECT_TRUE(waitFor([&] {
+    std::error_code gone;
+    return fs::read_symlink("/proc/" + std::to_string(process) + "/exe", gone).empty();
+  }));
+}
+
+TEST_F(DaemonProgramTest, SecondDaemonEndsAtOnce) {
+  EXPECT_THAT(status(), HasSubstr("'process'"));
+  const Variable address("DBUS_SESSION_BUS_ADDRESS", bus.address());
+  tests::ChildProcess second(ZEB_DAEMON, {}, folder.path("second"));
+  EXPECT_EQ(second.wait(), 1);
+  EXPECT_THAT(contents(folder.path("second")), HasSubstr("the name org.zeb.zebd cannot be had"));
+}
+
+TEST_F(DaemonProgramTest, DaemonWithoutABusSaysSo) {
+  const Variable address("DBUS_SESSION_BUS_ADDRESS", "unix:path=" + folder.path("none"));
+  tests::ChildProcess daemon(ZEB_DAEMON, {}, folder.path("log"));
+  EXPECT_EQ(daemon.wait(), 1);
+  EXPECT_THAT(contents(folder.path("log")), HasSubstr("there is no message bus"));
+}
+
+/// However a daemon ends, the next one serves, with nothing torn and nothing left lying about.
+TEST_F(DaemonProgramTest, DaemonThatIsKilledAtAnyMomentIsFollowedByOneThatServes) {
+  const char* asked = std::getenv("ZEB_KILLS");
+  const int kills = asked == nullptr ? 6 : std::atoi(asked);
+  std::mt19937 random(11);
+  for (int i = 0; i < kills; ++i) {
+    // Something to index, and to forget, in every round.
+    page("round" + std::to_string(i), "Round " + std::to_string(i), "In winter.");
+    fs::remove_all(folder.path("share/help/en/round" + std::to_string(i - 2)));
+    EXPECT_THAT(status(), HasSubstr("'process'"));
+    const pid_t process = daemonProcess();
+    ASSERT_GT(process, 0);
+    std::this_thread::sleep_for(std::chrono::milliseconds(random() % 400));
+    ASSERT_EQ(::kill(process, SIGKILL), 0);
+    EXPECT_TRUE(waitUntilGone(process));
+  }
+  const std::string books = kills == 1 ? "3" : "4";
+  EXPECT_TRUE(waitUntilIndexed(books)) << status();
+  EXPECT_THAT(gdbus({"org.zeb.Help1.StartSearch", "spring", "{}"}), StartsWith("(uint64 "));
+  EXPECT_TRUE(waitFor([this] { return temporaryFiles().empty(); }))
+      << testing::PrintToString(temporaryFiles());
+}
+
+class DaemonOptionsTest : public testing::Test {
+ protected:
+  std::optional<zebd::DaemonOptions> parse(const std::vector<std::string>& arguments) {
+    out.str({});
+    err.str({});
+    return zebd::parseDaemonOptions(arguments, out, err, exitCode);
+  }
+
+  std::ostringstream out;
+  std::ostringstream err;
+  int exitCode = -1;
+};
+
+TEST_F(DaemonOptionsTest, WithoutArgumentsTheDefaultsHold) {
+  const auto options = parse({});
+  ASSERT_TRUE(options.has_value());
+  EXPECT_EQ(options->idleDelay, 60);
+  EXPECT_EQ(options->cacheFolder, std::nullopt);
+  EXPECT_EQ(options->verbosity, 0);
+}
+
+TEST_F(DaemonOptionsTest, OptionsAreUnderstood) {
+  const auto options = parse({"--idle", "2.5", "--cache-dir", "/tmp/c", "-vv"});
+  ASSERT_TRUE(options.has_value());
+  EXPECT_EQ(options->idleDelay, 2.5);
+  EXPECT_EQ(options->cacheFolder, "/tmp/c");
+  EXPECT_EQ(options->verbosity, 2);
+}
+
+TEST_F(DaemonOptionsTest, HelpAndVersionArePrintedAndNothingIsLeftToDo) {
+  EXPECT_FALSE(parse({"--help"}).has_value());
+  EXPECT_EQ(exitCode, 0);
+  EXPECT_THAT(out.str(), AllOf(HasSubstr("--idle"), HasSubstr("--cache-dir")));
+  EXPECT_FALSE(parse({"--version"}).has_value());
+  EXPECT_EQ(exitCode, 0);
+  EXPECT_THAT(out.str(), StartsWith("zebd "));
+}
+
+TEST_F(DaemonOptionsTest, WrongLinesAreErrors) {
+  for (const std::vector<std::string>& line : {std::vector<std::string>{"--idle", "0"},
+                                               {"--idle", "soon"},
+                                               {"--cache-dir", "relative"},
+                                               {"--nonsense"},
+                                               {"word"}}) {
+    EXPECT_FALSE(parse(line).has_value());
+    EXPECT_EQ(exitCode, 2) << line.front();
+    EXPECT_NE(err.str(), "");
+  }
+}
+
+}  // namespace

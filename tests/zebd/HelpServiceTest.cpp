@@ -1,0 +1,361 @@
+#include "zebd/HelpService.h"
+
+#include <gmock/gmock.h>
+
+#include <filesystem>
+#include <map>
+#include <string>
+#include <vector>
+
+#include "host/Zebrine/ZEBConstants.h"
+#include "tests/zebd/HostWorld.h"
+#include "zebd/BookFolder.h"
+
+namespace {
+
+using testing::Contains;
+using testing::ElementsAre;
+using testing::IsEmpty;
+using testing::Not;
+using testing::UnorderedElementsAre;
+using tests::ample;
+using zebd::SearchEnding;
+
+/// Keeps what clients are told.
+class Listener : public zebd::SearchListener {
+ public:
+  void searchFound(const std::string& client, uint64_t handle,
+                   const std::vector<zebd::FoundItem>& items) override {
+    const platform::MutexLock lock(_mutex);
+    for (const zebd::FoundItem& item : items) {
+      _found[handle].push_back(item);
+    }
+    EXPECT_FALSE(client.empty());
+  }
+  void searchEnded(const std::string& client, uint64_t handle, SearchEnding ending,
+                   platform::Seconds waited) override {
+    const platform::MutexLock lock(_mutex);
+    _ends.emplace_back(client, handle);
+    _endings[handle] = ending;
+    EXPECT_GE(waited.count(), 0);
+  }
+
+  bool hasEnded(uint64_t handle) const {
+    const platform::MutexLock lock(_mutex);
+    return _endings.contains(handle);
+  }
+  SearchEnding ending(uint64_t handle) const {
+    const platform::MutexLock lock(_mutex);
+    return _endings.at(handle);
+  }
+  std::vector<std::string> titles(uint64_t handle) const {
+    const platform::MutexLock lock(_mutex);
+    std::vector<std::string> titles;
+    const auto found = _found.find(handle);
+    if (found != _found.end()) {
+      for (const zebd::FoundItem& item : found->second) {
+        titles.push_back(item.title);
+      }
+    }
+    return titles;
+  }
+  std::vector<zebd::FoundItem> items(uint64_t handle) const {
+    const platform::MutexLock lock(_mutex);
+    return _found.at(handle);
+  }
+  /// Handles in the order of their ends.
+  std::vector<uint64_t> order() const {
+    const platform::MutexLock lock(_mutex);
+    std::vector<uint64_t> handles;
+    for (const auto& end : _ends) {
+      handles.push_back(end.second);
+    }
+    return handles;
+  }
+
+ private:
+  mutable platform::Mutex _mutex;
+  std::map<uint64_t, std::vector<zebd::FoundItem>> _found GUARDED_BY(_mutex);
+  std::map<uint64_t, SearchEnding> _endings GUARDED_BY(_mutex);
+  std::vector<std::pair<std::string, uint64_t>> _ends GUARDED_BY(_mutex);
+};
+
+zebd::SearchRequest request(const std::string& text) {
+  zebd::SearchRequest request;
+  request.text = text;
+  request.kinds = {ZEBHelpArticleResult};
+  return request;
+}
+
+class HelpServiceTest : public testing::Test, protected tests::HostWorld {
+ protected:
+  HelpServiceTest() {
+    writePage("share/help/en/garden/index.html", "Roses", "Cut roses in spring.");
+    writePage("share/help/en/kitchen/index.html", "Boiling", "Put water into a pot.");
+  }
+  ~HelpServiceTest() override {
+    if (service != nullptr) {
+      EXPECT_TRUE(waitUntilQuiet(service->owner()));
+    }
+  }
+
+  /// Serves, and waits until the books are found.
+  void start() {
+    service = std::make_unique<zebd::HelpService>(startHost(), settings(), listener);
+    service->begin();
+    EXPECT_TRUE(runUntil([this] { return service->status().watchedFolderCount > 0; }));
+  }
+  zebd::BookKeeper::Settings settings() const {
+    return {{folder.path("share")}, folder.path("caches/zeb/books"), {"en"}};
+  }
+  static bool runUntil(const std::function<bool()>& condition) {
+    return zebd::Host::runMainLoopUntil(condition, ample);
+  }
+  zebd::BookChanges scan() {
+    std::optional<zebd::BookChanges> changes;
+    service->scan([&](const zebd::BookChanges& made) { changes = made; });
+    EXPECT_TRUE(runUntil([&] { return changes.has_value(); }));
+    return changes.value_or(zebd::BookChanges());
+  }
+  uint64_t begin(const std::string& client, const std::string& text) {
+    return service->searches().start(client, request(text)).value();
+  }
+  std::vector<std::string> search(const std::string& text) {
+    const uint64_t handle = begin("client", text);
+    EXPECT_TRUE(runUntil([&] { return listener->hasEnded(handle); }));
+    EXPECT_EQ(listener->ending(handle), SearchEnding::complete);
+    return listener->titles(handle);
+  }
+  /// Until a search finds exactly this: indexes are made in the background.
+  void waitUntilFound(const std::string& text, const std::vector<std::string>& titles) {
+    std::vector<std::string> found;
+    for (int tries = 0; tries < 400 && found != titles; ++tries) {
+      found = search(text);
+      runUntil([this] { return service->owner().isQuietFor(platform::Seconds(0.2)); });
+    }
+    EXPECT_EQ(found, titles);
+  }
+  std::vector<std::string> bookIDs() const {
+    std::vector<std::string> bookIDs;
+    for (const zebd::BookStatus& book : service->books()) {
+      bookIDs.push_back(book.bookID);
+    }
+    return bookIDs;
+  }
+
+  std::shared_ptr<Listener> listener = std::make_shared<Listener>();
+  std::unique_ptr<zebd::HelpService> service;
+};
+
+TEST_F(HelpServiceTest, FindsTheBooksOfTheDataFoldersAndServesSearches) {
+  start();
+  EXPECT_THAT(bookIDs(), ElementsAre("garden", "kitchen"));
+  waitUntilFound("spring", {"Roses"});
+  EXPECT_TRUE(runUntil([this] { return service->status().indexedBookCount == 2; }));
+  EXPECT_EQ(service->status().bookCount, 2U);
+}
+
+TEST_F(HelpServiceTest, ItemTellsPageBookAndKind) {
+  start();
+  waitUntilFound("spring", {"Roses"});
+  const uint64_t handle = begin("client", "spring");
+  EXPECT_TRUE(runUntil([&] { return listener->hasEnded(handle); }));
+  const zebd::FoundItem item = listener->items(handle).front();
+  EXPECT_EQ(item.kind, ZEBHelpArticleResult);
+  EXPECT_EQ(item.bookID, "garden");
+  EXPECT_EQ(item.bookTitle, "Roses");
+  EXPECT_EQ(item.url, "file://" + folder.path("share/help/en/garden/index.html"));
+  EXPECT_GT(item.relevance, 0);
+  EXPECT_FALSE(item.isExactMatch);
+}
+
+TEST_F(HelpServiceTest, AnchorIsLookedUp) {
+  start();
+  waitUntilFound("spring", {"Roses"});
+  zebd::SearchRequest anchor = request("Boiling");
+  anchor.isAnchor = true;
+  const uint64_t handle = service->searches().start("client", anchor).value();
+  EXPECT_TRUE(runUntil([&] { return listener->hasEnded(handle); }));
+  EXPECT_THAT(listener->titles(handle), ElementsAre("Boiling"));
+}
+
+TEST_F(HelpServiceTest, BookThatIsInstalledIsFoundByItself) {
+  start();
+  writePage("share/help/en/music/index.html", "Playing", "Play a melody.");
+  EXPECT_TRUE(runUntil([this] { return service->books().size() == 3; }));
+  waitUntilFound("melody", {"Playing"});
+}
+
+TEST_F(HelpServiceTest, PageThatChangesIsFoundUnderItsNewWordsOnly) {
+  start();
+  waitUntilFound("spring", {"Roses"});
+  writePage("share/help/en/garden/index.html", "Roses", "Cut roses in autumn, all of them.");
+  EXPECT_TRUE(runUntil([this] { return !search("autumn").empty(); }));
+  // The model of the language follows a little later.
+  waitUntilFound("spring", {});
+}
+
+TEST_F(HelpServiceTest, PageThatIsAddedIsFound) {
+  start();
+  waitUntilFound("spring", {"Roses"});
+  writePage("share/help/en/garden/deep/tulips.html", "Tulips", "Plant tulips in winter.");
+  EXPECT_TRUE(runUntil([this] { return !search("tulips").empty(); }));
+}
+
+TEST_F(HelpServiceTest, BookThatIsRemovedIsForgottenWithItsIndex) {
+  start();
+  waitUntilFound("spring", {"Roses"});
+  ASSERT_TRUE(hasIndex("garden", "en"));
+  std::filesystem::remove_all(folder.path("share/help/en/garden"));
+  EXPECT_TRUE(runUntil([this] { return service->books().size() == 1; }));
+  EXPECT_TRUE(runUntil([this] { return !hasIndex("garden", "en"); }));
+  EXPECT_THAT(search("spring"), IsEmpty());
+}
+
+TEST_F(HelpServiceTest, NothingIsDoneAgainWhereNothingHasChanged) {
+  start();
+  waitUntilFound("water", {"Boiling"});
+  const zebd::BookChanges changes = scan();
+  EXPECT_EQ(changes.changed, 0U);
+  EXPECT_EQ(changes.unchanged, 2U);
+  EXPECT_EQ(changes.forgotten, 0U);
+  EXPECT_EQ(changes.failed, 0U);
+}
+
+TEST_F(HelpServiceTest, BookThatAnotherProgramHasEnteredIsServed) {
+  start();
+  waitUntilFound("spring", {"Roses"});
+  writePage("elsewhere/index.html", "Painting", "Paint the wall.");
+  std::string reason;
+  const auto entry = zebd::entryForFolder(folder.path("elsewhere"), "painting", "en", reason);
+  ASSERT_TRUE(entry.has_value()) << reason;
+  zebd::Catalogue(folder.path("caches/zeb/books")).store(*entry);
+  EXPECT_TRUE(runUntil([this] { return service->books().size() == 3; }));
+  waitUntilFound("wall", {"Painting"});
+}
+
+TEST_F(HelpServiceTest, BookThatAnotherProgramHasBroughtUpToDateIsLookedAtAnew) {
+  start();
+  waitUntilFound("spring", {"Roses"});
+  // Before the watcher tells, the catalogue says already what the pages are.
+  writePage("share/help/en/garden/index.html", "Roses", "Cut roses in autumn, all of them.");
+  std::string reason;
+  const auto entry =
+      zebd::entryForFolder(folder.path("share/help/en/garden"), "garden", "en", reason);
+  ASSERT_TRUE(entry.has_value()) << reason;
+  zebd::Catalogue(folder.path("caches/zeb/books")).store(*entry);
+  EXPECT_EQ(scan().changed, 1U);
+  waitUntilFound("autumn", {"Roses"});
+}
+
+TEST_F(HelpServiceTest, SecondServiceKnowsTheBooksBeforeItHasLookedForThem) {
+  start();
+  waitUntilFound("spring", {"Roses"});
+  EXPECT_TRUE(waitUntilQuiet(service->owner()));
+  service.reset();
+  listener = std::make_shared<Listener>();
+  service = std::make_unique<zebd::HelpService>(startHost(), settings(), listener);
+  service->begin();
+  EXPECT_THAT(bookIDs(), ElementsAre("garden", "kitchen"));
+  EXPECT_THAT(search("spring"), ElementsAre("Roses"));
+}
+
+TEST_F(HelpServiceTest, ScansThatAreAskedForDuringAScanAreOneMore) {
+  start();
+  int ends = 0;
+  for (int i = 0; i < 5; ++i) {
+    service->scan([&](const zebd::BookChanges&) { ++ends; });
+  }
+  EXPECT_TRUE(runUntil([&] { return ends == 5; }));
+}
+
+TEST_F(HelpServiceTest, SearchesOfSeveralClientsRunInTheOrderOfTheirRequests) {
+  start();
+  const uint64_t first = begin("a", "spring");
+  const uint64_t second = begin("b", "water");
+  const uint64_t third = begin("c", "pot");
+  EXPECT_EQ(service->searches().count(), 3U);
+  EXPECT_TRUE(runUntil([&] { return listener->hasEnded(third); }));
+  EXPECT_THAT(listener->order(), ElementsAre(first, second, third));
+  EXPECT_EQ(service->searches().count(), 0U);
+}
+
+TEST_F(HelpServiceTest, NewerSearchOfAClientTakesTheOlderBack) {
+  start();
+  const uint64_t running = begin("a", "spring");
+  const uint64_t waiting = begin("a", "wat");
+  const uint64_t last = begin("a", "water");
+  EXPECT_TRUE(listener->hasEnded(waiting)) << "one that waits ends at once";
+  EXPECT_TRUE(runUntil([&] { return listener->hasEnded(last); }));
+  EXPECT_EQ(listener->ending(running), SearchEnding::cancelled);
+  EXPECT_EQ(listener->ending(waiting), SearchEnding::cancelled);
+  EXPECT_EQ(listener->ending(last), SearchEnding::complete);
+}
+
+TEST_F(HelpServiceTest, OnlyTheClientItselfCanTakeASearchBack) {
+  start();
+  const uint64_t handle = begin("a", "spring");
+  EXPECT_FALSE(service->searches().cancel("b", handle));
+  EXPECT_TRUE(service->searches().cancel("a", handle));
+  EXPECT_TRUE(runUntil([&] { return listener->hasEnded(handle); }));
+  EXPECT_EQ(listener->ending(handle), SearchEnding::cancelled);
+  EXPECT_FALSE(service->searches().cancel("a", handle)) << "it has ended";
+}
+
+TEST_F(HelpServiceTest, SearchesOfAClientThatLeavesAreTakenBack) {
+  start();
+  const uint64_t running = begin("a", "spring");
+  const uint64_t waiting = begin("b", "water");
+  service->searches().clientLeft("b");
+  EXPECT_TRUE(listener->hasEnded(waiting));
+  service->searches().clientLeft("a");
+  EXPECT_TRUE(runUntil([&] { return listener->hasEnded(running); }));
+  EXPECT_EQ(listener->ending(running), SearchEnding::cancelled);
+}
+
+TEST_F(HelpServiceTest, MoreClientsThanThereIsRoomForAreRefused) {
+  start();
+  for (size_t i = 0; i < zebd::ClientSearches::maximumClientCount; ++i) {
+    ASSERT_TRUE(service->searches().start(std::to_string(i), request("spring")).has_value());
+  }
+  EXPECT_FALSE(service->searches().start("one more", request("spring")).has_value());
+  EXPECT_TRUE(service->searches().start("0", request("water")).has_value());
+  for (size_t i = 0; i < zebd::ClientSearches::maximumClientCount; ++i) {
+    service->searches().clientLeft(std::to_string(i));
+  }
+  EXPECT_TRUE(runUntil([this] { return service->searches().count() == 0; }));
+}
+
+TEST_F(HelpServiceTest, RequestsOutOfBoundsMeetAnObjection) {
+  using zebd::HelpService;
+  EXPECT_EQ(HelpService::objection(request("words")), std::nullopt);
+  EXPECT_EQ(HelpService::objection(request("")), std::nullopt);
+  EXPECT_EQ(HelpService::objection(request(std::string(5000, 'a'))), "the text is too long");
+  EXPECT_EQ(HelpService::objection(request("\xff")), "the text is no text");
+  zebd::SearchRequest bad = request("words");
+  bad.bookIDs = {"../../etc"};
+  EXPECT_EQ(HelpService::objection(bad), "\"../../etc\" cannot be a book's identifier");
+  bad.bookIDs.assign(1001, "a");
+  EXPECT_EQ(HelpService::objection(bad), "there are too many books");
+  bad = request("words");
+  bad.kinds = {"nonsense"};
+  EXPECT_EQ(HelpService::objection(bad), "there is no such kind of result");
+  bad.kinds = {};
+  EXPECT_EQ(HelpService::objection(bad), "there is no such kind of result");
+  bad = request("words");
+  bad.limit = 10'001;
+  EXPECT_EQ(HelpService::objection(bad), "the limit is too high");
+  bad = request("words");
+  bad.languages.assign(1001, "en");
+  EXPECT_EQ(HelpService::objection(bad), "there are too many languages");
+}
+
+TEST_F(HelpServiceTest, BookWhoseEntryCannotBeWrittenIsServedAllTheSame) {
+  folder.write("caches/zeb/books", "a file in the place of the folder");
+  start();
+  EXPECT_THAT(bookIDs(), ElementsAre("garden", "kitchen"));
+  EXPECT_THAT(log->messages(1), Contains(testing::StartsWith("Cannot remember the book garden: ")));
+  waitUntilFound("spring", {"Roses"});
+}
+
+}  // namespace

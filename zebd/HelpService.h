@@ -1,0 +1,83 @@
+// What a help daemon does for its clients, whatever they are connected by.
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "zebd/BookKeeper.h"
+#include "zebd/ClientSearches.h"
+#include "zebd/FolderWatcher.h"
+#include "zebd/Host.h"
+
+namespace zebd {
+
+/// A book as clients are told of it.
+struct BookStatus {
+  std::string bookID;
+  std::string title;
+  std::string language;
+  std::string folder;
+  int32_t type = 1;
+  /// The help-index file; absent when there is none yet.
+  std::optional<std::string> indexPath;
+};
+
+/// What is going on.
+struct ServiceStatus {
+  size_t bookCount = 0;
+  size_t indexedBookCount = 0;
+  /// Searches of clients that wait or run.
+  size_t searchCount = 0;
+  size_t watchedFolderCount = 0;
+  bool isScanning = false;
+  /// Work that keeps the daemon from leaving.
+  int64_t guardCount = 0;
+  platform::Seconds idleDelay{0};
+  platform::Seconds running{0};
+};
+
+/// A host whose books are kept up to date and whose plug-in serves several clients.
+/// Thread-safety: confined to the main thread, which has to run its loop.
+class HelpService {
+ public:
+  /// Clients say no more than this in one request.
+  static constexpr size_t maximumTextLength = 4096;
+  static constexpr size_t maximumBookCount = 1000;
+  static constexpr size_t maximumResultCount = 10'000;
+
+  HelpService(std::unique_ptr<Host> host, BookKeeper::Settings books,
+              std::shared_ptr<SearchListener> listener);
+  ~HelpService();
+  HelpService(const HelpService&) = delete;
+  HelpService& operator=(const HelpService&) = delete;
+
+  /// Begins to serve: the known books at once, others as they are found.
+  void begin();
+
+  /// Why the request cannot be taken; absent when it can.
+  static std::optional<std::string> objection(const SearchRequest& request);
+
+  ClientSearches& searches() { return _searches; }
+  void scan(BookKeeper::Done done) { _books.scan(std::move(done)); }
+  std::vector<BookStatus> books() const;
+  ServiceStatus status() const;
+
+  Owner& owner() { return _host->owner(); }
+  /// Whether something is under way that has no shutdown guard.
+  bool isInUse() const { return _searches.count() > 0 || _books.isScanning(); }
+
+ private:
+  void _watch();
+
+  const std::unique_ptr<Host> _host;
+  const platform::Clock::Instant _start;
+  BookKeeper _books;
+  ClientSearches _searches;
+  FolderWatcher _watcher;
+};
+
+}  // namespace zebd
