@@ -63,7 +63,7 @@ class Run {
       }
     }
     platform::Error error;
-    const auto pages = findPages(_options.folder, _report, &error);
+    auto pages = findPages(_options.folder, _report, &error);
     if (!pages) {
       return _fail(fmt::format("cannot index the folder {}", error.description));
     }
@@ -174,21 +174,21 @@ class Run {
     for (size_t worker = 0; worker < _workerCount; ++worker) {
       _shards.push_back(std::make_unique<IndexShard>(options, _tokenizer));
     }
-    OrderedWork<AddedFile>::run(
-        _pages.size(), _limits(),
-        {[this](size_t piece) { return _pages[piece].size; },
-         [this](size_t piece, size_t worker) {
-           PreparedFile file = piece < _prepared.size()
-                                   ? std::exchange(_prepared[piece], PreparedFile())
-                                   : _preparers[worker]->prepare(_pages[piece]);
-           return _shards[worker]->add(std::move(file));
-         },
-         [this](size_t piece, AddedFile added) { _count(piece, std::move(added)); }});
+    OrderedWork<AddedFile>::run(_pages.size(), _limits(),
+                                {[this](size_t piece) { return _pages[piece].size; },
+                                 [this](size_t piece, size_t worker) {
+                                   PreparedFile file =
+                                       piece < _prepared.size()
+                                           ? std::exchange(_prepared[piece], PreparedFile())
+                                           : _preparers[worker]->prepare(_pages[piece]);
+                                   return _shards[worker]->add(std::move(file));
+                                 },
+                                 [this](size_t piece, AddedFile added) { _count(piece, added); }});
   }
 
   WorkLimits _limits() const { return {_workerCount, bytesInFlight}; }
 
-  void _count(size_t piece, AddedFile added) {
+  void _count(size_t piece, const AddedFile& added) {
     for (const Message& message : added.messages) {
       if (message.kind == Message::Kind::warning) {
         _report.warning(message.text);
