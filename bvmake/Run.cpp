@@ -174,16 +174,16 @@ class Run {
     for (size_t worker = 0; worker < _workerCount; ++worker) {
       _shards.push_back(std::make_unique<IndexShard>(options, _tokenizer));
     }
-    OrderedWork<AddedFile>::run(_pages.size(), _limits(),
-                                {[this](size_t piece) { return _pages[piece].size; },
-                                 [this](size_t piece, size_t worker) {
-                                   PreparedFile file =
-                                       piece < _prepared.size()
-                                           ? std::exchange(_prepared[piece], PreparedFile())
-                                           : _preparers[worker]->prepare(_pages[piece]);
-                                   return _shards[worker]->add(std::move(file));
-                                 },
-                                 [this](size_t piece, AddedFile added) { _count(piece, added); }});
+    OrderedWork<AddedFile>::run(
+        _pages.size(), _limits(),
+        {[this](size_t piece) { return _pages[piece].size; },
+         [this](size_t piece, size_t worker) {
+           PreparedFile file = piece < _prepared.size()
+                                   ? std::exchange(_prepared[piece], PreparedFile())
+                                   : _preparers[worker]->prepare(_pages[piece]);
+           return _shards[worker]->add(std::move(file));
+         },
+         [this](size_t piece, const AddedFile& added) { _count(piece, added); }});
   }
 
   WorkLimits _limits() const { return {_workerCount, bytesInFlight}; }
