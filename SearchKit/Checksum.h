@@ -10,4 +10,7 @@ namespace searchkit {
 /// `checksum` stands for, with `bytes` after them. Thread-safety: may be called from any thread.
 uint32_t crc32c(std::span<const uint8_t> bytes, uint32_t checksum = 0) noexcept;
 
+/// The same where the processor has no instruction for it. For comparison.
+uint32_t crc32cByTable(std::span<const uint8_t> bytes, uint32_t checksum = 0) noexcept;
+
 }  // namespace searchkit

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cstring>
+#include <iterator>
 
 #include "SearchKit/Checksum.h"
 #include "SearchKit/TextFolding.h"
@@ -45,8 +46,9 @@ size_t aligned(size_t offset) {
 // The order of the sections in the bytes: what a search touches first and often stands together,
 // positions are last.
 constexpr Section order[] = {
-    Section::blockKeys,  Section::blockOffsets, Section::documentLengths, Section::documents,
-    Section::dictionary, Section::postings,     Section::storedText,      Section::positions,
+    Section::blockKeys, Section::blockOffsets, Section::documentLengths,
+    Section::documents, Section::dictionary,   Section::mergedLists,
+    Section::postings,  Section::storedText,   Section::positions,
 };
 
 }  // namespace
@@ -90,16 +92,18 @@ void IndexAssembler::addTerm(std::string_view term, std::span<const Posting> pos
   const size_t positionsBegin = positions.size();
   appendNumber(lists, static_cast<uint32_t>(postings.size()));
   uint32_t next = 0;
+  _positions.clear();
   for (const Posting& posting : postings) {
-    const bool hasWeight = posting.weight > 1;
-    appendNumber(lists, (posting.document - next) << 1 | (hasWeight ? 1 : 0));
-    if (hasWeight) {
+    appendNumber(lists, format::postingNumber(posting.document - next, posting.weight));
+    if (format::weightFollows(posting.weight)) {
       appendNumber(lists, posting.weight);
     }
     next = posting.document + 1;
-    appendNumber(positions, static_cast<uint32_t>(posting.positions.size()));
-    positions.insert(positions.end(), posting.positions.begin(), posting.positions.end());
+    _appendPositions(posting);
   }
+  const std::vector<uint8_t>& packed = _positions.finish();
+  positions.insert(positions.end(), packed.begin(), packed.end());
+  _mergedLists.addTerm(term, postings, _documentCount);
   const auto shared = static_cast<size_t>(
       std::mismatch(term.begin(), term.end(), _previousTerm.begin(), _previousTerm.end()).first -
       term.begin());
@@ -112,10 +116,42 @@ void IndexAssembler::addTerm(std::string_view term, std::span<const Posting> pos
   _previousTerm = term;
 }
 
+void IndexAssembler::_appendPositions(const Posting& posting) {
+  const auto count =
+      static_cast<uint32_t>(std::count_if(posting.positions.begin(), posting.positions.end(),
+                                          [](uint8_t byte) { return byte < 0x80; }));
+  const uint32_t length =
+      format::load<uint32_t>(_section(Section::documentLengths).data() +
+                             size_t{posting.document} * format::documentLengthLength);
+  const uint32_t lowBits = positionBits(length, count);
+  _distances.clear();
+  const uint8_t* at = posting.positions.data();
+  const uint8_t* const end = at + posting.positions.size();
+  uint32_t distance;
+  // All but the first are at least 1.
+  for (uint32_t least = 0; format::readNumber(at, end, distance); least = 1) {
+    _distances.appendDistance(distance - least, lowBits);
+  }
+  if (count >= uint32_t{1} << maximumCountBits ||
+      _distances.bitCount() >= uint64_t{1} << maximumCountBits) {
+    throw platform::Exception(platform::rangeException,
+                              "a page is too large for one keyword index");
+  }
+  _positions.appendCount(count);
+  if (count >= fewestPositionsWithLength) {
+    _positions.appendCount(static_cast<uint32_t>(_distances.bitCount()));
+  }
+  _positions.append(_distances);
+}
+
 platform::Data IndexAssembler::finish() {
-  const size_t headerLength = format::headerLength + std::size(order) * format::sectionEntryLength;
+  _section(Section::mergedLists) = _mergedLists.finish();
+  std::vector<Section> there;
+  std::copy_if(std::begin(order), std::end(order), std::back_inserter(there),
+               [this](Section id) { return id != Section::mergedLists || !_section(id).empty(); });
+  const size_t headerLength = format::headerLength + there.size() * format::sectionEntryLength;
   size_t totalLength = headerLength;
-  for (const Section id : order) {
+  for (const Section id : there) {
     totalLength = aligned(totalLength) + _offset(id);
   }
   std::vector<uint8_t> bytes(totalLength);
@@ -125,7 +161,7 @@ platform::Data IndexAssembler::finish() {
   format::store(header + format::revisionAt, format::revision);
   format::store(header + format::headerLengthAt, static_cast<uint32_t>(headerLength));
   format::store(header + format::totalLengthAt, static_cast<uint64_t>(totalLength));
-  format::store(header + format::sectionCountAt, static_cast<uint32_t>(std::size(order)));
+  format::store(header + format::sectionCountAt, static_cast<uint32_t>(there.size()));
   format::store(header + format::documentCountAt, _documentCount);
   format::store(header + format::termCountAt, _termCount);
   format::store(header + format::wordCountAt, _wordCount);
@@ -138,7 +174,7 @@ platform::Data IndexAssembler::finish() {
 
   size_t offset = headerLength;
   uint8_t* entry = header + format::headerLength;
-  for (const Section id : order) {
+  for (const Section id : there) {
     offset = aligned(offset);
     std::vector<uint8_t>& section = _section(id);
     std::copy(section.begin(), section.end(), bytes.begin() + static_cast<ptrdiff_t>(offset));

@@ -9,6 +9,8 @@
 #include <vector>
 
 #include "SearchKit/IndexFormat.h"
+#include "SearchKit/MergedLists.h"
+#include "SearchKit/PackedPositions.h"
 #include "platform/Data.h"
 
 namespace searchkit {
@@ -25,7 +27,7 @@ struct StoredTexts {
 struct Posting {
   uint32_t document = 0;
   uint32_t weight = 0;
-  /// As the positions section has them, without their length.
+  /// Ascending, each as the difference from the one before it, the first from 0; varnumbers.
   std::span<const uint8_t> positions;
 };
 
@@ -53,12 +55,16 @@ class IndexAssembler {
   }
   uint32_t _offset(format::Section id);
   void _beginBlock(std::string_view term);
+  void _appendPositions(const Posting& posting);
 
   uint32_t _minimumTermLength;
   uint32_t _documentCount = 0;
   uint32_t _termCount = 0;
   uint64_t _wordCount = 0;
   std::string _previousTerm;
+  MergedListsBuilder _mergedLists;
+  BitWriter _positions;
+  BitWriter _distances;
   std::vector<uint8_t> _sections[format::lastKnownSection + 1];
 };
 

@@ -2,6 +2,7 @@
 
 #include <fmt/format.h>
 
+#include <algorithm>
 #include <cstdint>
 #include <span>
 #include <string_view>
@@ -9,7 +10,11 @@
 
 #include "SearchKit/IndexFormat.h"
 #include "SearchKit/IndexReader.h"
+#include "SearchKit/PackedPositions.h"
+#include "SearchKit/PostingsCursor.h"
 #include "SearchKit/SKIndex.h"
+#include "SearchKit/Scoring.h"
+#include "SearchKit/WordLookup.h"
 #include "platform/Strings.h"
 
 namespace searchkit {
@@ -66,6 +71,7 @@ class Check {
     if (_checkTerms()) {
       _checkEnds();
       _checkLengths();
+      _checkMergedLists();
     }
   }
 
@@ -169,27 +175,65 @@ class Check {
   void _checkLists(uint32_t number, uint32_t postingsLength, uint32_t positionsLength) {
     Bytes postings({_postings.at, postingsLength});
     Bytes positions({_positions.at, positionsLength});
+    BitReader packed(positions.at, positions.end);
     _postings.at += postingsLength;
     _positions.at += positionsLength;
     uint32_t count = 0;
     bool isSound = postings.number(count) && count > 0;
     uint64_t next = 0;
     for (uint32_t i = 0; isSound && i < count; ++i) {
-      uint32_t head = 0;
-      uint32_t weight = 2;
-      isSound = postings.number(head) && next + (head >> 1) < _view.documentCount() &&
-                ((head & 1) == 0 || postings.number(weight)) && weight >= 2 &&
-                weight <= format::maximumWeight;
+      uint32_t weight = 0;
+      isSound = _readPosting(postings, next, weight) && weight <= format::maximumWeight;
       if (isSound) {
-        next += head >> 1;
-        isSound = _checkPositions(positions, _words[static_cast<size_t>(next)]);
-        ++next;
+        uint64_t& words = _words[static_cast<size_t>(next - 1)];
+        isSound = _view.hasPackedPositions()
+                      ? _checkPackedPositions(
+                            packed, _view.documentLength(static_cast<uint32_t>(next - 1)), words)
+                      : _checkPositions(positions, words);
       }
     }
-    if (!isSound || postings.left() != 0 || positions.left() != 0) {
+    const bool isAtEnd = _view.hasPackedPositions() ? packed.isAtEnd() : positions.left() == 0;
+    if (!isSound || postings.left() != 0 || !isAtEnd) {
       _problems.add("term {}: its postings or positions are broken", number + 1);
       _wordsAreKnown = false;
     }
+  }
+
+  // Raises `next` to the number above the document's.
+  bool _readPosting(Bytes& postings, uint64_t& next, uint32_t& weight) const {
+    const uint32_t mask = (uint32_t{1} << _view.weightBits()) - 1;
+    uint32_t head = 0;
+    if (!postings.number(head) || next + (head >> _view.weightBits()) >= _view.documentCount()) {
+      return false;
+    }
+    next += (head >> _view.weightBits()) + 1;
+    weight = (head & mask) + 1;
+    return weight <= mask || (postings.number(weight) && weight > mask);
+  }
+
+  static bool _checkPackedPositions(BitReader& positions, uint32_t documentLength,
+                                    uint64_t& words) {
+    uint32_t count = 0;
+    uint32_t length = 0;
+    if (!positions.readCount(count) ||
+        (count >= fewestPositionsWithLength && !positions.readCount(length))) {
+      return false;
+    }
+    const uint64_t begin = positions.position();
+    const uint32_t lowBits = positionBits(documentLength, count);
+    uint64_t position = 0;
+    for (uint32_t i = 0; i < count; ++i) {
+      uint32_t distance = 0;
+      if (!positions.readDistance(lowBits, distance)) {
+        return false;
+      }
+      position += uint64_t{distance} + (i > 0 ? 1 : 0);
+      if (position > UINT32_MAX) {
+        return false;
+      }
+      ++words;
+    }
+    return length == 0 || positions.position() - begin == length;
   }
 
   // The positions of one document, which are counted.
@@ -233,6 +277,62 @@ class Check {
     if (sum != _view.wordCount()) {
       _problems.add("the pages have {} words, but the header says {}", sum, _view.wordCount());
     }
+  }
+
+  // Each must say what the terms' own lists say.
+  void _checkMergedLists() {
+    const std::span<const uint8_t> section = _view.section(Section::mergedLists);
+    if (_view.mergedCount() == 0 && !section.empty()) {
+      _problems.add("the tables of the merged lists do not fit their section");
+      return;
+    }
+    std::vector<uint64_t> frequencies(_view.documentCount());
+    for (uint32_t list = 0; list < _view.mergedCount() && !_problems.isFull(); ++list) {
+      const size_t begin = _view.mergedEntry(list, format::mergedOffsetAt);
+      const bool isLast = list + 1 == _view.mergedCount();
+      const size_t end =
+          isLast ? section.size() : _view.mergedEntry(list + 1, format::mergedOffsetAt);
+      const bool isInOrder = list == 0 || _view.mergedKey(list) > _view.mergedKey(list - 1);
+      if (!isInOrder || begin > end || end > section.size() ||
+          !_isMergedOfItsTerms(list, Bytes(section.subspan(begin, end - begin)), frequencies)) {
+        _problems.add("merged list {}: it is not that of its terms", list + 1);
+      }
+    }
+  }
+
+  bool _isMergedOfItsTerms(uint32_t list, Bytes bytes, std::vector<uint64_t>& frequencies) const {
+    QueryWord word;
+    word.isPrefix = true;
+    for (uint64_t key = _view.mergedKey(list); key != 0; key <<= 8) {
+      word.term += static_cast<char>(key >> 56);
+    }
+    word.firstKey = format::blockKey(word.term);
+    word.lastKey =
+        word.firstKey | (word.term.size() < 8 ? ~uint64_t{0} >> word.term.size() * 8 : 0);
+    const WordPostings terms = findWord(_view, word);
+    PostingsCursor cursor(_view, terms.range);
+    uint64_t factor = terms.beginsWithExactTerm ? static_cast<uint64_t>(exactFactor) : 1;
+    uint64_t documentSum = 0;
+    for (; cursor.beginList(); factor = 1) {
+      documentSum += cursor.listDocumentCount();
+      while (cursor.next()) {
+        frequencies[cursor.document()] += factor * cursor.weight();
+      }
+    }
+    uint32_t count = 0;
+    bool isSound =
+        documentSum == _view.mergedEntry(list, format::mergedDocumentSumAt) && bytes.number(count);
+    uint64_t next = 0;
+    for (uint32_t i = 0; isSound && i < count; ++i) {
+      uint32_t weight = 0;
+      isSound = _readPosting(bytes, next, weight) &&
+                std::exchange(frequencies[static_cast<size_t>(next - 1)], 0) == weight;
+    }
+    const auto isZero = [](uint64_t frequency) { return frequency == 0; };
+    isSound =
+        isSound && bytes.left() == 0 && std::all_of(frequencies.begin(), frequencies.end(), isZero);
+    std::fill(frequencies.begin(), frequencies.end(), 0);
+    return isSound;
   }
 
   const SKIndex& _index;

@@ -20,6 +20,8 @@ std::string_view sectionName(uint32_t id) noexcept {
       return "stored text";
     case Section::positions:
       return "positions";
+    case Section::mergedLists:
+      return "merged lists";
   }
   return "unknown";
 }

@@ -15,7 +15,10 @@ static_assert(std::endian::native == std::endian::little,
 
 inline constexpr char magic[8] = {'\x89', 'S', 'K', 'I', 'X', '\r', '\n', '\x1a'};
 /// Raised when earlier readers cannot read what is written; they refuse it.
-inline constexpr uint16_t version = 1;
+inline constexpr uint16_t version = 2;
+/// In the first version positions were whole bytes, and postings had one bit for the weight; all
+/// else was as now. It is still read.
+inline constexpr uint16_t firstVersion = 1;
 /// Raised when something is added that earlier readers of the version may skip.
 inline constexpr uint16_t revision = 0;
 
@@ -55,8 +58,11 @@ enum class Section : uint32_t {
   postings = 6,
   storedText = 7,
   positions = 8,
+  mergedLists = 9,
 };
-inline constexpr uint32_t lastKnownSection = 8;
+inline constexpr uint32_t lastKnownSection = 9;
+/// Those from 1 to this are in every index.
+inline constexpr uint32_t lastRequiredSection = 8;
 
 /// What the format's description calls a section.
 std::string_view sectionName(uint32_t id) noexcept;
@@ -86,8 +92,34 @@ inline constexpr uint32_t maximumTermsPerBlock = 4096;
 /// Longer terms are cut, at a character; so every length in the dictionary is one byte.
 inline constexpr size_t maximumTermBytes = 255;
 
+/// The lowest bits beside a document's number: its weight less 1, or all ones where the weight
+/// follows.
+inline constexpr uint32_t weightBits = 2;
+inline constexpr uint32_t weightBitsOfFirstVersion = 1;
+
+/// What stands in a list for a document: `difference` is its number less the one that was to be
+/// expected.
+inline constexpr uint32_t postingNumber(uint32_t difference, uint32_t weight) noexcept {
+  constexpr uint32_t mask = (1 << weightBits) - 1;
+  return difference << weightBits | (weight > mask ? mask : weight - 1);
+}
+inline constexpr bool weightFollows(uint32_t weight) noexcept {
+  return weight >= uint32_t{1} << weightBits;
+}
+
 /// Weighted frequencies above this are written as this.
 inline constexpr uint32_t maximumWeight = 0xFFFF;
+
+// The merged lists begin with their number; then the keys of all, then an entry for each.
+inline constexpr size_t mergedHeaderLength = 8;
+inline constexpr size_t mergedKeyLength = 8;
+inline constexpr size_t mergedEntryLength = 8;
+inline constexpr size_t mergedOffsetAt = 0;
+inline constexpr size_t mergedDocumentSumAt = 4;
+/// Prefixes of more characters have no merged lists.
+inline constexpr size_t maximumMergedCharacters = 4;
+/// Frequencies in merged lists are below this, so that a float has them exactly.
+inline constexpr uint32_t mergedFrequencyLimit = 1 << 24;
 
 /// Numbers in the index's bytes have no particular alignment: the bytes may be any slice.
 template <typename Integer>
@@ -109,6 +141,18 @@ inline uint64_t blockKey(std::string_view term) noexcept {
     std::memcpy(&key, term.data(), term.size() < sizeof key ? term.size() : sizeof key);
   }
   return __builtin_bswap64(key);
+}
+
+/// The key of a prefix among the merged lists: its bytes as those of a block's first term. 0 for
+/// prefixes that have no such list in any index.
+inline uint64_t mergedKey(std::string_view prefix) noexcept {
+  size_t characters = 0;
+  for (const char byte : prefix) {
+    characters += (static_cast<uint8_t>(byte) & 0xC0) != 0x80 ? 1 : 0;
+  }
+  return prefix.size() > sizeof(uint64_t) || characters > maximumMergedCharacters
+             ? 0
+             : blockKey(prefix);
 }
 
 /// A number of up to 32 bits, seven bits a byte, the lowest first. False, with `at` anywhere

@@ -56,6 +56,8 @@ IndexSummary indexSummary(const SKIndex& index) {
   return summary;
 }
 
+const platform::Data& indexBytes(const SKIndex& index) { return index.data(); }
+
 uint32_t indexDocumentCount(const SKIndex& index) { return index.view().documentCount(); }
 
 std::optional<StoredDocument> indexDocument(const SKIndex& index, SKDocumentID id) {

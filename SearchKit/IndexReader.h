@@ -57,6 +57,10 @@ struct StoredDocument {
   std::optional<std::string_view> abstract;
 };
 
+/// The bytes that an index was opened with, for those who want to open it again later without
+/// holding the index itself.
+const platform::Data& indexBytes(const SKIndex& index);
+
 /// Documents are numbered from 0 in the order of their paths' bytes.
 uint32_t indexDocumentCount(const SKIndex& index);
 

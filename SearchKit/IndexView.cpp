@@ -13,7 +13,8 @@ std::optional<IndexView> IndexView::make(std::span<const uint8_t> bytes) {
   if (bytes.size() < format::headerLength ||
       !std::equal(std::begin(format::magic), std::end(format::magic),
                   reinterpret_cast<const char*>(header)) ||
-      load<uint16_t>(header + format::versionAt) != format::version ||
+      (load<uint16_t>(header + format::versionAt) != format::version &&
+       load<uint16_t>(header + format::versionAt) != format::firstVersion) ||
       load<uint32_t>(header + format::tokenizerRulesAt) != searchkit::tokenizerRules) {
     return std::nullopt;
   }
@@ -26,6 +27,7 @@ std::optional<IndexView> IndexView::make(std::span<const uint8_t> bytes) {
     return std::nullopt;
   }
   IndexView view;
+  view._hasPackedPositions = load<uint16_t>(header + format::versionAt) == format::version;
   view._documentCount = load<uint32_t>(header + format::documentCountAt);
   view._termCount = load<uint32_t>(header + format::termCountAt);
   view._wordCount = load<uint64_t>(header + format::wordCountAt);
@@ -42,6 +44,7 @@ std::optional<IndexView> IndexView::make(std::span<const uint8_t> bytes) {
       !view._hasSoundTables()) {
     return std::nullopt;
   }
+  view._mergedCount = view._measuredMergedCount();
   return view;
 }
 
@@ -66,7 +69,8 @@ bool IndexView::_readSections(std::span<const uint8_t> bytes, size_t headerEnd, 
     found[id] = true;
     _sections[id] = bytes.subspan(static_cast<size_t>(offset), static_cast<size_t>(length));
   }
-  return std::all_of(std::begin(found) + 1, std::end(found), [](bool isThere) { return isThere; });
+  return std::all_of(found + 1, found + format::lastRequiredSection + 1,
+                     [](bool isThere) { return isThere; });
 }
 
 bool IndexView::_hasSoundTables() const noexcept {
@@ -77,6 +81,19 @@ bool IndexView::_hasSoundTables() const noexcept {
          holds(Section::documentLengths, _documentCount, format::documentLengthLength) &&
          holds(Section::blockKeys, _blockCount, format::blockKeyLength) &&
          holds(Section::blockOffsets, _blockCount, format::blockOffsetLength);
+}
+
+// An index without merged lists, or with a table of them that does not fit, is searched without.
+uint32_t IndexView::_measuredMergedCount() const noexcept {
+  const std::span<const uint8_t> merged = section(Section::mergedLists);
+  if (merged.size() < format::mergedHeaderLength) {
+    return 0;
+  }
+  const auto count = load<uint32_t>(merged.data());
+  return count <= (merged.size() - format::mergedHeaderLength) /
+                      (format::mergedKeyLength + format::mergedEntryLength)
+             ? count
+             : 0;
 }
 
 std::optional<IndexView::Texts> IndexView::documentTexts(uint32_t id) const noexcept {

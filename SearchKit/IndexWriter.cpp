@@ -17,12 +17,14 @@
 namespace searchkit {
 namespace {
 
-// Between the last word of a title, heading or block and the first of the next. Words that were
-// left out for their length leave gaps as well; a phrase never bridges this one.
-constexpr uint32_t gapBetweenEntries = 100;
+// Between the last word of a title, heading or block and the first of the next, so that no phrase
+// bridges it. The words of a phrase have every position after one another, unless some were left
+// out for their length: then the gap is to be longer than any run of those.
+constexpr uint32_t gapBetweenEntries = 1;
+constexpr uint32_t gapWhereWordsAreLeftOut = 100;
 
-// The lowest bit beside a document number's difference says whether a weight follows.
-constexpr size_t maximumDocumentCount = 0x7FFFFFFF;
+// Beside a document number's difference there is room for the bits of a weight.
+constexpr size_t maximumDocumentCount = UINT32_MAX >> format::weightBits;
 
 struct Occurrence {
   uint32_t position;
@@ -125,7 +127,7 @@ void IndexWriter::Implementation::addText(std::string_view text, uint32_t weight
     }
     ++position;
   });
-  position += gapBetweenEntries;
+  position += options.minimumTermLength > 1 ? gapWhereWordsAreLeftOut : gapBetweenEntries;
 }
 
 void IndexWriter::Implementation::addWord(std::string_view text, uint32_t weight) {

@@ -56,7 +56,7 @@ bool PhraseReader::_readSlot(WorkBudget& budget, const DocumentFilter* filter) {
 bool PhraseReader::_readList(WorkBudget& budget, const DocumentFilter* filter) {
   const uint32_t offset = _slots[_slot].offset;
   const float factor = _scan->isExact() ? exactFactor : 1;
-  while (_postings.next() && _positions.nextDocument()) {
+  while (_postings.next() && _positions.nextDocument(_view.documentLength(_postings.document()))) {
     size_t units = 1;
     const uint32_t document = _postings.document();
     if (filter == nullptr || filter->has(document)) {

@@ -3,9 +3,11 @@
 
 #include <algorithm>
 #include <cstdint>
+#include <span>
 
 #include "SearchKit/Dictionary.h"
 #include "SearchKit/IndexFormat.h"
+#include "SearchKit/PackedPositions.h"
 #include "SearchKit/SKIndex.h"
 
 namespace searchkit {
@@ -17,8 +19,15 @@ class PostingsCursor {
  public:
   PostingsCursor() = default;
   PostingsCursor(const IndexView& view, ByteRange range) noexcept
-      : _documentCount(view.documentCount()) {
-    const std::span<const uint8_t> section = view.section(format::Section::postings);
+      : PostingsCursor(view, view.section(format::Section::postings), range,
+                       format::maximumWeight) {}
+  /// Lists of another section, whose weights may be higher.
+  PostingsCursor(const IndexView& view, std::span<const uint8_t> section, ByteRange range,
+                 uint32_t maximumWeight) noexcept
+      : _documentCount(view.documentCount()),
+        _maximumWeight(maximumWeight),
+        _weightBits(view.weightBits()),
+        _weightMask((uint32_t{1} << view.weightBits()) - 1) {
     const uint64_t end = std::min<uint64_t>(range.end, section.size());
     const uint64_t begin = std::min(range.begin, end);
     _at = section.data() + begin;
@@ -39,37 +48,60 @@ class PostingsCursor {
   /// How many documents the current list says it has.
   uint32_t listDocumentCount() const noexcept { return std::min(_listCount, _documentCount); }
 
-  /// Goes to the next document of the current list; false at its end.
-  bool next() noexcept {
+  /// Goes to the next document of the current list; false at its end. Inlined always: a call would
+  /// keep the cursor of a loop in memory.
+  [[gnu::always_inline]] bool next() noexcept {
     if (_left == 0) {
       return false;
     }
     --_left;
-    uint32_t number;
-    if (!format::readNumber(_at, _end, number)) {
-      return _stop();
+    // Nearly always one byte, or one and a weight of one byte: no branch on which of the two, which
+    // no processor could predict.
+    if (_end - _at >= 2) {
+      const uint32_t first = _at[0];
+      const uint32_t second = _at[1];
+      const uint32_t low = first & _weightMask;
+      const bool hasWeight = low == _weightMask;
+      if (((first | (hasWeight ? second : 0)) & 0x80) == 0) {
+        _at += hasWeight ? 2 : 1;
+        _weight = hasWeight ? second + (second == 0 ? 1 : 0) : low + 1;
+        return _take(first >> _weightBits);
+      }
     }
-    const uint64_t document = uint64_t{_next} + (number >> 1);
+    return _nextInMoreBytes();
+  }
+
+  uint32_t document() const noexcept { return _document; }
+  /// From 1 to format::maximumWeight, or to the limit given.
+  uint32_t weight() const noexcept { return _weight; }
+
+ private:
+  [[gnu::always_inline]] bool _take(uint32_t difference) noexcept {
+    const uint64_t document = uint64_t{_next} + difference;
     if (document >= _documentCount) {
       return _stop();
     }
     _document = static_cast<uint32_t>(document);
     _next = _document + 1;
-    _weight = 1;
-    if ((number & 1) != 0) {
-      if (!format::readNumber(_at, _end, _weight)) {
-        return _stop();
-      }
-      _weight = std::clamp<uint32_t>(_weight, 1, format::maximumWeight);
-    }
     return true;
   }
 
-  uint32_t document() const noexcept { return _document; }
-  /// From 1 to format::maximumWeight.
-  uint32_t weight() const noexcept { return _weight; }
+  [[gnu::always_inline]] bool _nextInMoreBytes() noexcept {
+    uint32_t number;
+    if (!format::readNumber(_at, _end, number)) {
+      return _stop();
+    }
+    const uint32_t low = number & _weightMask;
+    _weight = low + 1;
+    if (low == _weightMask) {
+      if (!format::readNumber(_at, _end, _weight)) {
+        return _stop();
+      }
+      _weight = std::clamp<uint32_t>(_weight, 1, _maximumWeight);
+    }
+    return _take(number >> _weightBits);
+  }
 
- private:
   bool _stop() noexcept {
     _at = _end;
     _left = 0;
@@ -79,6 +111,9 @@ class PostingsCursor {
   const uint8_t* _at = nullptr;
   const uint8_t* _end = nullptr;
   uint32_t _documentCount = 0;
+  uint32_t _maximumWeight = 0;
+  uint32_t _weightBits = 1;
+  uint32_t _weightMask = 1;
   uint32_t _listCount = 0;
   uint32_t _left = 0;
   uint32_t _next = 0;
@@ -91,16 +126,70 @@ class PostingsCursor {
 class PositionsCursor {
  public:
   PositionsCursor() = default;
-  PositionsCursor(const IndexView& view, ByteRange range) noexcept {
+  PositionsCursor(const IndexView& view, ByteRange range) noexcept
+      : _isPacked(view.hasPackedPositions()) {
     const std::span<const uint8_t> section = view.section(format::Section::positions);
     const uint64_t end = std::min<uint64_t>(range.end, section.size());
     const uint64_t begin = std::min(range.begin, end);
     _next = section.data() + begin;
     _end = section.data() + end;
+    _bits = BitReader(_next, _end);
   }
 
-  /// Goes to the positions of the next document; false where there are none.
-  bool nextDocument() noexcept {
+  /// Goes to the positions of the next document, which has so many words; false where there are
+  /// none.
+  bool nextDocument(uint32_t documentLength) noexcept {
+    return _isPacked ? _nextPackedDocument(documentLength) : _nextDocumentInBytes();
+  }
+
+  /// Goes to the next position in the current document; false after the last.
+  bool nextPosition() noexcept { return _isPacked ? _nextPackedPosition() : _nextInBytes(); }
+
+  uint32_t position() const noexcept { return _position; }
+
+ private:
+  bool _nextPackedDocument(uint32_t documentLength) noexcept {
+    if (_bitsOfRest > 0) {
+      _bits.skip(_bitsOfRest);
+    } else {
+      while (_nextPackedPosition()) {
+      }
+    }
+    _bitsOfRest = 0;
+    _isFirst = true;
+    _position = 0;
+    if (!_bits.readCount(_left)) {
+      _left = 0;
+      return false;
+    }
+    _lowBits = positionBits(documentLength, _left);
+    if (_left >= fewestPositionsWithLength && !_bits.readCount(_bitsOfRest)) {
+      _left = 0;
+      return false;
+    }
+    return true;
+  }
+
+  bool _nextPackedPosition() noexcept {
+    uint32_t distance;
+    if (_left == 0 || !_bits.readDistance(_lowBits, distance)) {
+      _left = 0;
+      return false;
+    }
+    // Once one is read, the others are what is left of the way to the next document.
+    _bitsOfRest = 0;
+    const uint64_t position = uint64_t{_position} + distance + (_isFirst ? 0 : 1);
+    if (position > UINT32_MAX) {
+      _left = 0;
+      return false;
+    }
+    --_left;
+    _isFirst = false;
+    _position = static_cast<uint32_t>(position);
+    return true;
+  }
+
+  bool _nextDocumentInBytes() noexcept {
     uint32_t length;
     _at = _next;
     if (!format::readNumber(_at, _end, length) || length > static_cast<size_t>(_end - _at)) {
@@ -112,8 +201,7 @@ class PositionsCursor {
     return true;
   }
 
-  /// Goes to the next position in the current document; false after the last.
-  bool nextPosition() noexcept {
+  bool _nextInBytes() noexcept {
     uint32_t difference;
     if (!format::readNumber(_at, _next, difference) || difference > UINT32_MAX - _position) {
       _at = _next;
@@ -123,13 +211,18 @@ class PositionsCursor {
     return true;
   }
 
-  uint32_t position() const noexcept { return _position; }
-
- private:
+  bool _isPacked = false;
+  uint32_t _position = 0;
+  // Packed.
+  BitReader _bits;
+  uint32_t _left = 0;
+  uint32_t _lowBits = 0;
+  uint32_t _bitsOfRest = 0;
+  bool _isFirst = true;
+  // In bytes.
   const uint8_t* _at = nullptr;
   const uint8_t* _next = nullptr;
   const uint8_t* _end = nullptr;
-  uint32_t _position = 0;
 };
 
 }  // namespace searchkit

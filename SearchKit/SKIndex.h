@@ -27,6 +27,11 @@ class IndexView {
   uint32_t tokenizerRules() const noexcept { return _tokenizerRules; }
   uint32_t minimumTermLength() const noexcept { return _minimumTermLength; }
   uint32_t termsPerBlock() const noexcept { return _termsPerBlock; }
+  /// How many bits beside a document's number are for its weight.
+  uint32_t weightBits() const noexcept {
+    return _hasPackedPositions ? format::weightBits : format::weightBitsOfFirstVersion;
+  }
+  bool hasPackedPositions() const noexcept { return _hasPackedPositions; }
   uint32_t blockCount() const noexcept { return _blockCount; }
 
   std::span<const uint8_t> section(format::Section id) const noexcept {
@@ -50,6 +55,23 @@ class IndexView {
                                   size_t{block} * format::blockOffsetLength + field);
   }
 
+  /// How many prefixes have merged lists; their tables can be read without a further check.
+  uint32_t mergedCount() const noexcept { return _mergedCount; }
+
+  uint64_t mergedKey(uint32_t list) const noexcept {
+    return format::load<uint64_t>(section(format::Section::mergedLists).data() +
+                                  format::mergedHeaderLength +
+                                  size_t{list} * format::mergedKeyLength);
+  }
+
+  /// One of the two fields of a list's entry (format::mergedOffsetAt …).
+  uint32_t mergedEntry(uint32_t list, size_t field) const noexcept {
+    return format::load<uint32_t>(section(format::Section::mergedLists).data() +
+                                  format::mergedHeaderLength +
+                                  size_t{_mergedCount} * format::mergedKeyLength +
+                                  size_t{list} * format::mergedEntryLength + field);
+  }
+
   /// What the index keeps of a document; absent when there is none or its record is broken.
   struct Texts {
     std::string_view path;
@@ -64,6 +86,7 @@ class IndexView {
  private:
   bool _readSections(std::span<const uint8_t> bytes, size_t headerEnd, uint32_t count);
   bool _hasSoundTables() const noexcept;
+  uint32_t _measuredMergedCount() const noexcept;
 
   uint32_t _documentCount = 0;
   uint32_t _termCount = 0;
@@ -72,6 +95,8 @@ class IndexView {
   uint32_t _minimumTermLength = 0;
   uint32_t _termsPerBlock = 0;
   uint32_t _blockCount = 0;
+  uint32_t _mergedCount = 0;
+  bool _hasPackedPositions = false;
   std::span<const uint8_t> _sections[format::lastKnownSection + 1];
 };
 

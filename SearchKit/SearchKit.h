@@ -23,8 +23,12 @@ class SKSearch;
 /// A document by name: its path within the book, beginning with a slash. Thread-safety: immutable.
 class SKDocument;
 
+/// A query by itself, for any number of indexes. Thread-safety: internally synchronised.
+class SKQuery;
+
 using SKIndexRef = std::shared_ptr<const SKIndex>;
 using SKSearchRef = std::shared_ptr<SKSearch>;
+using SKQueryRef = std::shared_ptr<const SKQuery>;
 using SKDocumentRef = std::shared_ptr<const SKDocument>;
 
 /// Number of a document within its index, from 0.
@@ -62,6 +66,12 @@ std::vector<std::string> SKIndexCopyUniqueTerms(const SKIndexRef& index, std::st
 /// how). The search keeps the index alive. Null only without an index.
 SKSearchRef SKSearchCreate(const SKIndexRef& index, std::string_view query,
                            SKSearchOptions options);
+
+/// The same in two steps, for a query that is put to several indexes: it is read once. Never null.
+SKQueryRef SKQueryCreate(std::string_view query, SKSearchOptions options);
+
+/// Null only without an index or a query. The search keeps both alive.
+SKSearchRef SKSearchCreateWithQuery(const SKIndexRef& index, const SKQueryRef& query);
 
 /// Delivers up to `maximumCount` further hits, in no defined order, each document once a search.
 /// `ids` has room for `maximumCount` entries, as has `scores` unless it is null. Stops after

@@ -18,15 +18,18 @@ class WorkBudget {
 
   /// The clock must outlive the budget. What is no number is no time.
   WorkBudget(const platform::Clock& clock, double seconds)
-      : _clock(clock),
+      : _clock(&clock),
         _deadline(clock.elapsed() + platform::Seconds(std::isnan(seconds) ? 0 : seconds)) {}
+
+  /// For work known to end before the first look: no clock is asked.
+  WorkBudget() = default;
 
   /// Whether there is time for more after this.
   bool spend(size_t units) {
     _units += units;
     if (_units >= unitsPerLook) {
       _units = 0;
-      _isSpent = _isSpent || _clock.elapsed() >= _deadline;
+      _isSpent = _isSpent || (_clock != nullptr && _clock->elapsed() >= _deadline);
     }
     return !_isSpent;
   }
@@ -34,8 +37,8 @@ class WorkBudget {
   bool isSpent() const noexcept { return _isSpent; }
 
  private:
-  const platform::Clock& _clock;
-  platform::Clock::Instant _deadline;
+  const platform::Clock* _clock = nullptr;
+  platform::Clock::Instant _deadline{};
   size_t _units = 0;
   bool _isSpent = false;
 };

@@ -30,7 +30,40 @@ size_t mixed(size_t seed, std::string_view text) {
 }  // namespace
 
 ZEBResult::ZEBResult(std::optional<std::string> title, std::string type)
-    : _title(std::move(title)), _type(std::move(type)) {}
+    : _title(std::move(title)),
+      _ownType(std::make_unique<const std::string>(std::move(type))),
+      _type(_ownType.get()) {}
+
+struct ZEBResult::Block {
+  std::shared_ptr<const ZEBResultSource> source;
+  std::unique_ptr<ZEBResult[]> results;
+};
+
+void ZEBResult::appendResultsWithSource(const std::shared_ptr<const ZEBResultSource>& source,
+                                        std::span<const Sourced> results, const std::string& type,
+                                        std::vector<std::shared_ptr<ZEBResult>>& to) {
+  if (results.empty()) {
+    return;
+  }
+  const auto block = std::make_shared<Block>();
+  block->source = source;
+  block->results.reset(new ZEBResult[results.size()]);
+  for (size_t i = 0; i < results.size(); ++i) {
+    ZEBResult& result = block->results[i];
+    result._source = source.get();
+    result._numberInSource = results[i].number;
+    result._type = &type;
+    result._relevance = results[i].relevance;
+    to.emplace_back(block, &result);
+  }
+}
+
+void ZEBResult::_fetchFromSource() const {
+  ZEBResultSource::Content content = _source->contentOfResult(_numberInSource);
+  _title = std::move(content.title);
+  _payload = std::move(content.payload);
+  _source = nullptr;
+}
 
 std::shared_ptr<ZEBResult> ZEBResult::initWithTitle(std::optional<std::string> title,
                                                     std::string type) {
@@ -42,13 +75,15 @@ std::shared_ptr<ZEBResult> ZEBResult::resultWithTitle(std::optional<std::string>
   return initWithTitle(std::move(title), std::move(type));
 }
 
-const platform::Value& ZEBResult::payloadValueForKey(std::string_view key) const noexcept {
+const platform::Value& ZEBResult::payloadValueForKey(std::string_view key) const {
   static const platform::Value absent{};
+  _fetch();
   const auto entry = _payload.find(key);
   return entry == _payload.end() ? absent : entry->second;
 }
 
 void ZEBResult::setPayload(platform::Value::Dictionary payload, PayloadKind kind) {
+  _fetch();
   _payload = std::move(payload);
   _payloadKind = kind;
 }
@@ -71,15 +106,15 @@ std::optional<std::string> ZEBResult::bookID() const {
 
 bool ZEBResult::isEqual(const ZEBResult& other) const {
   const std::string* url = textOf(payloadValueForKey(ZEBResultURLKey));
-  return _type == other._type &&
+  return type() == other.type() &&
          sameText(textOf(payloadValueForKey(ZEBResultBookIDKey)),
                   textOf(other.payloadValueForKey(ZEBResultBookIDKey))) &&
          sameText(url, textOf(other.payloadValueForKey(ZEBResultURLKey))) &&
-         (url != nullptr || _title == other._title);
+         (url != nullptr || title() == other.title());
 }
 
 size_t ZEBResult::hash() const {
-  size_t hash = mixed(0, _type);
+  size_t hash = mixed(0, type());
   if (const std::string* book = textOf(payloadValueForKey(ZEBResultBookIDKey))) {
     hash = mixed(hash, *book);
   }
@@ -90,8 +125,8 @@ size_t ZEBResult::hash() const {
 }
 
 std::string ZEBResult::description() const {
-  return ZEBStringWithFormat("%@ \"%@\" relevance: %@ payload: %@", _type, _title, _relevance,
-                             _payload);
+  return ZEBStringWithFormat("%@ \"%@\" relevance: %@ payload: %@", type(), title(), _relevance,
+                             payload());
 }
 
 size_t ZEBResultHash::operator()(const std::shared_ptr<ZEBResult>& result) const {

@@ -2,13 +2,31 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <memory>
 #include <optional>
+#include <span>
 #include <string>
 #include <string_view>
 #include <unordered_set>
+#include <vector>
 
 #include "platform/Value.h"
+
+/// Where records come from that are not put together before somebody looks: a search finds hundreds
+/// of pages of which a handful are shown. Thread-safety: immutable.
+class ZEBResultSource {
+ public:
+  struct Content {
+    std::optional<std::string> title;
+    platform::Value::Dictionary payload;
+  };
+
+  virtual ~ZEBResultSource() = default;
+
+  /// Title and payload of a record, by its number in the source. The same at each call.
+  virtual Content contentOfResult(uint32_t number) const = 0;
+};
 
 /// A record of something found: title, kind, relevance, and a payload of further facts.
 ///
@@ -32,20 +50,41 @@ class ZEBResult {
   static std::shared_ptr<ZEBResult> initWithTitle(std::optional<std::string> title,
                                                   std::string andType);
 
+  /// What a source has of one record.
+  struct Sourced {
+    uint32_t number = 0;
+    double relevance = 0;
+  };
+  /// Appends a record for each, with immutable payloads. `type` must outlive all records. Title and
+  /// payload are fetched when first asked for. The records share their memory and the source, which
+  /// stay as long as any of them.
+  static void appendResultsWithSource(const std::shared_ptr<const ZEBResultSource>& source,
+                                      std::span<const Sourced> results, const std::string& type,
+                                      std::vector<std::shared_ptr<ZEBResult>>& to);
+
+  ZEBResult(const ZEBResult&) = delete;
+  ZEBResult& operator=(const ZEBResult&) = delete;
+
   /// What the user is shown.
-  const std::optional<std::string>& title() const noexcept { return _title; }
+  const std::optional<std::string>& title() const {
+    _fetch();
+    return _title;
+  }
 
   /// The result kind.
-  const std::string& type() const noexcept { return _type; }
+  const std::string& type() const noexcept { return *_type; }
 
   /// A number, integer or real, higher for better results; absent until it is set.
   const platform::Value& relevance() const noexcept { return _relevance; }
   void setRelevance(platform::Value relevance) { _relevance = std::move(relevance); }
 
   /// Facts by ZEBResult…Key; empty until it is set.
-  const platform::Value::Dictionary& payload() const noexcept { return _payload; }
+  const platform::Value::Dictionary& payload() const {
+    _fetch();
+    return _payload;
+  }
   /// One entry of the payload; absent when there is none.
-  const platform::Value& payloadValueForKey(std::string_view key) const noexcept;
+  const platform::Value& payloadValueForKey(std::string_view key) const;
 
   /// Replaces the payload.
   void setPayload(platform::Value::Dictionary payload, PayloadKind kind = PayloadKind::immutable);
@@ -71,12 +110,28 @@ class ZEBResult {
   std::string description() const;
 
  private:
+  struct Block;
+
+  ZEBResult() = default;
   ZEBResult(std::optional<std::string> title, std::string type);
 
-  std::optional<std::string> _title;
-  std::string _type;
+  /// Title and payload are there afterwards.
+  void _fetch() const {
+    if (_source != nullptr) {
+      _fetchFromSource();
+    }
+  }
+  void _fetchFromSource() const;
+
+  // The two that a source may still have.
+  mutable std::optional<std::string> _title;
+  mutable platform::Value::Dictionary _payload;
+  /// Null once nothing is to be fetched any more. Kept alive by the block that the record is in.
+  mutable const ZEBResultSource* _source = nullptr;
+  uint32_t _numberInSource = 0;
+  std::unique_ptr<const std::string> _ownType;
+  const std::string* _type = nullptr;
   platform::Value _relevance;
-  platform::Value::Dictionary _payload;
   PayloadKind _payloadKind = PayloadKind::immutable;
 };
 

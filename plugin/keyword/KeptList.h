@@ -22,6 +22,9 @@ class KeptList {
   /// a score that is not a number included, is dropped.
   void add(SKDocumentID id, float score);
 
+  /// As if new; keeps its memory for the next search.
+  void clear() noexcept;
+
   bool empty() const noexcept { return _ids.empty(); }
   size_t count() const noexcept { return _ids.size(); }
   /// Entries for which there is room: 0, then 50, 76, 115, 173, …

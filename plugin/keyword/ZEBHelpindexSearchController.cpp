@@ -2,10 +2,12 @@
 
 #include <algorithm>
 #include <array>
+#include <functional>
+#include <span>
 #include <utility>
 
+#include "SearchKit/IndexReader.h"
 #include "SearchKit/SearchKit.h"
-#include "host/Zebrine/ZEBCheckClass.h"
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "host/Zebrine/ZEBLog.h"
@@ -41,10 +43,10 @@ std::vector<URL> urlsOfStrings(const std::vector<std::string>& strings) {
   return urls;
 }
 
-KeptList bestHits(SKSearch& search) {
-  KeptList kept;
-  std::array<SKDocumentID, batchSize> ids{};
-  std::array<float, batchSize> scores{};
+void findBestHits(SKSearch& search, KeptList& kept) {
+  std::array<SKDocumentID, batchSize> ids;
+  std::array<float, batchSize> scores;
+  kept.clear();
   bool mayHaveMore = true;
   while (mayHaveMore) {
     size_t found = 0;
@@ -54,7 +56,6 @@ KeptList bestHits(SKSearch& search) {
       kept.add(ids[i], scores[i]);
     }
   }
-  return kept;
 }
 
 struct PageLocation {
@@ -73,6 +74,14 @@ PageLocation locationOfPage(const SKDocument& document, const std::shared_ptr<ZE
   std::string string = ZEBStringWithFormat("file://%@%@", parentPath, path);
   std::optional<URL> url = URLByEscapingString(string);
   return {std::move(string), std::move(url)};
+}
+
+Value::Dictionary payloadOfPage(const URL& url, std::string abstract, int32_t indexID,
+                                std::string bookID) {
+  return {{ZEBResultURLKey, url.absoluteString()},
+          {ZEBResultAbstractKey, std::move(abstract)},
+          {ZEBResultIndexIDKey, indexID},
+          {ZEBResultBookIDKey, std::move(bookID)}};
 }
 
 // The record for a hit; null, and logged, when the index does not have all that belongs to one.
@@ -94,14 +103,68 @@ std::shared_ptr<ZEBResult> resultForPage(const ZEBHelpindexIndex& index, const S
            location.fileURLString, location.url, abstract);
     return nullptr;
   }
-  result->setPayload({{ZEBResultURLKey, location.url->absoluteString()},
-                      {ZEBResultAbstractKey, *abstract},
-                      {ZEBResultIndexIDKey, index.indexID()},
-                      {ZEBResultBookIDKey, *bookID}});
+  result->setPayload(payloadOfPage(*location.url, *abstract, index.indexID(), *bookID));
   return result;
 }
 
+// The plain pages of one index, as records that are put together when somebody looks at them.
+class KeywordHits : public ZEBResultSource {
+ public:
+  KeywordHits(const SKIndexRef& index, std::optional<std::string> parentPath, std::string bookID,
+              int32_t indexID)
+      : _bytes(searchkit::indexBytes(*index)),
+        _parentPath(std::move(parentPath)),
+        _bookID(std::move(bookID)),
+        _indexID(indexID) {}
+
+  Content contentOfResult(uint32_t number) const override {
+    const SKIndexRef index = SKIndexOpenWithData(_bytes);
+    const SKDocumentID id = number;
+    const std::vector<SKDocumentRef> documents =
+        SKIndexCopyDocumentRefsForDocumentIDs(index, std::span(&id, 1));
+    const std::optional<Value> properties = SKIndexCopyDocumentProperties(index, *documents[0]);
+    const PageLocation location = locationOfPage(*documents[0], nullptr, _parentPath);
+    return {(*properties)["T"].stringValue(),
+            payloadOfPage(*location.url, (*properties)["D"].stringValue().value_or(""), _indexID,
+                          _bookID)};
+  }
+
+ private:
+  platform::Data _bytes;
+  std::optional<std::string> _parentPath;
+  std::string _bookID;
+  int32_t _indexID;
+};
+
 }  // namespace
+
+// One pass over the indices.
+struct ZEBHelpindexSearchController::Pass {
+  explicit Pass(std::string_view text) : queryString(text) {}
+
+  /// Which page of which of the indices a record is.
+  struct Origin {
+    size_t index;
+    SKDocumentID page;
+  };
+
+  std::string_view queryString;
+  SKSearchOptions options = kSKSearchOptionDefault;
+  std::vector<URL> ignoredURLs;
+  size_t index = 0;
+  Results results;
+  /// Of each result, as long as all are plain; then two records are equal only when their origins
+  /// are, or when two of the indices are of one book.
+  std::vector<Origin> origins;
+  bool isPlain = true;
+
+  /// The query as the engine takes it. What it is split into is the same for all indexes that the
+  /// engine opens at all, so it is composed once.
+  SKQueryRef query;
+  // Used again from one index to the next.
+  KeptList kept;
+  std::vector<ZEBResult::Sourced> sourced;
+};
 
 std::shared_ptr<ZEBHelpindexSearchController> ZEBHelpindexSearchController::init() {
   return std::shared_ptr<ZEBHelpindexSearchController>(new ZEBHelpindexSearchController);
@@ -109,71 +172,148 @@ std::shared_ptr<ZEBHelpindexSearchController> ZEBHelpindexSearchController::init
 
 ZEBHelpindexSearchController::Results ZEBHelpindexSearchController::doSearchForString(
     std::string_view queryString, const Indices& inIndices, const IgnoredURLs& ignoringURLs) {
+  Pass all = _runPass(queryString, inIndices, ignoringURLs, true);
+  const bool booksAreDifferent = _haveDifferentBooks(inIndices);
+  if (all.isPlain && booksAreDifferent && all.results.size() >= enoughResults) {
+    return std::move(all.results);
+  }
+  if (all.isPlain && booksAreDifferent) {
+    Pass any = _runPass(queryString, inIndices, ignoringURLs, false);
+    if (any.isPlain) {
+      return _united(std::move(all), std::move(any));
+    }
+    return _distinct(std::move(all.results), std::move(any.results));
+  }
+  Results distinct = _distinct(std::move(all.results), {});
+  if (distinct.size() >= enoughResults) {
+    return distinct;
+  }
+  return _distinct(std::move(distinct),
+                   _doSearchForString(queryString, inIndices, ignoringURLs, false));
+}
+
+// Without repetition, of two equal records the first.
+ZEBHelpindexSearchController::Results ZEBHelpindexSearchController::_distinct(Results first,
+                                                                              Results second) {
   ZEBResultSet found;
   Results results;
-  const auto search = [&](bool useAndSearch) {
-    for (auto& result : _doSearchForString(queryString, inIndices, ignoringURLs, useAndSearch)) {
+  for (Results* const some : {&first, &second}) {
+    for (std::shared_ptr<ZEBResult>& result : *some) {
       if (found.insert(result).second) {
         results.push_back(std::move(result));
       }
     }
-  };
-  search(true);
-  if (found.size() < enoughResults) {
-    search(false);
   }
   return results;
+}
+
+// The same for plain records of different books, of which `all` are few.
+ZEBHelpindexSearchController::Results ZEBHelpindexSearchController::_united(Pass all, Pass any) {
+  Results results = std::move(all.results);
+  results.reserve(results.size() + any.results.size());
+  for (size_t i = 0; i < any.results.size(); ++i) {
+    const Pass::Origin origin = any.origins[i];
+    const bool isThere =
+        std::any_of(all.origins.begin(), all.origins.end(), [origin](const Pass::Origin& other) {
+          return other.page == origin.page && other.index == origin.index;
+        });
+    if (!isThere) {
+      results.push_back(std::move(any.results[i]));
+    }
+  }
+  return results;
+}
+
+bool ZEBHelpindexSearchController::_haveDifferentBooks(const Indices& indices) {
+  std::vector<size_t> hashes;
+  hashes.reserve(indices.size());
+  for (const std::shared_ptr<ZEBIndex>& index : indices) {
+    hashes.push_back(index ? std::hash<std::string>{}(index->bookID().value_or("")) : 0);
+  }
+  std::sort(hashes.begin(), hashes.end());
+  return std::adjacent_find(hashes.begin(), hashes.end()) == hashes.end();
 }
 
 ZEBHelpindexSearchController::Results ZEBHelpindexSearchController::_doSearchForString(
     std::string_view queryString, const Indices& inIndices, const IgnoredURLs& ignoringURLs,
     bool useAndSearch) {
-  const std::vector<URL> ignoredURLs = urlsOfStrings(ignoringURLs);
-  Results results;
-  for (const std::shared_ptr<ZEBIndex>& candidate : inIndices) {
-    const auto index = zebCheckClass<ZEBHelpindexIndex>(candidate);
-    if (index && index->isSearchable()) {
-      _searchIndex(*index, queryString, ignoredURLs, useAndSearch, results);
-    }
-  }
-  return results;
+  return _runPass(queryString, inIndices, ignoringURLs, useAndSearch).results;
 }
 
-void ZEBHelpindexSearchController::_searchIndex(ZEBHelpindexIndex& index,
-                                                std::string_view queryString,
-                                                const std::vector<URL>& ignoredURLs,
-                                                bool useAndSearch, Results& results) {
+ZEBHelpindexSearchController::Pass ZEBHelpindexSearchController::_runPass(
+    std::string_view queryString, const Indices& inIndices, const IgnoredURLs& ignoringURLs,
+    bool useAndSearch) {
+  Pass pass(queryString);
+  pass.options = useAndSearch ? kSKSearchOptionDefault : kSKSearchOptionSpaceMeansOR;
+  pass.ignoredURLs = urlsOfStrings(ignoringURLs);
+  for (; pass.index < inIndices.size(); ++pass.index) {
+    auto* const index = dynamic_cast<ZEBHelpindexIndex*>(inIndices[pass.index].get());
+    if (index != nullptr && index->isSearchable()) {
+      _searchIndex(*index, pass);
+    }
+  }
+  return pass;
+}
+
+void ZEBHelpindexSearchController::_searchIndex(ZEBHelpindexIndex& index, Pass& pass) {
   const std::shared_ptr<ZEBHelpBook> book = _bookOfIndex(index);
-  const std::optional<std::string> parentPath = _parentPath(index, book);
   SKIndexRef indexRef = index.copyIndexRef();
   if (!indexRef) {
     return;
   }
-  const std::string query =
-      _prepareQuery(queryString, SKIndexCopyUniqueTerms(indexRef, queryString));
-  SKSearchRef search = SKSearchCreate(
-      indexRef, query, useAndSearch ? kSKSearchOptionDefault : kSKSearchOptionSpaceMeansOR);
+  if (!pass.query) {
+    pass.query = SKQueryCreate(
+        _prepareQuery(pass.queryString, SKIndexCopyUniqueTerms(indexRef, pass.queryString)),
+        pass.options);
+  }
+  SKSearchRef search = SKSearchCreateWithQuery(indexRef, pass.query);
   if (search) {
-    const KeptList kept = bestHits(*search);
-    std::vector<SKDocumentRef> documents =
-        SKIndexCopyDocumentRefsForDocumentIDs(indexRef, kept.ids());
-    for (size_t i = 0; i < documents.size(); ++i) {
-      const SKDocumentRef document = std::exchange(documents[i], nullptr);
-      if (!document) {
-        continue;
-      }
-      const PageLocation location = locationOfPage(*document, book, parentPath);
-      if (!ignoredURLs.empty() && location.url &&
-          _arrayOfURLsContainsURL(ignoredURLs, *location.url)) {
-        continue;
-      }
-      if (auto result = resultForPage(index, indexRef, *document, location, kept.scores()[i])) {
-        results.push_back(std::move(result));
-      }
+    findBestHits(*search, pass.kept);
+    search.reset();
+    if (!pass.kept.empty()) {
+      _addResults(index, book, indexRef, pass);
     }
   }
-  search.reset();
   index.disposeIndexRef(indexRef);
+}
+
+// Records of the hits kept, in their order.
+void ZEBHelpindexSearchController::_addResults(ZEBHelpindexIndex& index,
+                                               const std::shared_ptr<ZEBHelpBook>& book,
+                                               const SKIndexRef& indexRef, Pass& pass) {
+  const std::optional<std::string> parentPath = _parentPath(index, book);
+  const std::optional<std::string> bookID = index.bookID();
+  if (pass.ignoredURLs.empty() && bookID && !(book && book->type() == ZEBHelpBookType4) &&
+      (!parentPath || parentPath->find('\0') == std::string::npos) &&
+      index.hasPlainPages(indexRef)) {
+    pass.sourced.clear();
+    for (size_t i = 0; i < pass.kept.count(); ++i) {
+      const SKDocumentID id = pass.kept.ids()[i];
+      pass.sourced.push_back({id, static_cast<double>(pass.kept.scores()[i])});
+      pass.origins.push_back({pass.index, id});
+    }
+    ZEBResult::appendResultsWithSource(
+        std::make_shared<const KeywordHits>(indexRef, parentPath, *bookID, index.indexID()),
+        pass.sourced, ZEBHelpArticleResult, pass.results);
+    return;
+  }
+  pass.isPlain = false;
+  const std::vector<SKDocumentRef> documents =
+      SKIndexCopyDocumentRefsForDocumentIDs(indexRef, pass.kept.ids());
+  for (size_t i = 0; i < documents.size(); ++i) {
+    if (!documents[i]) {
+      continue;
+    }
+    const PageLocation location = locationOfPage(*documents[i], book, parentPath);
+    if (!pass.ignoredURLs.empty() && location.url &&
+        _arrayOfURLsContainsURL(pass.ignoredURLs, *location.url)) {
+      continue;
+    }
+    if (auto result =
+            resultForPage(index, indexRef, *documents[i], location, pass.kept.scores()[i])) {
+      pass.results.push_back(std::move(result));
+    }
+  }
 }
 
 std::string ZEBHelpindexSearchController::_prepareQuery(

@@ -9,6 +9,7 @@
 #include <utility>
 #include <vector>
 
+#include "SearchKit/SearchKit.h"
 #include "platform/URL.h"
 #include "platform/Value.h"
 #include "plugin/records/AtomicProperty.h"
@@ -78,9 +79,16 @@ class ZEBHelpindexSearchController {
 
   ZEBHelpindexSearchController() = default;
 
-  void _searchIndex(ZEBHelpindexIndex& index, std::string_view queryString,
-                    const std::vector<platform::URL>& ignoredURLs, bool useAndSearch,
-                    Results& results);
+  struct Pass;
+
+  Pass _runPass(std::string_view queryString, const Indices& inIndices,
+                const IgnoredURLs& ignoringURLs, bool useAndSearch);
+  void _searchIndex(ZEBHelpindexIndex& index, Pass& pass);
+  void _addResults(ZEBHelpindexIndex& index, const std::shared_ptr<ZEBHelpBook>& book,
+                   const SKIndexRef& indexRef, Pass& pass);
+  static Results _distinct(Results first, Results second);
+  static Results _united(Pass all, Pass any);
+  static bool _haveDifferentBooks(const Indices& indices);
   void _lookUpPaths(ZEBHelpindexIndex& index, const platform::Value::Array& paths,
                     Results& results);
 

@@ -1,8 +1,10 @@
 #include "plugin/records/ZEBHelpindexIndex.h"
 
+#include <string_view>
 #include <utility>
 #include <vector>
 
+#include "SearchKit/IndexReader.h"
 #include "host/Luxwell/HelpLUXIndex.h"
 #include "host/Zebrine/ZEBCheckClass.h"
 #include "host/Zebrine/ZEBLog.h"
@@ -32,6 +34,18 @@ std::optional<std::string> decodeString(platform::KeyedUnarchiver& coder, const 
   } catch (const platform::Exception&) {
     return std::nullopt;
   }
+}
+
+// Bytes that were an index and are not what was written any more. Searches would only find less and
+// could not tell why.
+bool isDamagedIndex(const std::optional<platform::Data>& data) {
+  const SKIndexRef index = data ? SKIndexOpenWithData(*data) : nullptr;
+  return index && !SKIndexVerifyChecksums(index);
+}
+
+bool isPlainPath(std::string_view path) {
+  return path.size() > 1 && path.front() == '/' && path.back() != '/' &&
+         path.find('%') == std::string_view::npos && path.find('\0') == std::string_view::npos;
 }
 
 }  // namespace
@@ -155,6 +169,7 @@ bool ZEBHelpindexIndex::_populateWithDictionary(const platform::Value& dictionar
   }
   _luxIndexData = zebCheckClass<platform::Data>(dictionary[luxIndexDataKey]);
   _indexData = zebCheckClass<platform::Data>(dictionary[indexDataKey]);
+  _isIndexDamaged = isDamagedIndex(_indexData);
   // Taken for granted until an index is opened and tells its number of terms.
   _isSearchable.store(true);
   if (root) {
@@ -175,6 +190,8 @@ bool ZEBHelpindexIndex::_populateWithDictionary(const platform::Value& dictionar
 void ZEBHelpindexIndex::_disposeRetainedData() {
   _anchorDictionary.set({});
   _indexData.reset();
+  _isIndexDamaged = false;
+  _hasPlainPages.reset();
   _luxIndexData.reset();
   _luxIndex.reset();
 }
@@ -184,12 +201,32 @@ SKIndexRef ZEBHelpindexIndex::copyIndexRef() {
   if (!_indexData) {
     return _indexRef.lock();
   }
-  SKIndexRef opened = SKIndexOpenWithData(*_indexData);
+  SKIndexRef opened = _isIndexDamaged ? nullptr : SKIndexOpenWithData(*_indexData);
   _indexRef = opened;
   if (opened) {
     _isSearchable.store(SKIndexGetMaximumTermID(opened) >= 1);
   }
   return opened;
+}
+
+bool ZEBHelpindexIndex::hasPlainPages(const SKIndexRef& indexRef) {
+  const platform::MonitorLock lock(_monitor);
+  // The record may have other data by now.
+  const bool isOfThisData =
+      _indexData && _indexData->bytes() == searchkit::indexBytes(*indexRef).bytes();
+  if (isOfThisData && _hasPlainPages) {
+    return *_hasPlainPages;
+  }
+  const uint32_t count = searchkit::indexDocumentCount(*indexRef);
+  bool arePlain = true;
+  for (uint32_t id = 0; arePlain && id < count; ++id) {
+    const auto page = searchkit::indexDocument(*indexRef, id);
+    arePlain = page && page->abstract && isPlainPath(page->path);
+  }
+  if (isOfThisData) {
+    _hasPlainPages = arePlain;
+  }
+  return arePlain;
 }
 
 void ZEBHelpindexIndex::disposeIndexRef(SKIndexRef& indexRef) const {

@@ -69,13 +69,19 @@ class ZEBHelpindexIndex : public ZEBIndex, public platform::KeyedCodable {
   /// leaves the record empty. Failures are logged.
   bool reinitializeWithData(const platform::Data& data) override;
 
-  /// Opens the keyword index anew. Null when the data is no index; isSearchable() then stays as it
-  /// is, otherwise it now tells whether the index has terms. A record without keyword data gives
-  /// what the last call gave, as long as somebody still holds that.
+  /// Opens the keyword index anew. Null when the data is no index, or one whose checksums were
+  /// wrong when the record took it in, which is when they are looked at; isSearchable() then stays
+  /// as it is, otherwise it now tells whether the index has terms. A record without keyword data
+  /// gives what the last call gave, as long as somebody still holds that.
   SKIndexRef copyIndexRef();
 
   /// Gives back what copyIndexRef() gave; the reference is null afterwards.
   void disposeIndexRef(SKIndexRef& indexRef) const;
+
+  /// Whether each page of the opened index has an abstract and a path that leads to a URL of its
+  /// own: absolute, not ending in a slash, without NUL and '%'. Records for such pages can be made
+  /// without a look at them. Found out once for the record's data.
+  bool hasPlainPages(const SKIndexRef& indexRef);
 
   /// The semantic index, made from its data at the first call that succeeds; the data is then let
   /// go. Null without data, or with data that makes none.
@@ -112,6 +118,10 @@ class ZEBHelpindexIndex : public ZEBIndex, public platform::KeyedCodable {
 
   mutable platform::Monitor _monitor;
   std::optional<platform::Data> _indexData GUARDED_BY(_monitor);
+  /// Its checksums are wrong: it is not opened.
+  bool _isIndexDamaged GUARDED_BY(_monitor) = false;
+  /// Of _indexData; absent until asked for.
+  std::optional<bool> _hasPlainPages GUARDED_BY(_monitor);
   /// Not owned: those who were handed it are its owners.
   std::weak_ptr<const SKIndex> _indexRef GUARDED_BY(_monitor);
   std::optional<platform::Data> _luxIndexData GUARDED_BY(_monitor);

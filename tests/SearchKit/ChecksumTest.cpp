@@ -28,5 +28,14 @@ TEST(Checksum, ofPartsContinuesTheOneBefore) {
   }
 }
 
+TEST(Checksum, isTheSameByTableAndByInstruction) {
+  std::vector<uint8_t> bytes;
+  for (int i = 0; i < 100; ++i) {
+    bytes.push_back(static_cast<uint8_t>(i * 37));
+    EXPECT_EQ(crc32c(bytes, 77), crc32cByTable(bytes, 77));
+  }
+  EXPECT_EQ(crc32cByTable(bytesOf("123456789")), 0xE3069283U);
+}
+
 }  // namespace
 }  // namespace searchkit

@@ -125,7 +125,7 @@ TEST(TermIterator, findsEveryTermOfManyBlocks) {
 TEST(IndexReader, summaryTellsWhatTheHeaderSays) {
   const SKIndexRef index = threePages();
   const IndexSummary summary = indexSummary(*index);
-  EXPECT_EQ(summary.formatVersion, 1);
+  EXPECT_EQ(summary.formatVersion, 2);
   EXPECT_EQ(summary.documentCount, 3U);
   EXPECT_EQ(summary.termCount, 5U);
   EXPECT_EQ(summary.wordCount, 7U);

@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "SearchKit/IndexCheck.h"
 #include "SearchKit/IndexFormat.h"
 #include "SearchKit/SearchKit.h"
 #include "platform/Files.h"
@@ -84,9 +85,11 @@ TEST(SKIndex, isNotOpenedWhenTruncatedAnywhere) {
 }
 
 TEST(SKIndex, isNotOpenedInAnotherVersion) {
-  std::vector<uint8_t> bytes = smallIndexBytes();
-  put<uint16_t>(bytes, format::versionAt, 2);
-  EXPECT_EQ(open(bytes), nullptr);
+  for (const uint16_t version : std::initializer_list<uint16_t>{0, format::version + 1, 0xFFFF}) {
+    std::vector<uint8_t> bytes = smallIndexBytes();
+    put<uint16_t>(bytes, format::versionAt, version);
+    EXPECT_EQ(open(bytes), nullptr);
+  }
 }
 
 TEST(SKIndex, isOpenedInALaterRevision) {
@@ -127,7 +130,7 @@ TEST(SKIndex, skipsSectionsThatItDoesNotKnow) {
 }
 
 TEST(SKIndex, isNotOpenedWithoutASection) {
-  for (uint32_t id = 1; id <= format::lastKnownSection; ++id) {
+  for (uint32_t id = 1; id <= format::lastRequiredSection; ++id) {
     std::vector<uint8_t> bytes = smallIndexBytes();
     put<uint32_t>(bytes, entryOfSection(bytes, static_cast<format::Section>(id)), 4711);
     EXPECT_EQ(open(bytes), nullptr) << id;
@@ -145,7 +148,7 @@ TEST(SKIndex, isNotOpenedWithASectionTwice) {
 
 TEST(SKIndex, isNotOpenedWhenAnExtentDoesNotFit) {
   const std::vector<uint8_t> bytes = smallIndexBytes();
-  for (uint32_t id = 1; id <= format::lastKnownSection; ++id) {
+  for (uint32_t id = 1; id <= format::lastRequiredSection; ++id) {
     const size_t entry = entryOfSection(bytes, static_cast<format::Section>(id));
     for (const uint64_t wrong :
          {uint64_t{0}, uint64_t{8}, uint64_t{bytes.size() + 1}, ~uint64_t{0}, ~uint64_t{7}}) {
@@ -298,14 +301,19 @@ TEST(SKIndexCopyDocumentProperties, repairsTextsOfAnIndexFromElsewhere) {
 }
 
 // An index of each version that was ever written is kept and must go on being read.
-TEST(SKIndex, opensTheIndexesOfEveryVersion) {
-  const std::string path =
-      std::string(ZEB_SOURCE_DIR) + "/tests/SearchKit/indexes/version-1.skindex";
+SKIndexRef indexOfVersion(int version) {
+  const std::string path = std::string(ZEB_SOURCE_DIR) + "/tests/SearchKit/indexes/version-" +
+                           std::to_string(version) + ".skindex";
   const auto data = platform::systemFileManager()->contentsAtPath(path);
-  ASSERT_TRUE(data);
-  const SKIndexRef index = SKIndexOpenWithData(*data);
-  ASSERT_NE(index, nullptr);
+  const SKIndexRef index = data ? SKIndexOpenWithData(*data) : nullptr;
   EXPECT_TRUE(SKIndexVerifyChecksums(index));
+  return index;
+}
+
+TEST(SKIndex, opensIndexesOfTheFirstVersion) {
+  const SKIndexRef index = indexOfVersion(1);
+  ASSERT_NE(index, nullptr);
+  EXPECT_THAT(indexProblems(*index), ::testing::IsEmpty());
   EXPECT_EQ(found(index, "print* queue* "), "/printing.html ");
   EXPECT_EQ(found(index, "\"the cafe\" | 印刷"), "/cafe.html /japanese.html ");
   EXPECT_EQ(found(index, "*et* -printer"), "/cafe.html ");
@@ -313,6 +321,24 @@ TEST(SKIndex, opensTheIndexesOfEveryVersion) {
       index, *SKDocumentCreateWithURL(platform::URL::fileURLWithPath("/cafe.html")));
   ASSERT_TRUE(properties);
   EXPECT_EQ((*properties)["T"].stringValue(), "Networks in the Café");
+}
+
+TEST(SKIndex, opensIndexesOfTheSecondVersion) {
+  const SKIndexRef index = indexOfVersion(2);
+  ASSERT_NE(index, nullptr);
+  EXPECT_THAT(indexProblems(*index), ::testing::IsEmpty());
+  EXPECT_EQ(indexSummary(*index).sections.size(), 9U);
+  EXPECT_EQ(found(index, "print* queue* "), "/printing.html ");
+  EXPECT_EQ(found(index, "\"the cafe\" | 印刷"), "/cafe.html /japanese.html ");
+  EXPECT_EQ(found(index, "\"the print queue\""), "/printing.html ");
+  EXPECT_EQ(found(index, "\"queue the\""), "");
+  // Pages with three words "many" in a row, but for the three pages that have "woab".
+  EXPECT_EQ(found(index, "\"many many many\" word -woab*"),
+            "/words/12.html /words/13.html /words/15.html /words/17.html /words/18.html "
+            "/words/19.html /words/20.html /words/21.html /words/22.html /words/23.html "
+            "/words/24.html ");
+  // With a merged list: all pages of words, and one with "worked".
+  EXPECT_EQ(testing::scores(index, "wo*").size(), 17U);
 }
 
 }  // namespace

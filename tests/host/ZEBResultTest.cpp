@@ -24,6 +24,18 @@ Result article(const std::string& title, const Value& url, const Value& book = "
   return result;
 }
 
+// Counts how often it is asked.
+class CountingSource : public ZEBResultSource {
+ public:
+  Content contentOfResult(uint32_t number) const override {
+    ++asked;
+    const std::string text = std::to_string(number);
+    return {"Page " + text, {{ZEBResultURLKey, "file:///" + text}, {ZEBResultBookIDKey, "book"}}};
+  }
+
+  mutable int asked = 0;
+};
+
 void expectEqual(const Result& a, const Result& b) {
   EXPECT_TRUE(*a == *b);
   EXPECT_TRUE(*b == *a);
@@ -169,3 +181,44 @@ TEST(ZEBResult, nullEqualsNullOnly) {
 }
 
 }  // namespace
+
+TEST(ZEBResult, OfASourceIsPutTogetherWhenSomebodyLooks) {
+  const auto source = std::make_shared<CountingSource>();
+  const ZEBResult::Sourced pages[] = {{7, 0.5}, {9, 0.25}};
+  std::vector<Result> results;
+  ZEBResult::appendResultsWithSource(source, pages, ZEBHelpArticleResult, results);
+  ASSERT_EQ(results.size(), 2U);
+  EXPECT_EQ(results[1]->relevance().doubleValue(), 0.25);
+  EXPECT_EQ(results[1]->type(), ZEBHelpArticleResult);
+  results[0]->setRelevance(2);
+  EXPECT_EQ(source->asked, 0);
+  EXPECT_EQ(results[1]->title(), "Page 9");
+  EXPECT_EQ(results[1]->payloadValueForKey(ZEBResultURLKey).stringValue(), "file:///9");
+  EXPECT_FALSE(results[1]->isPayloadMutable());
+  EXPECT_EQ(results[1]->bookID(), "book");
+  EXPECT_EQ(source->asked, 1);
+  expectEqual(results[0], article("Other title", "file:///7"));
+  EXPECT_EQ(source->asked, 2);
+}
+
+TEST(ZEBResult, OfASourceKeepsItAndMayBeGivenAnotherPayload) {
+  auto source = std::make_shared<CountingSource>();
+  const std::weak_ptr<CountingSource> watch = source;
+  std::vector<Result> results;
+  const ZEBResult::Sourced pages[] = {{1, 1}, {2, 1}};
+  ZEBResult::appendResultsWithSource(source, pages, ZEBHelpArticleResult, results);
+  source.reset();
+  const Result kept = results[0];
+  results.clear();
+  EXPECT_FALSE(watch.expired());
+  kept->setMutablePayload({{ZEBResultURLKey, "file:///other"}});
+  EXPECT_EQ(kept->title(), "Page 1");
+  EXPECT_EQ(kept->payload(), (Dictionary{{ZEBResultURLKey, "file:///other"}}));
+}
+
+TEST(ZEBResult, NoneComeOfASourceForNothing) {
+  std::vector<Result> results;
+  ZEBResult::appendResultsWithSource(std::make_shared<CountingSource>(), {}, ZEBHelpArticleResult,
+                                     results);
+  EXPECT_TRUE(results.empty());
+}

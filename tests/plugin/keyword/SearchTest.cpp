@@ -458,3 +458,50 @@ TEST(ZEBHelpindexSearchController, ListContainsAURLWhenAnyElementEqualsIt) {
   EXPECT_FALSE(contains(urls, url("file:///a")));
   EXPECT_FALSE(contains({}, url("file:///a")));
 }
+
+TEST(ZEBHelpindexSearchController, ResultsAreWholeWhenRecordFileAndControllerAreGone) {
+  std::vector<std::shared_ptr<ZEBResult>> results;
+  std::string url;
+  {
+    const KeywordWorld world;
+    const auto index = world.index({page("/a b.html", "Title", "applet")});
+    url = "file://" + world.folder.path("book/") + "a%20b.html";
+    results = world.controller->doSearchForString("applet", {index}, {});
+  }
+  ASSERT_THAT(results, SizeIs(1));
+  EXPECT_EQ(results[0]->title(), "Title");
+  EXPECT_EQ(urlOf(results[0]), url);
+}
+
+// Two paths that come to the same URL are one page, in whichever way their records are made.
+TEST(ZEBHelpindexSearchController, PathsOfTheSameURLAreOneResult) {
+  const KeywordWorld world;
+  const auto index =
+      world.index({page("/a b.html", "Blank", "applet"), page("/a%20b.html", "Escape", "applet")});
+  EXPECT_THAT(world.controller->doSearchForString("applet", {index}, {}), SizeIs(1));
+}
+
+TEST(ZEBHelpindexSearchController, PagesOfOneBookInTwoIndicesAreOneResult) {
+  const KeywordWorld world;
+  const auto a = world.index({page("/a.html", "Title", "applet")});
+  const auto b = world.index({page("/a.html", "Title", "applet")}, "book/b.helpindex");
+  EXPECT_THAT(world.controller->doSearchForString("applet", {a, b}, {}), SizeIs(1));
+  EXPECT_THAT(world.controller->doSearchForString("applet", {a, a, nullptr}, {}), SizeIs(1));
+}
+
+TEST(ZEBHelpindexSearchController, PlainAndOtherIndicesGiveTheSameResults) {
+  const KeywordWorld world;
+  const std::vector<Document> plain = pages(8, "page", "applet banana");
+  const auto a = world.index(plain);
+  const auto b =
+      world.index(both(plain, {page("/odd%41.html", "Odd", "cherry")}), "other/b.helpindex");
+  b->setBookID("other");
+  const auto results = world.controller->doSearchForString("applet", {a, b}, {});
+  ASSERT_THAT(results, SizeIs(16));
+  for (size_t i = 0; i < 8; ++i) {
+    EXPECT_EQ(results[i]->title(), results[i + 8]->title());
+    EXPECT_EQ(results[i]->payload().size(), 4U);
+    EXPECT_EQ(results[i + 8]->payload().size(), 4U);
+    EXPECT_EQ(results[i]->relevance().kind(), results[i + 8]->relevance().kind());
+  }
+}

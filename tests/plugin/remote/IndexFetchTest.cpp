@@ -6,6 +6,7 @@
 #include "host/Zebrine/RNXObjectManager.h"
 #include "platform/Digest.h"
 #include "platform/RunLoop.h"
+#include "platform/URLProtocol.h"
 #include "plugin/operations/ZEBOperationQueue.h"
 #include "plugin/records/ZEBHelpindexIndex.h"
 #include "tests/plugin/remote/RemoteWorld.h"
@@ -83,6 +84,26 @@ TEST_F(IndexFetch, hasSixtySecondsOfPatience) {
   EXPECT_TRUE(finish());
   EXPECT_THAT(world.messages(4), ElementsAre(HasSubstr("failed loading with error")));
   EXPECT_THAT(world.shelf->indexGeneratingQueue()->operations(), IsEmpty());
+}
+
+TEST_F(IndexFetch, asksWithoutCookiesAndByThePolicyOfTheProtocol) {
+  std::optional<platform::URLRequest> asked;
+  platform::URLProtocolClass watching;
+  watching.canInitWithRequest = [&](const platform::URLRequest& request) {
+    asked = request;
+    return false;
+  };
+  const auto kind = std::make_shared<const platform::URLProtocolClass>(watching);
+  ASSERT_TRUE(platform::URLProtocol::registerClass(kind));
+  const auto server = ScriptedServer::sending(httpAnswer(404, ""));
+  EXPECT_TRUE(start(server->URL("/index")));
+  EXPECT_TRUE(finish());
+  platform::URLProtocol::unregisterClass(kind);
+  ASSERT_TRUE(asked);
+  EXPECT_EQ(asked->URL().absoluteString(), server->URL("/index"));
+  EXPECT_FALSE(asked->HTTPShouldHandleCookies());
+  EXPECT_EQ(asked->cachePolicy(), platform::URLRequestCachePolicy::useProtocolCachePolicy);
+  EXPECT_EQ(asked->timeoutInterval(), platform::Seconds(60));
 }
 
 TEST_F(IndexFetch, bytesThatARedirectLedToBeforeChangeNothing) {

@@ -1,0 +1,352 @@
+#include "SearchKit/WordSearch.h"
+
+#include <algorithm>
+
+#include "SearchKit/SKIndex.h"
+
+namespace searchkit {
+namespace {
+
+constexpr size_t postingsPerSlice = 1024;
+constexpr uint64_t fewestPagesAPosting = 4;
+constexpr uint64_t densest = 16;
+
+}  // namespace
+
+WordSearch::WordSearch(const IndexView& view, const CompiledQuery& query) noexcept
+    : _view(view), _query(query), _scorer(view.documentCount(), view.wordCount()) {}
+
+bool WordSearch::prepare() {
+  if (_view.documentCount() == 0) {
+    return false;
+  }
+  const bool isAny = _query.requiredCount == 0;
+  Step* steps = _inlineSteps;
+  if (_query.words.size() > inlineStepCount) {
+    _moreSteps.resize(_query.words.size());
+    steps = _moreSteps.data();
+  }
+  size_t required = 0;
+  for (size_t i = 0; i < _query.words.size(); ++i) {
+    Step& step = steps[_stepCount];
+    step.postings = findWord(_view, _query.words[i]);
+    if (step.postings.kind == WordPostings::Kind::none) {
+      if (i < _query.requiredCount) {
+        return false;
+      }
+      continue;
+    }
+    ++_stepCount;
+    required += i < _query.requiredCount ? 1 : 0;
+    _work += step.postings.range.length();
+  }
+  const auto isShorter = [](const Step& a, const Step& b) {
+    return a.postings.range.length() < b.postings.range.length();
+  };
+  std::stable_sort(steps, steps + (isAny ? _stepCount : required), isShorter);
+  for (size_t i = 0; i < _stepCount; ++i) {
+    steps[i].action = i == 0         ? Action::push
+                      : isAny        ? Action::unite
+                      : i < required ? Action::intersect
+                                     : Action::addScores;
+  }
+  return _stepCount > 0;
+}
+
+bool WordSearch::run(WorkBudget& budget, SearchScratch& scratch) {
+  const Step* const steps = _moreSteps.empty() ? _inlineSteps : _moreSteps.data();
+  for (; _step < _stepCount; ++_step) {
+    const Step& step = steps[_step];
+    if (!_hasBegun) {
+      if (_step > 0 && step.action != Action::unite && scratch.hits.empty()) {
+        break;
+      }
+      _begin(step, scratch);
+    }
+    if (!_read(step, budget, scratch)) {
+      return false;
+    }
+    _hasBegun = false;
+    if (budget.isSpent() && _step + 1 < _stepCount) {
+      ++_step;
+      return false;
+    }
+  }
+  return true;
+}
+
+void WordSearch::_begin(const Step& step, SearchScratch& scratch) {
+  _hasBegun = true;
+  _isInList = false;
+  _isExactNext = step.postings.beginsWithExactTerm;
+  _documentSum = 0;
+  _readAt = 0;
+  _keptAt = 0;
+  const bool isMerged = step.postings.kind == WordPostings::Kind::merged;
+  _cursor = PostingsCursor(
+      _view, _view.section(isMerged ? format::Section::mergedLists : format::Section::postings),
+      step.postings.range, isMerged ? format::mergedFrequencyLimit - 1 : format::maximumWeight);
+  if (step.action == Action::push) {
+    scratch.hits.clear();
+  } else if (step.action == Action::unite) {
+    scratch.others.clear();
+  }
+  // With many postings for the number of pages it takes less to write to all places than to look
+  // which are wanted, and to clear them all than to know which were used.
+  _isDense = !step.postings.isOneList &&
+             step.postings.range.length() * fewestPagesAPosting > _view.documentCount();
+  if (!step.postings.isOneList && !_isDense && step.action != Action::push &&
+      step.action != Action::unite) {
+    for (const Hit& hit : scratch.hits) {
+      scratch.filter.insert(hit.document);
+    }
+  }
+}
+
+bool WordSearch::_read(const Step& step, WorkBudget& budget, SearchScratch& scratch) {
+  if (!(step.postings.isOneList ? _readOneList(step, budget, scratch)
+                                : _readLists(step, budget, scratch))) {
+    return false;
+  }
+  if (step.action == Action::unite) {
+    unite(scratch.hits, scratch.others, scratch.merged);
+    scratch.hits.swap(scratch.merged);
+    budget.spend(scratch.hits.size());
+  }
+  return true;
+}
+
+bool WordSearch::_readOneList(const Step& step, WorkBudget& budget, SearchScratch& scratch) {
+  if (!_isInList) {
+    _isInList = _cursor.beginList();
+    const bool isMerged = step.postings.kind == WordPostings::Kind::merged;
+    _factor = !isMerged && step.postings.beginsWithExactTerm ? exactFactor : 1;
+    _idf = _scorer.inverseDocumentFrequency(isMerged ? step.postings.documentSum
+                                                     : _cursor.listDocumentCount());
+    if (step.action == Action::push) {
+      scratch.hits.reserve(_cursor.listDocumentCount());
+    }
+    // Side by side where one list is much longer; else page by page.
+    _isDense = step.action == Action::intersect &&
+               _cursor.listDocumentCount() < densest * uint64_t{scratch.hits.size()};
+    if (_isDense) {
+      for (const Hit& hit : scratch.hits) {
+        scratch.found.put(hit.document, hit.score);
+      }
+      scratch.others.resize(_cursor.listDocumentCount() + size_t{1});
+    }
+  }
+  while (_isInList) {
+    size_t count = 0;
+    switch (step.action) {
+      case Action::push:
+        count = _append(scratch.hits);
+        break;
+      case Action::unite:
+        count = _append(scratch.others);
+        break;
+      case Action::intersect:
+        count = _isDense ? _look(scratch) : _compare<false>(scratch.hits);
+        break;
+      case Action::addScores:
+        count = _compare<true>(scratch.hits);
+        break;
+    }
+    if (!budget.spend(count + 1) && _isInList) {
+      return false;
+    }
+  }
+  if (_isDense) {
+    for (const Hit& hit : scratch.hits) {
+      scratch.found.put(hit.document, 0);
+    }
+    scratch.others.resize(_keptAt);
+    scratch.hits.swap(scratch.others);
+  } else if (step.action == Action::intersect) {
+    scratch.hits.resize(_keptAt);
+  }
+  return true;
+}
+
+// The next slice of the list; the hits so far are in the accumulator. Every page is written, and
+// only kept when it is one of them: no branch that could not be predicted.
+size_t WordSearch::_look(SearchScratch& scratch) {
+  PostingsCursor at = _cursor;
+  size_t left = postingsPerSlice;
+  size_t kept = _keptAt;
+  Hit* const others = scratch.others.data();
+  while (left > 0 && (_isInList = at.next())) {
+    --left;
+    const uint32_t document = at.document();
+    const float score = scratch.found.frequency(document);
+    others[kept] = {document, score + _scorer.score(_idf, _factor * static_cast<float>(at.weight()),
+                                                    _view.documentLength(document))};
+    kept += score > 0 ? 1 : 0;
+  }
+  _cursor = at;
+  _keptAt = kept;
+  return postingsPerSlice - left;
+}
+
+// The next slice of the list, at the end of the hits.
+size_t WordSearch::_append(HitList& hits) {
+  PostingsCursor at = _cursor;
+  size_t left = postingsPerSlice;
+  while (left > 0 && (_isInList = at.next())) {
+    --left;
+    const uint32_t document = at.document();
+    hits.push_back({document, _scorer.score(_idf, _factor * static_cast<float>(at.weight()),
+                                            _view.documentLength(document))});
+  }
+  _cursor = at;
+  return postingsPerSlice - left;
+}
+
+// The next slice of the list, beside the hits. Those that are to be kept move forward.
+template <bool keepsAll>
+size_t WordSearch::_compare(HitList& hits) {
+  PostingsCursor at = _cursor;
+  size_t left = postingsPerSlice;
+  size_t read = _readAt;
+  size_t kept = _keptAt;
+  const size_t count = hits.size();
+  while (left > 0) {
+    if (read == count || !at.next()) {
+      _isInList = false;
+      break;
+    }
+    --left;
+    const uint32_t document = at.document();
+    while (read < count && hits[read].document < document) {
+      ++read;
+    }
+    if (read < count && hits[read].document == document) {
+      const float score = _scorer.score(_idf, _factor * static_cast<float>(at.weight()),
+                                        _view.documentLength(document));
+      Hit& to = keepsAll ? hits[read] : hits[kept++];
+      to = {document, hits[read].score + score};
+      ++read;
+    }
+  }
+  _cursor = at;
+  _readAt = read;
+  _keptAt = kept;
+  return postingsPerSlice - left;
+}
+
+bool WordSearch::_readLists(const Step& step, WorkBudget& budget, SearchScratch& scratch) {
+  const bool isFiltered = step.action == Action::intersect || step.action == Action::addScores;
+  for (bool hasMore = true; hasMore;) {
+    size_t units = 0;
+    hasMore = _isDense     ? _accumulate<Gathering::dense>(scratch, units)
+              : isFiltered ? _accumulate<Gathering::filtered>(scratch, units)
+                           : _accumulate<Gathering::sparse>(scratch, units);
+    if (!budget.spend(units) && hasMore) {
+      return false;
+    }
+  }
+  if (_isDense) {
+    _finishDenseLists(step, scratch);
+  } else {
+    _finishLists(step, scratch);
+  }
+  return true;
+}
+
+// The next slice of the lists; false at the end of the last.
+template <WordSearch::Gathering gathering>
+bool WordSearch::_accumulate(SearchScratch& scratch, size_t& units) {
+  PostingsCursor at = _cursor;
+  size_t left = postingsPerSlice;
+  bool hasMore = true;
+  bool isInList = _isInList;
+  float factor = _factor;
+  uint64_t documentSum = _documentSum;
+  float* const frequencies = scratch.found.data();
+  while (left > 0) {
+    --left;
+    if (!isInList) {
+      if (!at.beginList()) {
+        hasMore = false;
+        break;
+      }
+      documentSum += at.listDocumentCount();
+      factor = _isExactNext ? exactFactor : 1;
+      _isExactNext = false;
+    }
+    isInList = at.next();
+    if (!isInList) {
+      continue;
+    }
+    const float frequency = factor * static_cast<float>(at.weight());
+    if (gathering == Gathering::dense) {
+      frequencies[at.document()] += frequency;
+    } else if (gathering == Gathering::sparse || scratch.filter.has(at.document())) {
+      scratch.found.add(at.document(), frequency);
+    }
+  }
+  units = postingsPerSlice - left;
+  _cursor = at;
+  _isInList = isInList;
+  _factor = factor;
+  _documentSum = documentSum;
+  return hasMore;
+}
+
+// Every page has a place, empty or not.
+void WordSearch::_finishDenseLists(const Step& step, SearchScratch& scratch) {
+  const float idf = _scorer.inverseDocumentFrequency(_documentSum);
+  const uint32_t documentCount = _view.documentCount();
+  float* const frequencies = scratch.found.data();
+  if (step.action == Action::push || step.action == Action::unite) {
+    HitList& hits = step.action == Action::push ? scratch.hits : scratch.others;
+    hits.resize(documentCount);
+    size_t kept = 0;
+    for (uint32_t document = 0; document < documentCount; ++document) {
+      hits[kept] = {document, frequencies[document]};
+      kept += frequencies[document] > 0 ? 1 : 0;
+    }
+    hits.resize(kept);
+    for (Hit& hit : hits) {
+      hit.score = _scorer.score(idf, hit.score, _view.documentLength(hit.document));
+    }
+  } else {
+    size_t kept = 0;
+    for (const Hit& hit : scratch.hits) {
+      const float frequency = frequencies[hit.document];
+      const float score =
+          hit.score + _scorer.score(idf, frequency, _view.documentLength(hit.document));
+      scratch.hits[kept] = {hit.document, score};
+      kept += frequency > 0 || step.action == Action::addScores ? 1 : 0;
+    }
+    scratch.hits.resize(kept);
+  }
+  std::fill_n(frequencies, documentCount, 0.0F);
+}
+
+void WordSearch::_finishLists(const Step& step, SearchScratch& scratch) {
+  const float idf = _scorer.inverseDocumentFrequency(_documentSum);
+  const auto scored = [&](uint32_t document, float frequency) {
+    return _scorer.score(idf, frequency, _view.documentLength(document));
+  };
+  if (step.action == Action::push || step.action == Action::unite) {
+    HitList& hits = step.action == Action::push ? scratch.hits : scratch.others;
+    scratch.found.drainBelow(_view.documentCount(), [&](uint32_t document, float frequency) {
+      hits.push_back({document, scored(document, frequency)});
+    });
+    return;
+  }
+  size_t kept = 0;
+  for (const Hit& hit : scratch.hits) {
+    scratch.filter.removeAround(hit.document);
+    const float frequency = scratch.found.take(hit.document);
+    if (frequency > 0) {
+      scratch.hits[kept++] = {hit.document, hit.score + scored(hit.document, frequency)};
+    } else if (step.action == Action::addScores) {
+      scratch.hits[kept++] = hit;
+    }
+  }
+  scratch.hits.resize(kept);
+}
+
+}  // namespace searchkit
