@@ -1,6 +1,7 @@
 #include "bvmake/CharacterSet.h"
 
 #include <unicode/ucnv.h>
+#include <unicode/ucsdet.h>
 #include <unicode/unistr.h>
 
 #include <algorithm>
@@ -21,6 +22,12 @@ constexpr size_t declarationRange = 4096;
 
 /// The piece of text in which it is decided whether the bytes are text.
 constexpr size_t binaryCheckRange = 4096;
+
+/// How much of a page that declares no character set is looked at to guess it, how many of these
+/// bytes must be beyond ASCII, and how sure ICU must be, of 100.
+constexpr size_t guessingRange = 65536;
+constexpr std::ptrdiff_t fewestTellingBytes = 24;
+constexpr int32_t leastConfidence = 30;
 
 /// Names that web pages use for something else than, or more than, what the name once stood for.
 constexpr std::array<std::pair<std::string_view, const char*>, 22> webMeanings{{
@@ -189,6 +196,40 @@ std::optional<std::string> converted(std::string_view bytes, const char* charact
   return utf8;
 }
 
+std::string webMeaning(const std::string& name) {
+  for (const auto& [webName, meaning] : webMeanings) {
+    if (name == webName) {
+      return meaning;
+    }
+  }
+  return name;
+}
+
+/// What ICU takes the bytes for, by how often they follow each other in the languages of each set;
+/// empty where there is too little to go by, or nothing that it is sure of.
+std::string guessedCharacterSet(std::string_view bytes) {
+  bytes = bytes.substr(0, guessingRange);
+  const auto telling = std::count_if(bytes.begin(), bytes.end(), [](char character) {
+    return static_cast<unsigned char>(character) >= 0x80;
+  });
+  UErrorCode status = U_ZERO_ERROR;
+  const std::unique_ptr<UCharsetDetector, void (*)(UCharsetDetector*)> detector(
+      ucsdet_open(&status), ucsdet_close);
+  if (telling < fewestTellingBytes || U_FAILURE(status)) {
+    return {};
+  }
+  ucsdet_enableInputFilter(detector.get(), 1);
+  ucsdet_setText(detector.get(), bytes.data(), static_cast<int32_t>(bytes.size()), &status);
+  const UCharsetMatch* const match = ucsdet_detect(detector.get(), &status);
+  if (U_FAILURE(status) || match == nullptr ||
+      ucsdet_getConfidence(match, &status) < leastConfidence) {
+    return {};
+  }
+  const std::string name = lowercased(ucsdet_getName(match, &status));
+  // Sets of other units than bytes would have shown by their zeros.
+  return startsWith(name, "utf") ? std::string() : webMeaning(name);
+}
+
 std::string utf8Text(std::string_view bytes) {
   return platform::isValidUTF8(bytes) ? std::string(bytes) : platform::stringByRepairingUTF8(bytes);
 }
@@ -201,13 +242,7 @@ std::string decoded(std::string_view bytes, Markup markup) {
     return utf8Text(bytes);
   }
   if (!declared.empty()) {
-    const char* name = declared.c_str();
-    for (const auto& [webName, meaning] : webMeanings) {
-      if (declared == webName) {
-        name = meaning;
-      }
-    }
-    if (std::optional<std::string> text = converted(bytes, name)) {
+    if (std::optional<std::string> text = converted(bytes, webMeaning(declared).c_str())) {
       // Some sets can spell lone surrogates; ICU writes them as U+FFFD bytes or not at all.
       return platform::isValidUTF8(*text) ? std::move(*text)
                                           : platform::stringByRepairingUTF8(*text);
@@ -215,6 +250,12 @@ std::string decoded(std::string_view bytes, Markup markup) {
   }
   if (platform::isValidUTF8(bytes)) {
     return std::string(bytes);
+  }
+  if (const std::string name = guessedCharacterSet(bytes); !name.empty()) {
+    if (std::optional<std::string> text = converted(bytes, name.c_str())) {
+      return platform::isValidUTF8(*text) ? std::move(*text)
+                                          : platform::stringByRepairingUTF8(*text);
+    }
   }
   return converted(bytes, "windows-1252").value_or(platform::stringByRepairingUTF8(bytes));
 }

@@ -1,5 +1,7 @@
 #include "bvmake/CommandLine.h"
 
+#include <unistd.h>
+
 #include <CLI/CLI.hpp>
 #include <algorithm>
 #include <sstream>
@@ -145,6 +147,9 @@ int runProgram(const std::vector<std::string>& arguments, std::FILE* output, std
   }
   StreamReport report(errors, program, parsed.command->verbosity);
   if (parsed.command->action == CommandLine::Action::create) {
+    if (isatty(fileno(errors)) != 0) {
+      report.showProgressBar();
+    }
     return static_cast<int>(run(parsed.command->create, report).exitCode);
   }
   std::string text;

@@ -68,6 +68,7 @@ struct Declaration {
   std::string content;
   std::unique_ptr<PosedEntity> asText;
   std::unique_ptr<PosedEntity> asReference;
+  std::unique_ptr<PosedEntity> asName;
 };
 
 /// What all files of a document have in common.
@@ -94,27 +95,25 @@ class Document {
     if (entity.content.empty() && !entity.isFile) {
       entity.content = textOfUndeclared(name);
     }
-    _entityBytes += entity.content.size();
-    if (_entityBytes > maximumEntityText) {
-      problem = "entities that stand for too much text";
-      return nullptr;
+    if (inAttribute) {
+      return _pose(entity.asName, name, {}, PosedEntity::Pose::name);
     }
-    const bool isMarkup = entity.isFile || entity.content.find('<') != std::string::npos;
-    if (isMarkup && !inAttribute) {
-      if (!entity.asReference) {
-        entity.asReference =
-            std::make_unique<PosedEntity>(name, std::string(), PosedEntity::Pose::reference);
-      }
-      return &entity.asReference->node;
+    if (entity.isFile || entity.content.find('<') != std::string::npos) {
+      return _pose(entity.asReference, name, {}, PosedEntity::Pose::reference);
     }
-    if (!entity.asText) {
-      std::string text;
-      if (!entity.isFile) {
-        _flatten(entity.content, 0, text);
-      }
-      entity.asText = std::make_unique<PosedEntity>(name, std::move(text));
-    }
-    return &entity.asText->node;
+    const xmlEntityPtr node =
+        _pose(entity.asText, name, entity.asText ? std::string() : flattened(entity.content),
+              PosedEntity::Pose::text);
+    _countEntityText(entity.asText->content.size());
+    return problem.empty() ? node : nullptr;
+  }
+
+  /// Text with its entities replaced by theirs, and without tags.
+  std::string flattened(std::string_view text) {
+    std::string result;
+    _flatten(text, 0, result);
+    _countEntityText(result.size());
+    return result;
   }
 
   /// Reads what an entity that is no mere text stands for.
@@ -186,6 +185,21 @@ class Document {
     return fmt::format("<{0}>{1}</{0}>", wrapperName, content);
   }
 
+  void _countEntityText(size_t bytes) {
+    _entityBytes += bytes;
+    if (_entityBytes > maximumEntityText) {
+      problem = "entities that stand for too much text";
+    }
+  }
+
+  static xmlEntityPtr _pose(std::unique_ptr<PosedEntity>& posed, const std::string& name,
+                            std::string text, PosedEntity::Pose pose) {
+    if (!posed) {
+      posed = std::make_unique<PosedEntity>(name, std::move(text), pose);
+    }
+    return &posed->node;
+  }
+
   bool _mayEnter(const std::string& name, size_t bytes) {
     if (std::find(_active.begin(), _active.end(), name) != _active.end()) {
       _note(fmt::format("{} includes itself", name));
@@ -212,7 +226,9 @@ class Document {
       }
       const std::string name = plain.substr(reference + 1, end - reference - 1);
       const auto found = _entities.find(name);
-      if (found == _entities.end() || found->second.content.empty()) {
+      if (name == "#38") {
+        text += '&';
+      } else if (found == _entities.end() || found->second.content.empty()) {
         text += textOfUndeclared(name);
       } else if (!found->second.isFile && depth < maximumInclusionDepth &&
                  ++_flattenedCount <= maximumIncludedCount) {
@@ -291,24 +307,31 @@ struct Attributes {
   bool asText = false;
   bool hasPointer = false;
 
-  Attributes(int count, const xmlChar** attributes) {
+  Attributes(Document& document, int count, const xmlChar** attributes) {
     for (int i = 0; i < count; ++i, attributes += 5) {
       const char* const begin = reinterpret_cast<const char*>(attributes[3]);
-      const std::string value(begin, reinterpret_cast<const char*>(attributes[4]));
+      const std::string_view value(
+          begin, static_cast<size_t>(reinterpret_cast<const char*>(attributes[4]) - begin));
       const std::string_view name = view(attributes[0]);
       const std::string_view space = view(attributes[2]);
       if (name == "id" && (space.empty() || space == xmlNamespace)) {
-        id = value;
+        id = _text(document, value);
       } else if (name == "lang" && (space.empty() || space == xmlNamespace)) {
-        language = value;
+        language = _text(document, value);
       } else if (name == "href" && space.empty()) {
-        reference = value;
+        reference = _text(document, value);
       } else if (name == "parse" && space.empty()) {
         asText = value == "text";
       } else if (name == "xpointer" && space.empty()) {
         hasPointer = true;
       }
     }
+  }
+
+ private:
+  static std::string _text(Document& document, std::string_view value) {
+    return value.find('&') == std::string_view::npos ? std::string(value)
+                                                     : document.flattened(value);
   }
 };
 
@@ -329,7 +352,7 @@ void startElement(void* context, const xmlChar* name, const xmlChar*, const xmlC
     if (session.inclusionDepth > 0 || space == inclusionNamespace) {
       // What stands in for the file when it is not there is left out.
       const bool begins = ++session.inclusionDepth == 1;
-      const Attributes found(attributeCount, attributes);
+      const Attributes found(session.document, attributeCount, attributes);
       if (begins && element == "include" && !found.hasPointer && !found.reference.empty()) {
         session.document.include(session.name, found.reference, found.asText);
       }
@@ -339,7 +362,7 @@ void startElement(void* context, const xmlChar* name, const xmlChar*, const xmlC
       return;
     }
     const bool isDocBook = space.empty() || space == docBookNamespace;
-    const Attributes found(attributeCount, attributes);
+    const Attributes found(session.document, attributeCount, attributes);
     if (isRoot && session.isFirst) {
       if (!isDocBook || !isDocBookRoot(element)) {
         session.stop("no DocBook document");

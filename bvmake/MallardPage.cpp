@@ -16,6 +16,7 @@
 #include "bvmake/MallardPageBuilder.h"
 #include "bvmake/MarkupGuard.h"
 #include "bvmake/PosedEntity.h"
+#include "platform/Strings.h"
 
 namespace bvmake {
 
@@ -86,7 +87,8 @@ void startElement(void* context, const xmlChar* name, const xmlChar*, const xmlC
       const std::string_view value(
           begin, static_cast<size_t>(reinterpret_cast<const char*>(attributes[4]) - begin));
       if (attributes[2] == nullptr && view(attributes[0]) == "id") {
-        id = value;
+        // The parser takes a part only of entities that stand in attributes.
+        id = platform::isValidUTF8(value) ? value : std::string_view();
       } else if (attributes[2] == nullptr && view(attributes[0]) == "type") {
         type = value;
       } else if (isRoot && view(attributes[2]) == xmlNamespace && view(attributes[0]) == "lang") {

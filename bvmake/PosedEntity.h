@@ -8,18 +8,30 @@
 
 namespace bvmake {
 
-/// An entity that poses as a predefined one, whose text the parser takes as it is and never looks
-/// into; or, by reference, as one in another file, of which the parser only tells that it stands
-/// there. Either way nothing is expanded behind our back. The node points into the object.
+/// An entity in one of three poses, in none of which anything is expanded behind our back. The node
+/// points into the object.
 struct PosedEntity {
-  enum class Pose { text, reference };
+  enum class Pose {
+    /// A predefined one: between elements the parser takes its text as it is and never looks into
+    /// it. In attributes it takes the first byte, which is good for characters of ASCII only.
+    text,
+    /// One in another file, of which the parser only tells that it stands there. An error in
+    /// attributes.
+    reference,
+    /// One without content: attributes have "&name;" in their value.
+    name,
+  };
 
   PosedEntity(std::string entityName, std::string text, Pose pose = Pose::text)
       : name(std::move(entityName)), content(std::move(text)) {
     node.type = XML_ENTITY_DECL;
-    node.etype =
-        pose == Pose::text ? XML_INTERNAL_PREDEFINED_ENTITY : XML_EXTERNAL_GENERAL_PARSED_ENTITY;
+    node.etype = pose == Pose::text        ? XML_INTERNAL_PREDEFINED_ENTITY
+                 : pose == Pose::reference ? XML_EXTERNAL_GENERAL_PARSED_ENTITY
+                                           : XML_INTERNAL_GENERAL_ENTITY;
     node.name = reinterpret_cast<const xmlChar*>(name.c_str());
+    if (pose == Pose::name) {
+      return;
+    }
     node.content = reinterpret_cast<xmlChar*>(content.data());
     // The parser hands over the raw text of entities that have none yet, and nobody would free it.
     node.orig = node.content;

@@ -6,6 +6,8 @@
 #include <string>
 #include <string_view>
 
+#include "platform/Clock.h"
+
 namespace bvmake {
 
 /// Takes the messages of one run. Texts are single lines in UTF-8, without program name and without
@@ -34,22 +36,36 @@ class Report {
 
 /// Writes each message as a line "<program>: error: …", "<program>: warning: …" or
 /// "<program>: …" to a stream. Control characters (file names may hold them) come out as '?'.
+/// On a terminal it can show below them how far the run is; nothing of that is left in the end.
 class StreamReport : public Report {
  public:
   /// The stream must outlive the report.
   StreamReport(std::FILE* stream, std::string program, int verbosity);
+  ~StreamReport() override;
+  StreamReport(const StreamReport&) = delete;
+  StreamReport& operator=(const StreamReport&) = delete;
+
+  /// From now on filesDone() draws a bar, at most ten times a second, unless each page is told of
+  /// anyway.
+  void showProgressBar() noexcept { _showsBar = _verbosity < 2; }
 
   void error(std::string_view text) override;
   void warning(std::string_view text) override;
   void progress(int verbosity, std::string_view text) override;
+  void filesDone(size_t done, size_t count) override;
   bool wants(int verbosity) const noexcept override { return verbosity <= _verbosity; }
 
  private:
   void _writeLine(std::string_view kind, std::string_view text);
+  void _eraseBar();
 
   std::FILE* _stream;
   std::string _program;
   int _verbosity;
+  bool _showsBar = false;
+  /// Columns of the bar on the terminal; 0 while there is none.
+  size_t _barWidth = 0;
+  platform::Clock::Instant _nextDraw{};
 };
 
 }  // namespace bvmake

@@ -20,6 +20,7 @@
 #include "bvmake/Report.h"
 #include "bvmake/SemanticData.h"
 #include "host/Luxwell/HelpTokenizer.h"
+#include "platform/AbandonedFiles.h"
 #include "platform/Environment.h"
 #include "platform/Exception.h"
 
@@ -62,7 +63,7 @@ class Run {
       }
     }
     platform::Error error;
-    const auto pages = findPages(_options.folder, _report, &error);
+    auto pages = findPages(_options.folder, _report, &error);
     if (!pages) {
       return _fail(fmt::format("cannot index the folder {}", error.description));
     }
@@ -111,6 +112,10 @@ class Run {
       _fail(fmt::format("cannot write {}: {}", _options.outputPath, error->description));
       return false;
     }
+    // What runs have left that were killed while they wrote this file.
+    const std::string folder = platform::stringByDeletingLastPathComponent(_options.outputPath);
+    platform::removeAbandonedFiles(folder.empty() ? "." : folder,
+                                   platform::lastPathComponent(_options.outputPath));
     return true;
   }
 
@@ -178,12 +183,12 @@ class Run {
                                    : _preparers[worker]->prepare(_pages[piece]);
            return _shards[worker]->add(std::move(file));
          },
-         [this](size_t piece, AddedFile added) { _count(piece, std::move(added)); }});
+         [this](size_t piece, const AddedFile& added) { _count(piece, added); }});
   }
 
   WorkLimits _limits() const { return {_workerCount, bytesInFlight}; }
 
-  void _count(size_t piece, AddedFile added) {
+  void _count(size_t piece, const AddedFile& added) {
     for (const Message& message : added.messages) {
       if (message.kind == Message::Kind::warning) {
         _report.warning(message.text);

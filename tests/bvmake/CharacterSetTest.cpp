@@ -1,6 +1,8 @@
 #include "bvmake/CharacterSet.h"
 
 #include <gtest/gtest.h>
+#include <unicode/ucnv.h>
+#include <unicode/unistr.h>
 
 #include <string>
 
@@ -99,6 +101,79 @@ TEST(CharacterSet, latin1MeansWindows1252AsOnTheWeb) {
             "<meta charset=iso-8859-1>€");
   EXPECT_EQ(textFromBytes("<meta charset=us-ascii>\x92"s, Markup::html),
             "<meta charset=us-ascii>’");
+}
+
+std::string inSet(const std::string& text, const char* set) {
+  UErrorCode status = U_ZERO_ERROR;
+  const icu::UnicodeString characters = icu::UnicodeString::fromUTF8(text);
+  std::string bytes(text.size() * 4 + 16, '\0');
+  UConverter* const converter = ucnv_open(set, &status);
+  const int32_t length =
+      ucnv_fromUChars(converter, bytes.data(), static_cast<int32_t>(bytes.size()),
+                      characters.getBuffer(), characters.length(), &status);
+  EXPECT_TRUE(U_SUCCESS(status)) << set;
+  ucnv_close(converter);
+  bytes.resize(static_cast<size_t>(length));
+  return bytes;
+}
+
+struct Sample {
+  const char* set;
+  const char* text;
+};
+
+// A few sentences each, as a short page has them.
+constexpr Sample samples[] = {
+    {"windows-1251",
+     "Чтобы напечатать документ, выберите принтер из списка и нажмите кнопку. Если бумага "
+     "закончилась, положите новую в лоток и продолжите печать."},
+    {"KOI8-R",
+     "Чтобы напечатать документ, выберите принтер из списка и нажмите кнопку. Если бумага "
+     "закончилась, положите новую в лоток и продолжите печать."},
+    {"Shift_JIS",
+     "文書を印刷するには、一覧からプリンターを選び、ボタンを押してください。用紙がなくなったら、"
+     "トレイに入れて印刷を続けます。"},
+    {"EUC-JP",
+     "文書を印刷するには、一覧からプリンターを選び、ボタンを押してください。用紙がなくなったら、"
+     "トレイに入れて印刷を続けます。"},
+    {"GB18030",
+     "要打印文档，请从列表中选择打印机，然后按下按钮。如果纸张用完了，请把新的纸放进纸盒，然后"
+     "继续打印。这样就可以了。"},
+    {"Big5",
+     "要列印文件，請從清單中選擇印表機，然後按下按鈕。如果紙張用完了，請把新的紙放進紙匣，然後"
+     "繼續列印。這樣就可以了。"},
+    {"EUC-KR",
+     "문서를 인쇄하려면 목록에서 프린터를 고르고 단추를 누르십시오. 종이가 떨어지면 새 종이를 "
+     "넣고 인쇄를 계속하십시오."},
+};
+
+TEST(CharacterSet, undeclaredSetsAreGuessedFromTheirText) {
+  for (const Sample& sample : samples) {
+    const std::string page = "<html><p>" + std::string(sample.text) + "</p></html>";
+    EXPECT_EQ(textFromBytes(inSet(page, sample.set), Markup::html), page) << sample.set;
+    EXPECT_EQ(textFromBytes(inSet(page, sample.set), Markup::xml), page) << sample.set;
+  }
+}
+
+TEST(CharacterSet, declaredSetsAreNotGuessed) {
+  for (const Sample& sample : samples) {
+    const std::string meta = "<meta charset='" + std::string(sample.set) + "'><p>" + sample.text;
+    EXPECT_EQ(textFromBytes(inSet(meta, sample.set), Markup::html), meta) << sample.set;
+    const std::string xml =
+        "<?xml version='1.0' encoding='" + std::string(sample.set) + "'?><p>" + sample.text;
+    EXPECT_EQ(textFromBytes(inSet(xml, sample.set), Markup::xml), xml) << sample.set;
+  }
+  const std::string wrong =
+      inSet("<meta charset=windows-1252>" + std::string(samples[0].text), "windows-1251");
+  EXPECT_EQ(textFromBytes(wrong, Markup::html)->find(samples[0].text), std::string::npos);
+}
+
+TEST(CharacterSet, textOfWesternEuropeIsNotTakenForAnythingElse) {
+  const std::string text =
+      "<p>Überprüfen Sie, ob der Drucker eingeschaltet ist. Größere Dokumente können länger "
+      "brauchen; wählen Sie dafür die Übersicht über die Aufträge. Führen Sie nötigenfalls "
+      "zusätzliche Prüfungen für größere Aufträge durch.</p>";
+  EXPECT_EQ(textFromBytes(inSet(text, "windows-1252"), Markup::html), text);
 }
 
 TEST(CharacterSet, unknownNamesFallBackToWhatTheBytesLookLike) {

@@ -300,6 +300,14 @@ TEST_F(DocBook, entitiesOfEntitiesStandForTheirText) {
   EXPECT_THAT(bodyTexts(found[0]), ElementsAre("With Some Writer."));
 }
 
+TEST_F(DocBook, entitiesInAttributesStandForTheirText) {
+  const auto found = pages(
+      "<!DOCTYPE book [<!ENTITY dash '–&more;'><!ENTITY more '<b>x</b>y'>"
+      "<!ENTITY file SYSTEM 'f'>]><book lang='d&e;'><chapter id='a&dash;&amp;&file;'/></book>");
+  EXPECT_THAT(fragments(found), ElementsAre("", "a–xy&"));
+  EXPECT_EQ(found[0].language, "de");
+}
+
 TEST_F(DocBook, undeclaredEntitiesStandForTheirNamesOrCharacters) {
   const auto found = pages(
       "<!DOCTYPE article PUBLIC 'p' 'far.dtd'><article lang='&language;'>"
@@ -329,6 +337,19 @@ TEST_F(DocBook, entityBombsAreRefused) {
               }() +
               "</article>"),
       "entities that stand for too much text");
+}
+
+TEST_F(DocBook, shortEntitiesThatStandForMuchTextAreCountedAsThat) {
+  const std::string declarations = "<!DOCTYPE article [<!ENTITY long '" + std::string(60000, 'x') +
+                                   "'><!ENTITY short '&long;'>]><article>";
+  std::string text = declarations;
+  std::string attributes = declarations;
+  for (int i = 0; i < 100; ++i) {
+    text += "<para>&short;</para>";
+    attributes += "<para id='&short;'/>";
+  }
+  EXPECT_EQ(refusal(text + "</article>"), "entities that stand for too much text");
+  EXPECT_EQ(refusal(attributes + "</article>"), "entities that stand for too much text");
 }
 
 TEST_F(DocBook, entitiesThatNameThemselvesDoNoHarm) {

@@ -7,10 +7,13 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <atomic>
 #include <filesystem>
 
 #include "TestSupport.h"
 #include "bvmake/Priority.h"
+#include "bvmake/Run.h"
+#include "platform/Environment.h"
 
 namespace bvmake {
 namespace {
@@ -143,6 +146,51 @@ TEST(Priority, isLoweredOnProcessorAndDisk) {
   int status = 0;
   waitpid(child, &status, 0);
   EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0);
+}
+
+/// Notes whether every thread that reads a page has given way.
+class PriorityWatcher : public platform::FileManager {
+ public:
+  std::optional<platform::Data> contentsAtPath(const std::string& path,
+                                               platform::Error* error) const override {
+    const auto thread = static_cast<id_t>(syscall(SYS_gettid));
+    const bool nice = getpriority(PRIO_PROCESS, thread) >= loweredNiceness;
+    const bool idle = (syscall(SYS_ioprio_get, 1, 0) >> 13) == 3;
+    reads += 1;
+    lowered += nice && idle ? 1 : 0;
+    return FileManager::contentsAtPath(path, error);
+  }
+
+  mutable std::atomic<int> reads{0};
+  mutable std::atomic<int> lowered{0};
+};
+
+TEST(Priority, isLoweredInEveryThreadOfARun) {
+  const TemporaryFolder folder;
+  for (int i = 0; i < 50; ++i) {
+    folder.write("book/" + std::to_string(i) + ".html", "<p>words");
+  }
+  CreateOptions options;
+  options.folder = folder / "book";
+  options.outputPath = folder / "o";
+  options.loweredPriority = true;
+  for (const size_t jobs : {size_t{0}, size_t{4}}) {
+    options.jobs = jobs;
+    const pid_t child = fork();
+    ASSERT_GE(child, 0);
+    if (child == 0) {
+      const auto files = std::make_shared<PriorityWatcher>();
+      platform::Environment environment = platform::Environment::system();
+      environment.files = files;
+      const platform::EnvironmentOverride override(environment);
+      RecordingReport report;
+      const bool done = run(options, report).exitCode == ExitCode::success;
+      _exit(done && files->reads == 50 && files->lowered == 50 ? 0 : 1);
+    }
+    int status = 0;
+    waitpid(child, &status, 0);
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0) << jobs;
+  }
 }
 
 TEST(Priority, isNeverRaised) {
