@@ -240,7 +240,10 @@ std::optional<CommandLine> parseCommandLine(const std::vector<std::string>& argu
     if (word != arguments.end() && std::none_of(arguments.begin(), arguments.end(), isCommand)) {
       console.error("there is no command \"" + *word + "\"");
     } else {
-      console.error(error.what());
+      // The message may name an argument.
+      std::string message = error.what();
+      std::erase(message, wordMark);
+      console.error(message);
     }
     console.note("'zeb --help' and 'zeb COMMAND --help' say more");
     exitCode = ExitCode::usage;

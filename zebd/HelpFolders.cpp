@@ -255,7 +255,7 @@ void Manuals::addRegistered() {
     constexpr std::string_view usual = "/usr/share/doc/";
     std::string page = platform::stringByStandardizingPath(manual->indexPage);
     if (page.starts_with(usual)) {
-      page = shownDocuments + page.substr(usual.size());
+      page.replace(0, usual.size(), shownDocuments);
     }
     if (!page.starts_with(shownDocuments) || !isFile(page)) {
       _passedOver(path, "the page that it names is not there");

@@ -20,7 +20,8 @@ void require(bool condition) {
 }
 
 constexpr std::string_view queries[] = {
-    "print* queue* ", "\"the queue\" -printer", "*e* | a*", "the", "p* +q* !x", "\"t* q*\"", "w* wo* p* a*", "ma* +w*", "\"many many\"",
+    "print* queue* ", "\"the queue\" -printer", "*e* | a*", "the",           "p* +q* !x",
+    "\"t* q*\"",      "w* wo* p* a*",           "ma* +w*",  "\"many many\"",
 };
 
 void search(const SKIndexRef& index, std::string_view query, SKSearchOptions options) {

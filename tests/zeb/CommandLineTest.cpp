@@ -4,6 +4,8 @@
 
 #include <sstream>
 
+#include "platform/Strings.h"
+
 namespace {
 
 using testing::ElementsAre;
@@ -37,6 +39,7 @@ class CommandLineTest : public testing::Test {
     EXPECT_EQ(code, ExitCode::usage);
     EXPECT_THAT(err.str(), HasSubstr("zeb: error: "));
     EXPECT_THAT(err.str(), HasSubstr(text));
+    EXPECT_TRUE(platform::isValidUTF8(err.str()));
     EXPECT_EQ(out.str(), "");
   }
 
@@ -216,6 +219,7 @@ TEST_F(CommandLineTest, WrongLinesAreUsageErrors) {
   expectUsageError({"search", "a", "--limit"}, "--limit");
   expectUsageError({"search", "a", "--book"}, "--book");
   expectUsageError({"--color", "books"}, "--color");
+  expectUsageError({"-q", "search", "print"}, "-q");
 }
 
 TEST_F(CommandLineTest, HelpAndVersionGoToTheOutputAndSucceed) {

@@ -15,6 +15,7 @@
 
 #include "platform/RunLoop.h"
 #include "tests/platform/services/PrivateBus.h"
+#include "tests/platform/services/UnopenedBus.h"
 #include "tests/support/ChildProcess.h"
 #include "tests/zebd/HostWorld.h"
 #include "zebd/HelpService.h"
@@ -343,6 +344,7 @@ TEST_F(BusServiceTest, EndOfTheBusIsTold) {
 }
 
 TEST(BusServiceWithoutBusTest, ThereIsNoServiceWithoutABus) {
+  const tests::LostConnections lost;
   platform::Error error;
   EXPECT_EQ(zebd::BusService::connect("unix:path=/nonexistent/bus", error), nullptr);
   EXPECT_THAT(error.description, StartsWith("there is no message bus: "));

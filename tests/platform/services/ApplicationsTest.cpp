@@ -8,20 +8,10 @@
 #include <map>
 #include <optional>
 
-#if defined(__SANITIZE_ADDRESS__)
-#define ZEB_LEAK_CHECKER
-#elif defined(__has_feature)
-#if __has_feature(address_sanitizer)
-#define ZEB_LEAK_CHECKER
-#endif
-#endif
-#if defined(ZEB_LEAK_CHECKER)
-#include <sanitizer/lsan_interface.h>
-#endif
-
 #include "platform/Environment.h"
 #include "tests/platform/TemporaryFolder.h"
 #include "tests/platform/services/PrivateBus.h"
+#include "tests/platform/services/UnopenedBus.h"
 
 namespace platform {
 namespace {
@@ -79,14 +69,8 @@ TEST(RunningApplications, areTheNamesOnTheBusAsItIsNow) {
 TEST(RunningApplications, areNoneWithoutABus) {
   const TemporaryFolder folder;
   const Variable address("DBUS_SESSION_BUS_ADDRESS", "unix:path=" + folder.path("nothing"));
-#if defined(ZEB_LEAK_CHECKER)
-  // The bus library loses the connection object of an address that it cannot open.
-  __lsan_disable();
-#endif
+  const tests::LostConnections lost;
   EXPECT_TRUE(systemRunningApplications().empty());
-#if defined(ZEB_LEAK_CHECKER)
-  __lsan_enable();
-#endif
 }
 
 /// Under the variables as they are now.
