@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "SearchKit/IndexCheck.h"
 #include "SearchKit/IndexFormat.h"
 #include "SearchKit/IndexReader.h"
 #include "SearchKit/SearchKit.h"
@@ -122,6 +123,25 @@ TEST(MergedLists, areNamedAmongTheSections) {
     isThere = isThere || (section.id == 9 && section.name == "merged lists" && section.isIntact);
   }
   EXPECT_TRUE(isThere);
+}
+
+TEST(MergedLists, areComparedWithTheirTermsByTheCheck) {
+  const std::vector<uint8_t> bytes = bytesOf(testing::indexData(manyPages(1)));
+  const auto problems = [](const std::vector<uint8_t>& some) {
+    return indexProblems(*SKIndexOpenWithData(platform::Data::adopt(some)));
+  };
+  EXPECT_TRUE(problems(bytes).empty());
+  const auto offset =
+      format::load<uint64_t>(bytes.data() + mergedEntry(bytes) + format::sectionOffsetAt);
+  const auto length =
+      format::load<uint64_t>(bytes.data() + mergedEntry(bytes) + format::sectionLengthAt);
+  const auto count = format::load<uint32_t>(bytes.data() + offset);
+  std::vector<uint8_t> changed = bytes;
+  // The last posting of the last list.
+  changed[offset + length - 1] ^= 1;
+  const std::string wrong =
+      "merged list " + std::to_string(count) + ": it is not that of its terms";
+  EXPECT_EQ(problems(changed).back(), wrong);
 }
 
 void searchAll(const std::vector<uint8_t>& bytes) {

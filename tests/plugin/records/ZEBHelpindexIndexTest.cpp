@@ -282,6 +282,22 @@ TEST(ZEBHelpindexIndex, WithoutKeywordDataIsSearchableUntilAskedAndGivesNoRefere
   EXPECT_TRUE(index->isSearchable()) << "nothing was opened that could tell otherwise";
 }
 
+TEST(ZEBHelpindexIndex, IndexWithWrongChecksumsGivesNoReferenceUntilSoundDataComes) {
+  const HelpIndexWorld world;
+  std::string damaged(someIndex().view());
+  ASSERT_NE(SKIndexOpenWithData(platform::Data::copy(damaged)), nullptr);
+  damaged.back() = static_cast<char>(damaged.back() ^ 1);
+  ASSERT_NE(SKIndexOpenWithData(platform::Data::copy(damaged)), nullptr) << "opening does not tell";
+  const auto index = ZEBHelpindexIndex::initWithPath(
+      world.write("a.helpindex", {{"SKI_INDEX_DATA", platform::Data::copy(damaged)}}));
+  ASSERT_NE(index, nullptr);
+  EXPECT_EQ(index->copyIndexRef(), nullptr);
+  EXPECT_TRUE(index->isSearchable());
+  EXPECT_TRUE(index->reinitializeWithData(
+      platform::classicArchiveWithRootObject(Value::Dictionary{{"SKI_INDEX_DATA", someIndex()}})));
+  EXPECT_NE(index->copyIndexRef(), nullptr);
+}
+
 TEST(ZEBHelpindexIndex, WithoutKeywordDataGivesThePreviousReferenceWhileSomebodyHoldsIt) {
   const HelpIndexWorld world;
   const auto index = ZEBHelpindexIndex::initWithPath(
