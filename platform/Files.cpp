@@ -192,6 +192,11 @@ std::optional<Data> FileManager::contentsMappedAtPath(const std::string& path, E
     return readAll(file, path, 0, error);
   }
   void* address = ::mmap(nullptr, length, PROT_READ, MAP_PRIVATE, file.number(), 0);
+  if (address == MAP_FAILED && errno == ENOMEM) {
+    // What has no room to be mapped has none to be read.
+    report(error, ENOMEM, path);
+    return std::nullopt;
+  }
   if (address == MAP_FAILED) {
     return readAll(file, path, length, error);
   }

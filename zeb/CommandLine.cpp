@@ -82,6 +82,7 @@ struct Parser {
   PublishCommand publishCommand;
   bool noInstalledBooks = false;
   bool noWait = false;
+  bool noDaemon = false;
 
  private:
   CLI::App* _addCommand(const std::string& name, const std::string& description);
@@ -124,6 +125,7 @@ Parser::Parser() {
       ->envname("ZEB_CACHE_DIR")
       ->option_text("DIR");
   app.add_flag("--no-wait", noWait, "Do not wait for indexes that are being made");
+  app.add_flag("--no-daemon", noDaemon, "Search in this process, even where a help daemon runs");
   app.add_option("--wait", common.waiting.limit, "Wait for them at most this long (300)")
       ->check(CLI::Range(0.0, 1e9).description(""))
       ->check([](const std::string& seconds) {
@@ -255,6 +257,8 @@ std::optional<CommandLine> parseCommandLine(const std::vector<std::string>& argu
     line.cacheFolder = unmarked(parser.cacheFolder);
   }
   line.waiting.waits = !parser.noWait;
+  // A daemon has books and indexes of its own place.
+  line.usesDaemon = !parser.noDaemon && !line.cacheFolder;
   if (parser.search->parsed()) {
     unmark(parser.searchCommand.words);
     unmark(parser.searchCommand.books);

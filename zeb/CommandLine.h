@@ -110,6 +110,8 @@ struct CommandLine {
   ColorMode color = ColorMode::automatic;
   /// The caches folder, for indexes and the catalogue, when the user names one.
   std::optional<std::string> cacheFolder;
+  /// Whether the help daemon is asked, where there is one.
+  bool usesDaemon = true;
   Waiting waiting;
   int verbosity = 0;
 };

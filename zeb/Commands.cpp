@@ -17,6 +17,7 @@
 #include "platform/Processes.h"
 #include "platform/Strings.h"
 #include "platform/WorkerThreads.h"
+#include "zeb/DaemonSearches.h"
 #include "zeb/HelpSearch.h"
 #include "zeb/Indexing.h"
 #include "zeb/Interactive.h"
@@ -47,7 +48,8 @@ class Session {
         _catalogue(std::move(catalogue)),
         _installation(installation),
         _waiting(line.waiting),
-        _verbosity(line.verbosity) {}
+        _verbosity(line.verbosity),
+        _usesDaemon(line.usesDaemon) {}
 
   ExitCode operator()(const SearchCommand& command);
   ExitCode operator()(const SuggestCommand& command);
@@ -73,6 +75,8 @@ class Session {
 
   ExitCode _searchInteractively(const SearchCommand& command);
   ExitCode _ask(const std::vector<std::string>& bookIDs, const Question& question);
+  std::unique_ptr<HelpSearch> _startSearch(std::vector<CatalogueEntry> entries);
+  std::unique_ptr<DaemonSearches> _daemon() const;
   bool _knowsBooks(const std::vector<CatalogueEntry>& entries,
                    const std::vector<std::string>& bookIDs);
   void _makeMissingIndexes(HelpSearch& search, const std::vector<std::string>& bookIDs);
@@ -86,6 +90,7 @@ class Session {
   const Installation& _installation;
   const Waiting _waiting;
   const int _verbosity;
+  const bool _usesDaemon;
 };
 
 /// Whether there are books, and these among them; says what is wrong where not.
@@ -152,16 +157,39 @@ std::optional<bool> Session::_show(const std::string& asked, const std::optional
   return !answer->pages.empty();
 }
 
+/// The daemon, if it is to be asked and there is one.
+std::unique_ptr<DaemonSearches> Session::_daemon() const {
+  auto daemon = _usesDaemon ? DaemonSearches::connect() : nullptr;
+  if (daemon != nullptr && _catalogue.entries().empty()) {
+    // It has just begun, and looks for books anyway.
+    _console.progress("looking for books");
+    (void)daemon->rescan(platform::Seconds(_waiting.limit));
+    _console.clearProgress();
+  }
+  return daemon;
+}
+
+/// A host in this process; null where it cannot be had, which has been said then.
+std::unique_ptr<HelpSearch> Session::_startSearch(std::vector<CatalogueEntry> entries) {
+  followLanguages(_catalogue, entries);
+  platform::Error error;
+  auto search = HelpSearch::start(entries, _installation, error);
+  if (search == nullptr) {
+    _console.error(error.description);
+  }
+  return search;
+}
+
 ExitCode Session::_ask(const std::vector<std::string>& bookIDs, const Question& question) {
+  auto daemon = _daemon();
   std::vector<CatalogueEntry> entries = _catalogue.entries();
   if (!_knowsBooks(entries, bookIDs)) {
     return ExitCode::failure;
   }
-  followLanguages(_catalogue, entries);
-  platform::Error error;
-  const std::unique_ptr<HelpSearch> search = HelpSearch::start(entries, _installation, error);
+  const std::unique_ptr<HelpSearch> search = daemon != nullptr
+                                                 ? HelpSearch::withDaemon(std::move(daemon))
+                                                 : _startSearch(std::move(entries));
   if (search == nullptr) {
-    _console.error(error.description);
     return ExitCode::failure;
   }
   _makeMissingIndexes(*search, bookIDs);

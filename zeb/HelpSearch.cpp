@@ -15,7 +15,9 @@
 #include "platform/Strings.h"
 #include "platform/ThreadSafety.h"
 #include "platform/URL.h"
+#include "zeb/DaemonSearches.h"
 #include "zeb/RemoteBooks.h"
+#include "zeb/SearchProvider.h"
 #include "zebd/BookFolder.h"
 #include "zebd/Host.h"
 
@@ -30,16 +32,12 @@ constexpr platform::Seconds quietSpan{0.2};
 /// But language models follow a change of indexes after a second in which nothing else changes.
 constexpr platform::Seconds modelSpan{1.2};
 constexpr platform::Seconds removalLimit{10};
+/// How often the daemon is asked how far it is.
+constexpr platform::Seconds daemonPace{0.2};
 /// Searches bound their own waits.
 constexpr platform::Seconds forever = platform::Seconds::max();
 
 platform::Clock::Instant elapsedNow() { return platform::Environment::current()->clock->elapsed(); }
-
-std::string nameOfPage(const std::string& url) {
-  const std::optional<platform::URL> parsed = platform::URL::URLWithString(url);
-  const std::string name = parsed ? parsed->lastPathComponent() : std::string();
-  return name.empty() ? url : name;
-}
 
 /// Somebody's: whose it is, its command line does not say.
 bool anIndexingToolIsRunning() {
@@ -49,24 +47,20 @@ bool anIndexingToolIsRunning() {
                      [](const auto& process) { return process.commandName == "bvmake"; });
 }
 
-using Records = std::vector<std::shared_ptr<ZEBResult>>;
+using Items = std::vector<zebd::FoundItem>;
 
-/// What one search delivered.
-struct Delivery {
-  Records records;
-  std::vector<std::string> texts;
-};
-
-/// Keeps what one search delivers, and wakes the main loop at its end.
-class Collector : public zebd::SearchReceiver {
+/// A search of the host in this process. Wakes the main loop at its end.
+class HostedSearch : public RunningSearch, public zebd::SearchReceiver {
  public:
+  HostedSearch(std::shared_ptr<ZEBQuery> query, std::shared_ptr<const zebd::Bookshelf> bookshelf)
+      : _query(std::move(query)), _bookshelf(std::move(bookshelf)) {}
+
+  // zebd::SearchReceiver.
   void foundResults(const ZEBResultBatch& batch) override {
+    Items items = zebd::itemsOfBatch(batch, *_bookshelf);
     const platform::MutexLock lock(_mutex);
-    if (const auto* records = std::get_if<Records>(&batch)) {
-      _delivery.records.insert(_delivery.records.end(), records->begin(), records->end());
-    } else if (const auto* texts = std::get_if<std::vector<std::string>>(&batch)) {
-      _delivery.texts.insert(_delivery.texts.end(), texts->begin(), texts->end());
-    }
+    _items.insert(_items.end(), std::make_move_iterator(items.begin()),
+                  std::make_move_iterator(items.end()));
   }
   void searchEnded(bool finished) override {
     {
@@ -77,38 +71,73 @@ class Collector : public zebd::SearchReceiver {
     platform::RunLoop::main()->stop();
   }
 
-  bool ended() const {
+  // RunningSearch.
+  void cancel() override { _query->cancel(); }
+  bool ended() const override {
     const platform::MutexLock lock(_mutex);
     return _ended;
   }
-  Delivery deliverySoFar() const {
+  bool finished() const override {
     const platform::MutexLock lock(_mutex);
-    return _delivery;
+    return _finished;
   }
-  /// Absent when the search broke off.
-  std::optional<Delivery> delivery() const {
+  Items items() const override {
     const platform::MutexLock lock(_mutex);
-    return _finished ? std::optional(_delivery) : std::nullopt;
+    return _items;
   }
 
  private:
+  const std::shared_ptr<ZEBQuery> _query;
+  const std::shared_ptr<const zebd::Bookshelf> _bookshelf;
   mutable platform::Mutex _mutex;
-  Delivery _delivery GUARDED_BY(_mutex);
+  Items _items GUARDED_BY(_mutex);
   bool _ended GUARDED_BY(_mutex) = false;
   bool _finished GUARDED_BY(_mutex) = false;
 };
 
-std::shared_ptr<ZEBQuery> makeQuery(std::string_view text, const std::vector<std::string>& bookIDs,
-                                    std::vector<std::string> kinds, size_t limit) {
-  auto query = ZEBQuery::initWithQueryString(std::string(text));
-  query->setScope(bookIDs);
-  query->setResultTypes(std::move(kinds));
-  query->setLimit(limit);
-  if (bookIDs.empty()) {
-    // Without that, models that do not have the system's own manual would be passed over.
-    query->setOptions(platform::Value::Dictionary{{ZEBQuerySearchAllBooksOptionKey, true}});
+/// Searches of a host in this process.
+class HostedSearches : public SearchProvider {
+ public:
+  explicit HostedSearches(Host& host) : _host(host) {}
+
+  std::shared_ptr<RunningSearch> begin(const zebd::SearchRequest& request) override {
+    const auto query = request.query();
+    auto search = std::make_shared<HostedSearch>(query, _host.sharedBookshelf());
+    _host.startSearch(query, search);
+    return search;
   }
-  return query;
+
+  bool lacksIndex(const std::string& bookID) const {
+    const auto book = _host.bookshelf().bookWithID(bookID);
+    return book != nullptr && book->type() != ZEBHelpBookType4 && !zebd::indexPathOfBook(*book);
+  }
+  std::vector<std::string> booksWithoutIndex(const std::vector<std::string>& bookIDs) override {
+    std::vector<std::string> missing;
+    if (bookIDs.empty()) {
+      for (const auto& entry : _host.bookshelf().books()) {
+        if (lacksIndex(entry.first)) {
+          missing.push_back(entry.first);
+        }
+      }
+      return missing;
+    }
+    std::copy_if(bookIDs.begin(), bookIDs.end(), std::back_inserter(missing),
+                 [this](const std::string& bookID) { return lacksIndex(bookID); });
+    return missing;
+  }
+
+ private:
+  Host& _host;
+};
+
+zebd::SearchRequest requestFor(std::string_view text, const std::vector<std::string>& bookIDs,
+                               std::vector<std::string> kinds, size_t limit) {
+  zebd::SearchRequest request;
+  request.text = std::string(text);
+  request.bookIDs = bookIDs;
+  request.kinds = std::move(kinds);
+  request.limit = limit;
+  return request;
 }
 
 /// Which books the plug-in has reported since it was last asked.
@@ -140,87 +169,62 @@ class Reports {
 }  // namespace
 
 struct HelpSearch::Implementation {
+  /// Null where the daemon searches.
   std::unique_ptr<Host> host;
+  std::unique_ptr<DaemonSearches> daemon;
+  std::unique_ptr<HostedSearches> hosted;
   std::shared_ptr<Reports> reports = std::make_shared<Reports>();
 
-  bool lacksIndex(const std::string& bookID) const {
-    const auto book = host->bookshelf().bookWithID(bookID);
-    return book != nullptr && book->type() != ZEBHelpBookType4 && !zebd::indexPathOfBook(*book);
-  }
-
-  FoundPage pageOfResult(const ZEBResult& result) const {
-    FoundPage page;
-    page.bookID = result.bookID().value_or("");
-    const auto book = host->bookshelf().bookWithID(page.bookID);
-    page.bookTitle = book == nullptr ? page.bookID : book->title();
-    page.url = result.payloadValueForKey(ZEBResultURLKey).stringValue().value_or("");
-    page.abstract = result.payloadValueForKey(ZEBResultAbstractKey).stringValue();
-    page.title = result.title().value_or("");
-    if (page.title.empty()) {
-      page.title = nameOfPage(page.url);
-    }
-    page.relevance = result.relevance().doubleValue();
-    return page;
+  SearchProvider& provider() const {
+    return daemon != nullptr ? static_cast<SearchProvider&>(*daemon) : *hosted;
   }
 
   /// Absent when the search broke off.
-  std::optional<Delivery> deliveryOfQuery(const std::shared_ptr<ZEBQuery>& query) {
-    const auto collector = std::make_shared<Collector>();
-    host->startSearch(query, collector);
-    Host::runMainLoopUntil([&] { return collector->ended(); }, forever);
-    return collector->delivery();
+  std::optional<Items> itemsOf(const zebd::SearchRequest& request) {
+    const auto search = provider().begin(request);
+    Host::runMainLoopUntil([&] { return search->ended(); }, forever);
+    return search->finished() ? std::optional(search->items()) : std::nullopt;
   }
 
-  std::optional<Answer> answer(const std::shared_ptr<ZEBQuery>& query, size_t limit) {
-    const std::optional<Delivery> delivery = deliveryOfQuery(query);
-    if (!delivery) {
-      return std::nullopt;
-    }
-    Answer answer;
-    answer.pages = pagesOfRecords(delivery->records);
-    answer.count = answer.pages.size();
-    if (answer.pages.size() > limit) {
-      answer.pages.resize(limit);
-    }
-    return answer;
-  }
-
-  std::vector<FoundPage> pagesOfRecords(const Records& records) const;
+  std::optional<Answer> answer(const zebd::SearchRequest& request, size_t limit);
 };
 
-std::vector<FoundPage> HelpSearch::Implementation::pagesOfRecords(const Records& records) const {
+namespace {
+
+std::vector<FoundPage> pagesOfItems(const Items& items) {
   std::vector<FoundPage> pages;
   std::set<std::string> shown;
-  for (const auto& record : records) {
-    if (record->type() != ZEBHelpArticleResult) {
-      continue;
-    }
-    FoundPage page = pageOfResult(*record);
+  for (const zebd::FoundItem& item : items) {
     // A book may name one page for the words in several of its lists.
-    if (shown.insert(page.url).second) {
-      pages.push_back(std::move(page));
+    if (item.kind == ZEBHelpArticleResult && shown.insert(item.url).second) {
+      pages.push_back(
+          {item.title, item.bookID, item.bookTitle, item.abstract, item.url, item.relevance});
     }
   }
   return pages;
 }
 
-namespace {
-
-std::vector<Suggestion> suggestionsOfDelivery(const Delivery& delivery, const std::string& kind,
-                                              size_t limit) {
+std::vector<Suggestion> suggestionsOfItems(const Items& items, const std::string& kind,
+                                           size_t limit) {
   std::vector<Suggestion> suggestions;
   std::set<std::string> shown;
-  const auto add = [&](const std::string& text, double relevance) {
-    if (suggestions.size() < limit && shown.insert(platform::lowercaseString(text)).second) {
-      suggestions.push_back({text, relevance});
+  const auto add = [&](const zebd::FoundItem& item) {
+    if (suggestions.size() < limit && shown.insert(platform::lowercaseString(item.title)).second) {
+      suggestions.push_back({item.title, item.relevance});
     }
   };
-  for (const std::string& text : delivery.texts) {
-    add(text, 0);
+  // Those of a book's own list have no relevance and no book, and come first.
+  const auto isOfAList = [](const zebd::FoundItem& item) {
+    return item.kind == ZEBHelpSuggestionResult && item.relevance == 0;
+  };
+  for (const zebd::FoundItem& item : items) {
+    if (isOfAList(item)) {
+      add(item);
+    }
   }
-  for (const auto& record : delivery.records) {
-    if (record->type() == kind) {
-      add(record->title().value_or(std::string()), record->relevance().doubleValue());
+  for (const zebd::FoundItem& item : items) {
+    if (item.kind == kind && !isOfAList(item)) {
+      add(item);
     }
   }
   return suggestions;
@@ -228,22 +232,32 @@ std::vector<Suggestion> suggestionsOfDelivery(const Delivery& delivery, const st
 
 }  // namespace
 
+std::optional<Answer> HelpSearch::Implementation::answer(const zebd::SearchRequest& request,
+                                                         size_t limit) {
+  const std::optional<Items> items = itemsOf(request);
+  if (!items) {
+    return std::nullopt;
+  }
+  Answer answer;
+  answer.pages = pagesOfItems(*items);
+  answer.count = answer.pages.size();
+  if (answer.pages.size() > limit) {
+    answer.pages.resize(limit);
+  }
+  return answer;
+}
+
 class HelpSearch::Live : public LiveSearch {
  public:
-  Live(const Implementation& implementation, std::shared_ptr<ZEBQuery> query)
-      : _implementation(implementation),
-        _query(std::move(query)),
-        _collector(std::make_shared<Collector>()) {
-    _implementation.host->startSearch(_query, _collector);
-  }
+  explicit Live(std::shared_ptr<RunningSearch> search) : _search(std::move(search)) {}
 
-  void cancel() override { _query->cancel(); }
-  bool ended() const override { return _collector->ended(); }
+  void cancel() override { _search->cancel(); }
+  bool ended() const override { return _search->ended(); }
   LiveAnswer answer(size_t limit) const override {
-    const Delivery delivery = _collector->deliverySoFar();
+    const Items items = _search->items();
     LiveAnswer answer;
-    answer.completions = suggestionsOfDelivery(delivery, ZEBHelpSuggestionResult, limit);
-    answer.pages = _implementation.pagesOfRecords(delivery.records);
+    answer.completions = suggestionsOfItems(items, ZEBHelpSuggestionResult, limit);
+    answer.pages = pagesOfItems(items);
     if (answer.pages.size() > limit) {
       answer.pages.resize(limit);
     }
@@ -251,16 +265,13 @@ class HelpSearch::Live : public LiveSearch {
   }
 
  private:
-  const Implementation& _implementation;
-  const std::shared_ptr<ZEBQuery> _query;
-  const std::shared_ptr<Collector> _collector;
+  const std::shared_ptr<RunningSearch> _search;
 };
 
 std::shared_ptr<LiveSearch> HelpSearch::beginLiveSearch(std::string_view text,
                                                         const std::vector<std::string>& bookIDs) {
-  return std::make_shared<Live>(
-      *_implementation,
-      makeQuery(text, bookIDs, {ZEBHelpArticleResult, ZEBHelpSuggestionResult}, 0));
+  return std::make_shared<Live>(_implementation->provider().begin(
+      requestFor(text, bookIDs, {ZEBHelpArticleResult, ZEBHelpSuggestionResult}, 0)));
 }
 
 HelpSearch::HelpSearch(std::unique_ptr<Implementation> implementation)
@@ -282,6 +293,7 @@ std::unique_ptr<HelpSearch> HelpSearch::start(const std::vector<CatalogueEntry>&
   if (implementation->host == nullptr) {
     return nullptr;
   }
+  implementation->hosted = std::make_unique<HostedSearches>(*implementation->host);
   implementation->host->owner().setBookModifiedHandler(
       [reports = implementation->reports](const std::shared_ptr<ZEBHelpBook>& book) {
         if (book != nullptr) {
@@ -294,28 +306,59 @@ std::unique_ptr<HelpSearch> HelpSearch::start(const std::vector<CatalogueEntry>&
   return std::unique_ptr<HelpSearch>(new HelpSearch(std::move(implementation)));
 }
 
+std::unique_ptr<HelpSearch> HelpSearch::withDaemon(std::unique_ptr<DaemonSearches> daemon) {
+  auto implementation = std::make_unique<Implementation>();
+  implementation->daemon = std::move(daemon);
+  return std::unique_ptr<HelpSearch>(new HelpSearch(std::move(implementation)));
+}
+
 std::vector<std::string> HelpSearch::booksWithoutIndex(
     const std::vector<std::string>& bookIDs) const {
-  std::vector<std::string> missing;
-  if (bookIDs.empty()) {
-    for (const auto& entry : _implementation->host->bookshelf().books()) {
-      if (_implementation->lacksIndex(entry.first)) {
-        missing.push_back(entry.first);
-      }
-    }
-    return missing;
-  }
-  std::copy_if(bookIDs.begin(), bookIDs.end(), std::back_inserter(missing),
-               [&](const std::string& bookID) { return _implementation->lacksIndex(bookID); });
-  return missing;
+  return _implementation->provider().booksWithoutIndex(bookIDs);
+}
+
+HelpSearch::Indexing HelpSearch::_waitForDaemon(const std::vector<std::string>& bookIDs,
+                                                platform::Seconds limit, const Progress& progress) {
+  std::set<std::string> waiting(bookIDs.begin(), bookIDs.end());
+  size_t count = 0;
+  platform::Clock::Instant nextLook = elapsedNow();
+  platform::Clock::Instant lastWork = elapsedNow();
+  Indexing indexing;
+  indexing.ended = Host::runMainLoopUntil(
+      [&] {
+        const platform::Clock::Instant now = elapsedNow();
+        if (now < nextLook) {
+          return false;
+        }
+        nextLook = now + daemonPace;
+        const std::vector<std::string> missing = booksWithoutIndex(bookIDs);
+        for (const std::string& bookID : bookIDs) {
+          const bool isIndexed = std::find(missing.begin(), missing.end(), bookID) == missing.end();
+          if (isIndexed && waiting.erase(bookID) > 0) {
+            ++count;
+            progress(bookID, count);
+          }
+        }
+        if (_implementation->daemon->isBusy()) {
+          lastWork = now;
+        }
+        // Work begets work, with gaps between.
+        return waiting.empty() || now - lastWork > modelSpan;
+      },
+      limit);
+  indexing.missing.assign(waiting.begin(), waiting.end());
+  return indexing;
 }
 
 HelpSearch::Indexing HelpSearch::makeIndexes(const std::vector<std::string>& bookIDs,
                                              platform::Seconds limit, const Progress& progress) {
+  if (_implementation->daemon != nullptr) {
+    return _waitForDaemon(bookIDs, limit, progress);
+  }
   std::set<std::string> waiting(bookIDs.begin(), bookIDs.end());
   size_t count = 0;
   const auto tell = [&](const std::string& bookID) {
-    if (!_implementation->lacksIndex(bookID) && waiting.erase(bookID) > 0) {
+    if (!_implementation->hosted->lacksIndex(bookID) && waiting.erase(bookID) > 0) {
       ++count;
       progress(bookID, count);
     }
@@ -332,7 +375,8 @@ HelpSearch::Indexing HelpSearch::makeIndexes(const std::vector<std::string>& boo
   bool isAnew = false;
   while (true) {
     (void)_implementation->reports->take();
-    const auto collector = std::make_shared<Collector>();
+    const auto collector =
+        std::make_shared<HostedSearch>(nullptr, _implementation->host->sharedBookshelf());
     _implementation->host->registerBooks({waiting.begin(), waiting.end()}, collector);
     indexing.ended = Host::runMainLoopUntil(
         [&] {
@@ -366,7 +410,8 @@ HelpSearch::Indexing HelpSearch::makeIndexes(const std::vector<std::string>& boo
 }
 
 bool HelpSearch::fetchIndexes(const std::vector<std::string>& bookIDs, platform::Seconds limit) {
-  const auto collector = std::make_shared<Collector>();
+  const auto collector =
+      std::make_shared<HostedSearch>(nullptr, _implementation->host->sharedBookshelf());
   _implementation->host->registerBooks(bookIDs, collector);
   return Host::runMainLoopUntil(
       [&] {
@@ -394,45 +439,47 @@ bool HelpSearch::removeIndexes(const std::vector<std::string>& bookIDs) {
 
 std::optional<Answer> HelpSearch::search(std::string_view words,
                                          const std::vector<std::string>& bookIDs, size_t limit) {
-  return _implementation->answer(makeQuery(words, bookIDs, {ZEBHelpArticleResult}, limit), limit);
+  return _implementation->answer(requestFor(words, bookIDs, {ZEBHelpArticleResult}, limit), limit);
 }
 
 std::optional<Answer> HelpSearch::searchActions(std::string_view words,
                                                 const std::vector<std::string>& bookIDs,
                                                 size_t limit) {
   return _implementation->answer(
-      makeQuery(words, bookIDs, {ZEBHelpArticleResult, ZEBHelpActionResult}, limit), limit);
+      requestFor(words, bookIDs, {ZEBHelpArticleResult, ZEBHelpActionResult}, limit), limit);
 }
 
 std::optional<std::vector<Suggestion>> HelpSearch::suggestions(
     std::string_view text, const std::vector<std::string>& bookIDs, size_t limit) {
-  const auto delivery =
-      _implementation->deliveryOfQuery(makeQuery(text, bookIDs, {ZEBHelpSuggestionResult}, limit));
-  return delivery ? std::optional(suggestionsOfDelivery(*delivery, ZEBHelpSuggestionResult, limit))
-                  : std::nullopt;
+  const auto items =
+      _implementation->itemsOf(requestFor(text, bookIDs, {ZEBHelpSuggestionResult}, limit));
+  return items ? std::optional(suggestionsOfItems(*items, ZEBHelpSuggestionResult, limit))
+               : std::nullopt;
 }
 
 std::optional<std::vector<Suggestion>> HelpSearch::similarSearches(
     std::string_view words, const std::vector<std::string>& bookIDs, size_t limit) {
   // With articles, whose titles are then not offered again.
-  const auto delivery = _implementation->deliveryOfQuery(
-      makeQuery(words, bookIDs, {ZEBHelpArticleResult, ZEBHelpSimilarSuggestionResult}, limit));
-  return delivery ? std::optional(
-                        suggestionsOfDelivery(*delivery, ZEBHelpSimilarSuggestionResult, limit))
-                  : std::nullopt;
+  const auto items = _implementation->itemsOf(
+      requestFor(words, bookIDs, {ZEBHelpArticleResult, ZEBHelpSimilarSuggestionResult}, limit));
+  return items ? std::optional(suggestionsOfItems(*items, ZEBHelpSimilarSuggestionResult, limit))
+               : std::nullopt;
 }
 
 std::optional<Answer> HelpSearch::lookUpAnchor(std::string_view name,
                                                const std::vector<std::string>& bookIDs) {
-  const auto query = makeQuery(name, bookIDs, {ZEBHelpArticleResult}, 0);
-  query->setOptions(platform::Value::Dictionary{
-      {ZEBQueryAnchorSearchOptionKey, true}, {ZEBQuerySearchAllBooksOptionKey, bookIDs.empty()}});
-  return _implementation->answer(query, SIZE_MAX);
+  zebd::SearchRequest request = requestFor(name, bookIDs, {ZEBHelpArticleResult}, 0);
+  request.isAnchor = true;
+  return _implementation->answer(request, SIZE_MAX);
 }
 
 void HelpSearch::settle(platform::Seconds limit) {
-  Host::runMainLoopUntil(
-      [&] { return _implementation->host->owner().isQuietFor(platform::Seconds::zero()); }, limit);
+  // A daemon goes on by itself.
+  if (_implementation->host != nullptr) {
+    Host::runMainLoopUntil(
+        [&] { return _implementation->host->owner().isQuietFor(platform::Seconds::zero()); },
+        limit);
+  }
 }
 
 }  // namespace zeb

@@ -19,6 +19,8 @@ namespace zeb {
 using zebd::CatalogueEntry;
 using zebd::Installation;
 
+class DaemonSearches;
+
 /// A page that was found, ready to be shown.
 struct FoundPage {
   /// The file's name where the page has no title.
@@ -64,16 +66,19 @@ class LiveSearch {
   virtual LiveAnswer answer(size_t limit) const = 0;
 };
 
-/// The one place in which the command line meets the search: a host in this process, with the
-/// plug-in. Its functions run the main loop while they wait, so all of them belong to the main
-/// thread. Lists of identifiers that are empty stand for all books.
+/// The one place in which the command line meets the search: the help daemon, or a host in this
+/// process, with the plug-in. Its functions run the main loop while they wait, so all of them
+/// belong to the main thread. Lists of identifiers that are empty stand for all books.
 class HelpSearch {
  public:
-  /// Null, with `error` set, when the plug-in cannot be loaded. Entries whose books are gone are
-  /// left out.
+  /// A host in this process. Null, with `error` set, when the plug-in cannot be loaded. Entries
+  /// whose books are gone are left out.
   static std::unique_ptr<HelpSearch> start(const std::vector<CatalogueEntry>& entries,
                                            const Installation& installation,
                                            platform::Error& error);
+  /// A client of the daemon, which looks after the books and their indexes by itself: of the
+  /// functions below, those that fetch and remove indexes are not for it.
+  static std::unique_ptr<HelpSearch> withDaemon(std::unique_ptr<DaemonSearches> daemon);
   ~HelpSearch();
   HelpSearch(const HelpSearch&) = delete;
   HelpSearch& operator=(const HelpSearch&) = delete;
@@ -140,6 +145,10 @@ class HelpSearch {
  private:
   struct Implementation;
   class Live;
+
+  Indexing _waitForDaemon(const std::vector<std::string>& bookIDs, platform::Seconds limit,
+                          const Progress& progress);
+
   explicit HelpSearch(std::unique_ptr<Implementation> implementation);
 
   const std::unique_ptr<Implementation> _implementation;

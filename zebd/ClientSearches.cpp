@@ -4,12 +4,9 @@
 #include <utility>
 
 #include "host/Zebrine/ZEBConstants.h"
-#include "host/Zebrine/ZEBHelpBook.h"
 #include "host/Zebrine/ZEBQuery.h"
-#include "host/Zebrine/ZEBResult.h"
 #include "platform/Environment.h"
 #include "platform/RunLoop.h"
-#include "platform/URL.h"
 #include "platform/Value.h"
 #include "zebd/Host.h"
 
@@ -18,54 +15,28 @@ namespace zebd {
 namespace {
 
 using platform::Value;
-using Records = std::vector<std::shared_ptr<ZEBResult>>;
 
 platform::Clock::Instant elapsedNow() { return platform::Environment::current()->clock->elapsed(); }
 
-/// A page without a title is shown by the name of its file.
-std::string nameOfPage(const std::string& url) {
-  const std::optional<platform::URL> parsed = platform::URL::URLWithString(url);
-  const std::string name = parsed ? parsed->lastPathComponent() : std::string();
-  return name.empty() ? url : name;
-}
+}  // namespace
 
-FoundItem itemOfRecord(const ZEBResult& record, const Bookshelf& bookshelf) {
-  FoundItem item;
-  item.kind = record.type();
-  item.title = record.title().value_or("");
-  item.relevance = record.relevance().doubleValue();
-  item.bookID = record.bookID().value_or("");
-  if (const auto book = bookshelf.bookWithID(item.bookID)) {
-    item.bookTitle = book->title();
-  }
-  item.url = record.payloadValueForKey(ZEBResultURLKey).stringValue().value_or("");
-  item.abstract = record.payloadValueForKey(ZEBResultAbstractKey).stringValue();
-  item.isExactMatch = record.payloadValueForKey(ZEBResultIsExactMatchKey).boolValue();
-  if (item.title.empty()) {
-    item.title = nameOfPage(item.url);
-  }
-  return item;
-}
-
-std::shared_ptr<ZEBQuery> queryOfRequest(const SearchRequest& request) {
-  auto query = ZEBQuery::initWithQueryString(request.text);
-  query->setScope(request.bookIDs);
-  query->setResultTypes(request.kinds);
-  query->setLimit(request.limit);
-  query->setPreferredLanguages(request.languages);
+std::shared_ptr<ZEBQuery> SearchRequest::query() const {
+  auto query = ZEBQuery::initWithQueryString(text);
+  query->setScope(bookIDs);
+  query->setResultTypes(kinds);
+  query->setLimit(limit);
+  query->setPreferredLanguages(languages);
   Value::Dictionary options;
-  if (request.bookIDs.empty()) {
+  if (bookIDs.empty()) {
     // Without that, models that do not have the system's own manual would be passed over.
     options[ZEBQuerySearchAllBooksOptionKey] = true;
   }
-  if (request.isAnchor) {
+  if (isAnchor) {
     options[ZEBQueryAnchorSearchOptionKey] = true;
   }
   query->setOptions(std::move(options));
   return query;
 }
-
-}  // namespace
 
 struct ClientSearches::Search {
   Client client;
@@ -92,20 +63,7 @@ class ClientSearches::Receiver : public SearchReceiver {
     if (_query->cancelled()) {
       return;
     }
-    std::vector<FoundItem> items;
-    if (const auto* records = std::get_if<Records>(&batch)) {
-      items.reserve(records->size());
-      for (const auto& record : *records) {
-        items.push_back(itemOfRecord(*record, *_bookshelf));
-      }
-    } else if (const auto* texts = std::get_if<std::vector<std::string>>(&batch)) {
-      for (const std::string& text : *texts) {
-        FoundItem item;
-        item.kind = ZEBHelpSuggestionResult;
-        item.title = text;
-        items.push_back(std::move(item));
-      }
-    }
+    const std::vector<FoundItem> items = itemsOfBatch(batch, *_bookshelf);
     if (!items.empty()) {
       _listener->searchFound(_client, _handle, items);
     }
@@ -142,7 +100,7 @@ std::optional<ClientSearches::Handle> ClientSearches::start(const Client& client
     return std::nullopt;
   }
   const Handle handle = ++_lastHandle;
-  _searches[handle] = {client, queryOfRequest(request), elapsedNow(), std::nullopt};
+  _searches[handle] = {client, request.query(), elapsedNow(), std::nullopt};
   const SearchSchedule::Replaced replaced = _schedule.add(client, handle);
   if (replaced.waiting) {
     _tellEnd(*replaced.waiting, SearchEnding::cancelled);

@@ -11,10 +11,10 @@
 
 #include "platform/Clock.h"
 #include "platform/ThreadSafety.h"
+#include "zebd/FoundItem.h"
 #include "zebd/SearchSchedule.h"
 
 class ZEBQuery;
-class ZEBResult;
 
 namespace zebd {
 
@@ -33,20 +33,9 @@ struct SearchRequest {
   size_t limit = 0;
   /// Language tags, the favourite first; empty for the user's settings.
   std::vector<std::string> languages;
-};
 
-/// One thing that was found.
-struct FoundItem {
-  /// ZEBHelp…Result.
-  std::string kind;
-  std::string title;
-  double relevance = 0;
-  /// Of pages alone; empty where there is none.
-  std::string url;
-  std::string bookID;
-  std::string bookTitle;
-  std::optional<std::string> abstract;
-  bool isExactMatch = false;
+  /// The query that the plug-in gets.
+  std::shared_ptr<ZEBQuery> query() const;
 };
 
 /// How a search came to its end.

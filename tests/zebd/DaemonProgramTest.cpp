@@ -190,6 +190,51 @@ TEST_F(DaemonProgramTest, DaemonEndsWithItsBus) {
   }));
 }
 
+/// The command line gives the same answers with the daemon as by itself.
+TEST_F(DaemonProgramTest, CommandLineAsksTheDaemonAndAnswersTheSameAsWithoutIt) {
+  page("long", "Many words",
+       "Words about words. <h2 id=\"deep\">Deep inside</h2> Nothing of note.");
+  const auto zeb = [this](const std::vector<std::string>& arguments,
+                          const std::string& busAddress) {
+    const Variable address("DBUS_SESSION_BUS_ADDRESS", busAddress);
+    const std::string output = folder.path("zeb output");
+    fs::remove(output);
+    tests::ChildProcess program(ZEB_PROGRAM, arguments, output);
+    const int code = program.wait();
+    return std::to_string(code) + "\n" + contents(output);
+  };
+  const std::string none = "unix:path=" + folder.path("none");
+  // The daemon finds the books, and indexes them while the first search waits.
+  EXPECT_THAT(zeb({"search", "--json", "spring"}, bus.address()),
+              AllOf(StartsWith("0\n"), HasSubstr("\"title\": \"Roses\"")));
+  EXPECT_TRUE(isThere());
+  EXPECT_TRUE(waitUntilIndexed("3"));
+  EXPECT_TRUE(
+      waitFor([this] { return status().find("'guards': <int64 0>") != std::string::npos; }));
+  const std::vector<std::vector<std::string>> lines = {{"search", "--json", "spring"},
+                                                       {"search", "water"},
+                                                       {"search", "nowhere"},
+                                                       {"search", "--actions", "wo"},
+                                                       {"suggest", "--json", "w"},
+                                                       {"similar", "roses"},
+                                                       {"anchor", "deep"},
+                                                       {"anchor", "none"},
+                                                       {"search", "--book", "garden", "roses"},
+                                                       {"search", "--book", "no", "a"}};
+  for (const auto& line : lines) {
+    EXPECT_EQ(zeb(line, bus.address()), zeb(line, none)) << testing::PrintToString(line);
+  }
+}
+
+TEST_F(DaemonProgramTest, CommandLineDoesWithoutTheDaemonWhereItIsToldTo) {
+  const Variable address("DBUS_SESSION_BUS_ADDRESS", bus.address());
+  const std::string output = folder.path("zeb output");
+  tests::ChildProcess program(ZEB_PROGRAM, {"--no-daemon", "search", "spring"}, output);
+  EXPECT_EQ(program.wait(), 3);
+  EXPECT_THAT(contents(output), HasSubstr("no book has been indexed yet"));
+  EXPECT_FALSE(isThere());
+}
+
 TEST_F(DaemonProgramTest, SecondDaemonEndsAtOnce) {
   EXPECT_THAT(status(), HasSubstr("'process'"));
   const Variable address("DBUS_SESSION_BUS_ADDRESS", bus.address());
