@@ -59,8 +59,7 @@ void SimulatedClock::sleep(Seconds duration) {
   }
   std::unique_lock lock(_mutex);
   const Instant deadline = _elapsed + duration;
-  ++_sleepers;
-  _sleepersChanged.notify_all();
+  _beginSleep();
   _moved.wait(lock, [&] { return _elapsed >= deadline; });
   --_sleepers;
 }
@@ -80,7 +79,12 @@ void SimulatedClock::addListener(std::weak_ptr<ClockListener> listener) {
 
 void SimulatedClock::timedWaitBegins() {
   const std::lock_guard lock(_mutex);
+  _beginSleep();
+}
+
+void SimulatedClock::_beginSleep() {
   ++_sleepers;
+  ++_sleepsBegun[std::this_thread::get_id()];
   _sleepersChanged.notify_all();
 }
 
@@ -118,6 +122,11 @@ size_t SimulatedClock::sleeperCount() const {
 void SimulatedClock::waitForSleepers(size_t count) {
   std::unique_lock lock(_mutex);
   _sleepersChanged.wait(lock, [&] { return _sleepers >= count; });
+}
+
+void SimulatedClock::waitForSleepOf(std::thread::id thread, size_t count) {
+  std::unique_lock lock(_mutex);
+  _sleepersChanged.wait(lock, [&] { return _sleepsBegun[thread] >= count; });
 }
 
 }  // namespace platform

@@ -3,9 +3,11 @@
 
 #include <chrono>
 #include <condition_variable>
+#include <map>
 #include <memory>
 #include <mutex>
 #include <optional>
+#include <thread>
 #include <vector>
 
 namespace platform {
@@ -82,13 +84,20 @@ class SimulatedClock : public Clock {
   /// Blocks, in real time, until at least `count` threads are in sleep() or in a timed wait.
   void waitForSleepers(size_t count);
 
+  /// Blocks, in real time, until the thread has begun so many sleeps and timed waits in all. Others
+  /// may sleep meanwhile. What advance() does from then on counts for the last of them.
+  void waitForSleepOf(std::thread::id thread, size_t count);
+
  private:
+  void _beginSleep();
+
   mutable std::mutex _mutex;
   std::condition_variable _moved;
   std::condition_variable _sleepersChanged;
   std::chrono::system_clock::time_point _now;
   Instant _elapsed{0};
   size_t _sleepers = 0;
+  std::map<std::thread::id, size_t> _sleepsBegun;
   std::vector<std::weak_ptr<ClockListener>> _listeners;
 };
 

@@ -65,5 +65,27 @@ TEST(SimulatedClock, zeroSleepReturnsAtOnce) {
   EXPECT_EQ(clock.elapsed(), Seconds(0));
 }
 
+TEST(SimulatedClock, tellsWhenAThreadHasGoneToSleepWhateverOthersDo) {
+  SimulatedClock clock;
+  std::thread other([&] { clock.sleep(Seconds(1000)); });
+  clock.waitForSleepers(1);
+  int naps = 0;
+  std::thread sleeper([&] {
+    for (; naps < 100; ++naps) {
+      clock.sleep(Seconds(1));
+    }
+  });
+  // A step too early would be lost, and the last nap never end.
+  for (size_t nap = 1; nap <= 100; ++nap) {
+    clock.waitForSleepOf(sleeper.get_id(), nap);
+    clock.advance(Seconds(1));
+  }
+  sleeper.join();
+  EXPECT_EQ(naps, 100);
+  EXPECT_EQ(clock.elapsed(), Seconds(100));
+  clock.advance(Seconds(900));
+  other.join();
+}
+
 }  // namespace
 }  // namespace platform

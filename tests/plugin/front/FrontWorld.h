@@ -5,9 +5,7 @@
 
 #include <atomic>
 #include <functional>
-#include <map>
 #include <memory>
-#include <mutex>
 #include <string>
 #include <thread>
 #include <utility>
@@ -61,7 +59,6 @@ class FollowingClock : public platform::SimulatedClock {
 
   void sleep(platform::Seconds duration) override {
     if (!follows) {
-      _countSleep();
       SimulatedClock::sleep(duration);
       return;
     }
@@ -72,37 +69,9 @@ class FollowingClock : public platform::SimulatedClock {
     advance(duration);
   }
 
-  void timedWaitBegins() override {
-    SimulatedClock::timedWaitBegins();
-    _countSleep();
-  }
-
-  /// Blocks, in real time, until the thread has gone to sleep, or begun a timed wait, so many
-  /// times. Others may sleep meanwhile.
-  void waitForSleepOf(std::thread::id thread, size_t count) {
-    while (true) {
-      {
-        const std::lock_guard lock(_sleepsMutex);
-        if (_sleepCounts[thread] >= count) {
-          return;
-        }
-      }
-      std::this_thread::yield();
-    }
-  }
-
   std::atomic<bool> follows{false};
   std::vector<double> sleeps;
   std::function<void()> onSleep;
-
- private:
-  void _countSleep() {
-    const std::lock_guard lock(_sleepsMutex);
-    ++_sleepCounts[std::this_thread::get_id()];
-  }
-
-  std::mutex _sleepsMutex;
-  std::map<std::thread::id, size_t> _sleepCounts;
 };
 
 /// Everything that a test of the plug-in's front needs. When it ends, all background work has, and
