@@ -30,6 +30,8 @@ constexpr platform::Seconds newsLimit{5};
 struct BookKeeper::Found {
   std::vector<CatalogueEntry> books;
   std::vector<CatalogueEntry> gone;
+  /// False when looking broke off: then what is missing here may well be there.
+  bool isComplete = false;
 };
 
 BookKeeper::BookKeeper(Host& host, Settings settings)
@@ -81,6 +83,7 @@ void BookKeeper::_startScan() {
       discovery.addInstalled(settings.dataFolders, settings.languages);
       found->gone = discovery.addKnown(catalogue);
       found->books = discovery.books();
+      found->isComplete = true;
     });
     platform::RunLoop::main()->perform([weak, found] {
       if (const auto self = weak.lock()) {
@@ -91,6 +94,11 @@ void BookKeeper::_startScan() {
 }
 
 void BookKeeper::_apply(const std::shared_ptr<const Found>& found) {
+  if (!found->isComplete) {
+    ++_changes.failed;
+    _finishScanWhenDone();
+    return;
+  }
   (void)platform::Environment::current()->files->createDirectoryWithParents(_catalogue.folder());
   _lock = platform::FileLock::tryLock(_catalogue.folder() + ".lock");
   if (!_lock && platform::Environment::current()->files->fileExistsAtPath(_catalogue.folder())) {

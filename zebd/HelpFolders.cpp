@@ -183,8 +183,7 @@ class Manuals {
   void addRegistered();
 
  private:
-  bool _addFolder(const std::string& folder, const std::string& bookID,
-                  const std::string& accessPage);
+  void _addFolder(const std::string& folder, const std::string& accessPage);
 
   const std::string& _dataFolder;
   const std::string _documents;
@@ -194,37 +193,33 @@ class Manuals {
   std::set<std::string> _packages;
 };
 
-/// Whether the folder is, or has become, that of a book.
-bool Manuals::_addFolder(const std::string& folder, const std::string& bookID,
-                         const std::string& accessPage) {
+void Manuals::_addFolder(const std::string& folder, const std::string& accessPage) {
   const std::optional<std::string> real = realPath(folder);
   if (!real || !real->starts_with(_documents + '/')) {
     _passedOver(folder, "it is a link to another place");
-    return false;
+    return;
   }
-  const std::string package = packageOf(*real, _documents);
   if (_seen.contains(*real)) {
     if (*real != folder) {
       _passedOver(folder, "it is another name for " + *real);
     }
-    return true;
+    return;
   }
-  const std::string identifier = bookID.empty() ? "doc." + package : bookID;
+  const std::string package = packageOf(*real, _documents);
+  const std::string bookID = "doc." + package;
   if (_packages.contains(package)) {
     _passedOver(folder, "another folder of the package was taken");
   } else if (isForDevelopers(package)) {
     _passedOver(folder, "the package is for developers");
   } else if (isGeneratedReference(*real)) {
     _passedOver(folder, "it is an interface description made by a generator");
-  } else if (!ZEBHelpBook::isValidBookID(identifier)) {
+  } else if (!ZEBHelpBook::isValidBookID(bookID)) {
     _passedOver(folder, "its name cannot be a book's identifier");
   } else {
-    _found.push_back({identifier, *real, {}, accessPage});
+    _found.push_back({bookID, *real, {}, accessPage});
     _seen.insert(*real);
     _packages.insert(package);
-    return true;
   }
-  return false;
 }
 
 void Manuals::addFolders() {
@@ -234,7 +229,7 @@ void Manuals::addFolders() {
       const std::string folder =
           *place == '\0' ? packageFolder : stringByAppendingPathComponent(packageFolder, place);
       if (isFile(stringByAppendingPathComponent(folder, "index.html"))) {
-        _addFolder(folder, {}, {});
+        _addFolder(folder, {});
       }
     }
   }
@@ -261,7 +256,7 @@ void Manuals::addRegistered() {
       _passedOver(path, "the page that it names is not there");
       continue;
     }
-    _addFolder(platform::stringByDeletingLastPathComponent(page), {}, page);
+    _addFolder(platform::stringByDeletingLastPathComponent(page), page);
   }
 }
 

@@ -36,7 +36,6 @@ struct ServiceStatus {
   bool isScanning = false;
   /// Work that keeps the daemon from leaving.
   int64_t guardCount = 0;
-  platform::Seconds idleDelay{0};
   platform::Seconds running{0};
 };
 

@@ -4,6 +4,7 @@
 
 #include <filesystem>
 #include <map>
+#include <stdexcept>
 #include <string>
 #include <vector>
 
@@ -78,6 +79,14 @@ class Listener : public zebd::SearchListener {
   std::map<uint64_t, std::vector<zebd::FoundItem>> _found GUARDED_BY(_mutex);
   std::map<uint64_t, SearchEnding> _endings GUARDED_BY(_mutex);
   std::vector<std::pair<std::string, uint64_t>> _ends GUARDED_BY(_mutex);
+};
+
+/// A computer whose folders cannot be listed.
+class ThrowingFiles : public platform::FileManager {
+ public:
+  std::optional<std::vector<std::string>> namesInDirectory(const std::string&) const override {
+    throw std::runtime_error("no folder can be read");
+  }
 };
 
 zebd::SearchRequest request(const std::string& text) {
@@ -258,6 +267,23 @@ TEST_F(HelpServiceTest, SecondServiceKnowsTheBooksBeforeItHasLookedForThem) {
   service->begin();
   EXPECT_THAT(bookIDs(), ElementsAre("garden", "kitchen"));
   EXPECT_THAT(search("spring"), ElementsAre("Roses"));
+}
+
+TEST_F(HelpServiceTest, NothingIsForgottenWhereLookingForBooksBreaksOff) {
+  start();
+  waitUntilFound("spring", {"Roses"});
+  platform::Environment broken = *platform::Environment::current();
+  broken.files = std::make_shared<ThrowingFiles>();
+  zebd::BookChanges changes;
+  {
+    const platform::EnvironmentOverride override(broken);
+    changes = scan();
+  }
+  EXPECT_EQ(changes.failed, 1U);
+  EXPECT_EQ(changes.forgotten, 0U);
+  EXPECT_THAT(log->messages(0), Contains(testing::HasSubstr("no folder can be read")));
+  EXPECT_THAT(bookIDs(), ElementsAre("garden", "kitchen"));
+  EXPECT_TRUE(hasIndex("garden", "en"));
 }
 
 TEST_F(HelpServiceTest, ScansThatAreAskedForDuringAScanAreOneMore) {
