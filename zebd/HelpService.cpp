@@ -53,8 +53,8 @@ void HelpService::begin() {
 
 void HelpService::scan(ScanRequest request, BookKeeper::Done done) {
   _books.scan(std::move(request), [this, done = std::move(done)](const BookChanges& changes) {
-    _watch();
     done(changes);
+    _watch();
   });
 }
 
