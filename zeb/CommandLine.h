@@ -103,9 +103,18 @@ struct PublishCommand {
   std::string language;
 };
 
+/// Says what is wrong.
+struct DoctorCommand {
+  /// Of the books only these; all where there is none.
+  std::vector<std::string> books;
+  /// Whether servers are asked, too.
+  bool asksServers = false;
+  bool json = false;
+};
+
 struct CommandLine {
   std::variant<SearchCommand, SuggestCommand, AnchorCommand, BooksCommand, ModelsCommand,
-               IndexCommand, ScanCommand, AddCommand, RemoveCommand, PublishCommand>
+               IndexCommand, ScanCommand, AddCommand, RemoveCommand, PublishCommand, DoctorCommand>
       command;
   ColorMode color = ColorMode::automatic;
   /// The caches folder, for indexes and the catalogue, when the user names one.

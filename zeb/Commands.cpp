@@ -18,6 +18,7 @@
 #include "platform/Strings.h"
 #include "platform/WorkerThreads.h"
 #include "zeb/DaemonSearches.h"
+#include "zeb/Doctor.h"
 #include "zeb/HelpSearch.h"
 #include "zeb/Indexing.h"
 #include "zeb/Interactive.h"
@@ -67,6 +68,9 @@ class Session {
     return removeBooks(command, _catalogue, _installation, _console);
   }
   ExitCode operator()(const PublishCommand& command);
+  ExitCode operator()(const DoctorCommand& command) {
+    return examine(command, _catalogue, _installation, _waiting, _usesDaemon, _console);
+  }
 
  private:
   /// Asks the search and shows what it says; absent when the search broke off, else whether

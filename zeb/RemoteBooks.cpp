@@ -259,6 +259,15 @@ void followLanguages(const Catalogue& catalogue, std::vector<CatalogueEntry>& en
   }
 }
 
+std::optional<std::string> problemOfCatalogue(const std::string& url, const Waiting& waiting) {
+  const auto address = platform::URL::URLWithString(url);
+  if (!address) {
+    return "its address is none";
+  }
+  const auto answer = askForCatalogue(*address, waiting);
+  return answer->catalogue() == nullptr ? std::optional(answer->reason()) : std::nullopt;
+}
+
 ExitCode addBooks(const AddCommand& command, const Catalogue& catalogue,
                   const Installation& installation, const Waiting& waiting, Console& console) {
   const std::optional<platform::URL> url = addressOfCatalogue(command.url);

@@ -32,6 +32,9 @@ ExitCode removeBooks(const RemoveCommand& command, const Catalogue& catalogue,
 size_t refreshRemoteBooks(const Catalogue& catalogue, const Installation& installation,
                           const Waiting& waiting, Console& console);
 
+/// Asks a server for a catalogue: what is wrong with the answer; absent when nothing is.
+std::optional<std::string> problemOfCatalogue(const std::string& url, const Waiting& waiting);
+
 /// Has the entries of remote books say in which language each is now, in the catalogue, too: the
 /// best of those that are here. Where one has changed, the plug-in of the next host looks at every
 /// book anew: what it remembers is the former index.

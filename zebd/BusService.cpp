@@ -20,6 +20,10 @@
 #include "zebd/HelpService.h"
 #include "zebd/Models.h"
 
+#ifndef ZEB_VERSION
+#define ZEB_VERSION "0"
+#endif
+
 namespace zebd {
 
 namespace {
@@ -417,6 +421,7 @@ void BusService::Implementation::registerQuestions() {
                   {"scanning", status.isScanning},
                   {"guards", status.guardCount},
                   {"running", status.running.count()},
+                  {"version", std::string(ZEB_VERSION)},
                   {"process", static_cast<int64_t>(::getpid())}});
         });
       });
