@@ -20,9 +20,9 @@ namespace {
 constexpr char wordMark = '\xFF';
 
 bool isCommand(std::string_view argument) {
-  static constexpr std::string_view commands[] = {"search", "suggest", "similar", "anchor",
-                                                  "books",  "models",  "index",   "scan",
-                                                  "add",    "remove",  "publish", "doctor"};
+  static constexpr std::string_view commands[] = {
+      "search", "suggest", "similar", "anchor",  "books",  "models", "index",
+      "scan",   "add",     "remove",  "publish", "status", "watch",  "doctor"};
   return std::find(std::begin(commands), std::end(commands), argument) != std::end(commands);
 }
 
@@ -68,6 +68,8 @@ struct Parser {
   CLI::App* remove = nullptr;
   CLI::App* publish = nullptr;
   CLI::App* doctor = nullptr;
+  CLI::App* status = nullptr;
+  CLI::App* watch = nullptr;
 
   CommandLine common;
   std::string cacheFolder;
@@ -82,6 +84,8 @@ struct Parser {
   RemoveCommand removeCommand;
   PublishCommand publishCommand;
   DoctorCommand doctorCommand;
+  StatusCommand statusCommand;
+  WatchCommand watchCommand;
   bool noInstalledBooks = false;
   bool noWait = false;
   bool noDaemon = false;
@@ -91,6 +95,7 @@ struct Parser {
   CLI::App* _addSuggestCommand(const std::string& name, const std::string& description);
   void _addCommandsForRemoteBooks();
   void _addDoctor();
+  void _addCommandsThatWatch();
 };
 
 CLI::App* Parser::_addCommand(const std::string& name, const std::string& description) {
@@ -191,6 +196,22 @@ Parser::Parser() {
 
   _addCommandsForRemoteBooks();
   _addDoctor();
+  _addCommandsThatWatch();
+}
+
+void Parser::_addCommandsThatWatch() {
+  status = _addCommand("status", "Say how things are, and what is being done");
+  status->add_flag("--json", statusCommand.json, "Write one JSON object");
+
+  watch = _addCommand("watch", "Print pages as they are found, and as books come and go");
+  watch->add_option("words", watchCommand.words, "What to look for")
+      ->required()
+      ->option_text("WORDS...");
+  watch->add_option("--book", watchCommand.books, "Only in this book; may be repeated")
+      ->allow_extra_args(false)
+      ->option_text("ID");
+  watch->add_flag("--once", watchCommand.once, "End when the search has ended");
+  watch->add_flag("--json", watchCommand.json, "Write one JSON object a line");
 }
 
 void Parser::_addCommandsForRemoteBooks() {
@@ -280,6 +301,12 @@ std::optional<CommandLine> parseCommandLine(const std::vector<std::string>& argu
     unmark(parser.suggestCommand.words);
     unmark(parser.suggestCommand.books);
     line.command = parser.suggestCommand;
+  } else if (parser.status->parsed()) {
+    line.command = parser.statusCommand;
+  } else if (parser.watch->parsed()) {
+    unmark(parser.watchCommand.words);
+    unmark(parser.watchCommand.books);
+    line.command = parser.watchCommand;
   } else if (parser.models->parsed()) {
     line.command = parser.modelsCommand;
   } else if (parser.anchor->parsed()) {

@@ -8,7 +8,8 @@ _zeb() {
   local cur prev words cword split
   _init_completion -s || return
 
-  local commands='search suggest similar anchor books models index scan add remove publish doctor'
+  local commands='search suggest similar anchor books models status watch index scan add remove
+    publish doctor'
   local common='--help --color --cache-dir --no-wait --no-daemon --wait --verbose'
   local command='' i
   for ((i = 1; i < cword; i++)); do
@@ -45,7 +46,8 @@ _zeb() {
     search) options='--book --limit --actions --json' ;;
     suggest | similar) options='--book --limit --json' ;;
     anchor) options='--book --json' ;;
-    books | models) options='--json' ;;
+    books | models | status) options='--json' ;;
+    watch) options='--book --once --json' ;;
     index) options='--book-id' ;;
     scan) options='--root --no-system --language --force' ;;
     add) options='--book --language' ;;

@@ -8,7 +8,8 @@ function __zeb_with
     __fish_seen_subcommand_from $argv
 end
 
-set -l commands search suggest similar anchor books models index scan add remove publish doctor
+set -l commands search suggest similar anchor books models status watch index scan add remove \
+    publish doctor
 set -l none "not __fish_seen_subcommand_from $commands"
 
 complete -c zeb -f
@@ -27,6 +28,8 @@ complete -c zeb -n $none -a similar -d 'Find other searches'
 complete -c zeb -n $none -a anchor -d 'Find the pages that carry an anchor'
 complete -c zeb -n $none -a books -d 'List the books'
 complete -c zeb -n $none -a models -d 'List the language models'
+complete -c zeb -n $none -a status -d 'Say how things are'
+complete -c zeb -n $none -a watch -d 'Print pages as they are found'
 complete -c zeb -n $none -a index -d 'Index folders and make them books'
 complete -c zeb -n $none -a scan -d 'Index the books that are installed'
 complete -c zeb -n $none -a add -d 'Subscribe to books on a web server'
@@ -34,13 +37,14 @@ complete -c zeb -n $none -a remove -d 'Forget books'
 complete -c zeb -n $none -a publish -d 'Write books for a web server'
 complete -c zeb -n $none -a doctor -d 'Say why a book is missing or has no index'
 
-complete -c zeb -n '__zeb_with search suggest similar anchor' -l book -x -a '(__zeb_books)' \
+complete -c zeb -n '__zeb_with search suggest similar anchor watch' -l book -x -a '(__zeb_books)' \
     -d 'Only in this book'
 complete -c zeb -n '__zeb_with add' -l book -x -d 'Only this book'
 complete -c zeb -n '__zeb_with search suggest similar' -l limit -x -d 'Show at most so many'
 complete -c zeb -n '__zeb_with search' -l actions -d 'Pages by meaning alone'
-complete -c zeb -n '__zeb_with search suggest similar anchor books models doctor' -l json \
+complete -c zeb -n '__zeb_with search suggest similar anchor books models status watch doctor' -l json \
     -d 'Write one JSON object'
+complete -c zeb -n '__zeb_with watch' -l once -d 'End when the search has ended'
 complete -c zeb -n '__zeb_with index publish' -l book-id -x -d 'Identifier of the book'
 complete -c zeb -n '__zeb_with scan' -l root -x -a '(__fish_complete_directories)' \
     -d 'Look for installed books below'
