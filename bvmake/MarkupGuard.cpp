@@ -93,6 +93,7 @@ class Walker {
         _walkEndTag();
       } else {
         _openMarks = 0;
+        _thins = _thins && _isPlainSign(next + 1);
         ++_at;
       }
     }
@@ -121,6 +122,24 @@ class Walker {
   void _leaveOut(size_t from, size_t to) {
     _copyUpTo(from);
     _copied = to;
+  }
+
+  /// Whether the parser takes a '<' before this, which begins no tag, for text or for a declaration
+  /// that ends at the next '>'.
+  bool _isPlainSign(size_t at) const {
+    const char character = _text[at];
+    if (character == '!' || character == '?') {
+      const size_t end = _text.find_first_of("<>", at);
+      if (end == std::string::npos || _text[end] != '>') {
+        return false;
+      }
+      // The end may be in a quoted name.
+      const std::string_view declaration = std::string_view(_text).substr(at, end - at);
+      return std::count(declaration.begin(), declaration.end(), '"') % 2 == 0 &&
+             declaration.find('\'') == std::string_view::npos;
+    }
+    return isBlank(character) || character == '=' || character == '>' ||
+           (character >= '0' && character <= '9');
   }
 
   /// Of blanks right before `end`, and not before `from`, one stays.
@@ -211,6 +230,11 @@ class Walker {
     };
     const std::string_view rawName = _rawName(name());
     size_t attributes = 0;
+    // Whatever is not by the rules: from there on it is left to the parser what it makes of it.
+    _thins =
+        _thins && isLetter(_text[nameStart]) &&
+        std::all_of(_text.begin() + static_cast<std::ptrdiff_t>(nameStart),
+                    _text.begin() + static_cast<std::ptrdiff_t>(_at), isAttributeNameCharacter);
     if (_thins) {
       const size_t mark = _inBody ? markOfName(name()) : noMark;
       const bool isBody = equalsIgnoringCase(name(), "body");
@@ -236,6 +260,7 @@ class Walker {
         _skipValue();
         nameLength = 0;
       } else {
+        _thins = _thins && isAttributeNameCharacter(character);
         // The HTML parser cuts long names into several.
         attributes += nameLength % attributeNamePiece == 0 ? 1 : 0;
         ++nameLength;
@@ -280,6 +305,9 @@ class Walker {
       ++end;
     }
     const std::string_view name = std::string_view(_text).substr(_at + 2, end - _at - 2);
+    const size_t close = _text.find_first_not_of(" \t\n\f\r", end);
+    _thins = !name.empty() && isLetter(name.front()) && close != std::string::npos &&
+             _text[close] == '>';
     if (_openMarks > 0 && end < _text.size() && _text[end] == '>' &&
         equalsIgnoringCase(name, textMarks[_marks[_openMarks - 1].mark])) {
       const OpenMark mark = _marks[--_openMarks];
@@ -349,6 +377,7 @@ class Walker {
       return;
     }
     while (_at < _text.size() && !isBlank(_text[_at]) && _text[_at] != '>') {
+      _thins = _thins && _text[_at] != '<' && _text[_at] != '"' && _text[_at] != '\'';
       ++_at;
     }
   }
@@ -369,6 +398,7 @@ class Walker {
 
   std::string& _text;
   Markup _markup;
+  /// Until something comes that is not by the rules.
   bool _thins;
   size_t _at = 0;
   /// All before is as it stays.
