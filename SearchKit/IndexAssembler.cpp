@@ -90,18 +90,22 @@ void IndexAssembler::addTerm(std::string_view term, std::span<const Posting> pos
   std::vector<uint8_t>& positions = _section(Section::positions);
   const size_t listBegin = lists.size();
   const size_t positionsBegin = positions.size();
-  appendNumber(lists, static_cast<uint32_t>(postings.size()));
+  // Room for the longest that the list can become; what is not needed is given back.
+  lists.resize(listBegin + (1 + 2 * postings.size()) * format::maximumNumberLength);
+  uint8_t* at =
+      format::writeNumber(lists.data() + listBegin, static_cast<uint32_t>(postings.size()));
   uint32_t next = 0;
   _positions.clear();
   for (const Posting& posting : postings) {
-    appendNumber(lists, format::postingNumber(posting.document - next, posting.weight));
+    at = format::writeNumber(at, format::postingNumber(posting.document - next, posting.weight));
     if (format::weightFollows(posting.weight)) {
-      appendNumber(lists, posting.weight);
+      at = format::writeNumber(at, posting.weight);
     }
     next = posting.document + 1;
-    _appendPositions(posting);
+    _positions.append(posting.positions, posting.positionBits);
   }
-  const std::vector<uint8_t>& packed = _positions.finish();
+  lists.resize(static_cast<size_t>(at - lists.data()));
+  const std::span<const uint8_t> packed = _positions.finish();
   positions.insert(positions.end(), packed.begin(), packed.end());
   _mergedLists.addTerm(term, postings, _documentCount);
   const auto shared = static_cast<size_t>(
@@ -114,34 +118,6 @@ void IndexAssembler::addTerm(std::string_view term, std::span<const Posting> pos
   appendNumber(dictionary, checkedLength(lists.size() - listBegin));
   appendNumber(dictionary, checkedLength(positions.size() - positionsBegin));
   _previousTerm = term;
-}
-
-void IndexAssembler::_appendPositions(const Posting& posting) {
-  const auto count =
-      static_cast<uint32_t>(std::count_if(posting.positions.begin(), posting.positions.end(),
-                                          [](uint8_t byte) { return byte < 0x80; }));
-  const uint32_t length =
-      format::load<uint32_t>(_section(Section::documentLengths).data() +
-                             size_t{posting.document} * format::documentLengthLength);
-  const uint32_t lowBits = positionBits(length, count);
-  _distances.clear();
-  const uint8_t* at = posting.positions.data();
-  const uint8_t* const end = at + posting.positions.size();
-  uint32_t distance;
-  // All but the first are at least 1.
-  for (uint32_t least = 0; format::readNumber(at, end, distance); least = 1) {
-    _distances.appendDistance(distance - least, lowBits);
-  }
-  if (count >= uint32_t{1} << maximumCountBits ||
-      _distances.bitCount() >= uint64_t{1} << maximumCountBits) {
-    throw platform::Exception(platform::rangeException,
-                              "a page is too large for one keyword index");
-  }
-  _positions.appendCount(count);
-  if (count >= fewestPositionsWithLength) {
-    _positions.appendCount(static_cast<uint32_t>(_distances.bitCount()));
-  }
-  _positions.append(_distances);
 }
 
 platform::Data IndexAssembler::finish() {

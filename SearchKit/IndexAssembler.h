@@ -27,8 +27,10 @@ struct StoredTexts {
 struct Posting {
   uint32_t document = 0;
   uint32_t weight = 0;
-  /// Ascending, each as the difference from the one before it, the first from 0; varnumbers.
-  std::span<const uint8_t> positions;
+  /// The positions as the index has them, with how many bits they take; eight more bytes can be
+  /// read after them.
+  const uint8_t* positions = nullptr;
+  uint32_t positionBits = 0;
 };
 
 /// Builds the sections one entry at a time. Thread-safety: confined to one thread.
@@ -55,7 +57,6 @@ class IndexAssembler {
   }
   uint32_t _offset(format::Section id);
   void _beginBlock(std::string_view term);
-  void _appendPositions(const Posting& posting);
 
   uint32_t _minimumTermLength;
   uint32_t _documentCount = 0;
@@ -64,7 +65,6 @@ class IndexAssembler {
   std::string _previousTerm;
   MergedListsBuilder _mergedLists;
   BitWriter _positions;
-  BitWriter _distances;
   std::vector<uint8_t> _sections[format::lastKnownSection + 1];
 };
 

@@ -44,7 +44,7 @@ class IndexWriter {
 
   /// Throws platform::Exception "InvalidArgumentException" for a path that was added before or
   /// does not begin with a slash.
-  void add(Document document);
+  void add(const Document& document);
 
   size_t documentCount() const;
 

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <bit>
 #include <cstring>
+#include <utility>
 
 #include "SearchKit/IndexAssembler.h"
 #include "SearchKit/IndexFormat.h"
@@ -13,7 +14,7 @@ namespace {
 
 static_assert(format::maximumMergedCharacters == 4, "there is one level a length");
 static_assert(exactFactor == 4.0F, "frequencies are whole numbers of quarters");
-constexpr uint64_t wholeExactFactor = 4;
+constexpr uint32_t wholeExactFactor = 4;
 
 void appendNumber(std::vector<uint8_t>& bytes, uint32_t number) {
   uint8_t encoded[format::maximumNumberLength];
@@ -50,34 +51,44 @@ void MergedListsBuilder::addTerm(std::string_view term, std::span<const Posting>
     if (prefix.empty()) {
       continue;
     }
-    const uint64_t factor = term.size() == prefix.size() ? wholeExactFactor : 1;
-    for (const Posting& posting : postings) {
-      level.frequencies[posting.document] += factor * posting.weight;
-      level.touched.insert(posting.document);
-    }
+    const uint32_t factor = term.size() == prefix.size() ? wholeExactFactor : 1;
     level.postingCount += postings.size();
+    if (level.postingCount < fewestPostings) {
+      for (const Posting& posting : postings) {
+        level.few.push_back({posting.document, factor * posting.weight});
+      }
+      continue;
+    }
+    for (const Entry& entry : level.few) {
+      level.add(entry);
+    }
+    level.few.clear();
+    for (const Posting& posting : postings) {
+      level.add({posting.document, factor * posting.weight});
+    }
   }
 }
 
 void MergedListsBuilder::_close(Level& level) {
-  size_t documentCount = 0;
+  const size_t postingCount = std::exchange(level.postingCount, 0);
+  level.few.clear();
+  if (postingCount < fewestPostings) {
+    level.prefix.clear();
+    return;
+  }
+  uint32_t documentCount = 0;
   uint64_t highest = 0;
-  List list{format::blockKey(level.prefix),
-            static_cast<uint32_t>(std::min<size_t>(level.postingCount, UINT32_MAX)),
-            {}};
   std::vector<uint8_t> entries;
   uint32_t next = 0;
-  const bool isWorthALook = level.postingCount >= fewestPostings;
-  for (size_t word = 0; level.postingCount > 0 && word < level.touched.wordCount(); ++word) {
+  for (size_t word = 0; word < level.touched.wordCount(); ++word) {
     for (uint64_t bits = level.touched.takeWord(word); bits != 0; bits &= bits - 1) {
       const auto document =
           static_cast<uint32_t>(word * 64) + static_cast<uint32_t>(std::countr_zero(bits));
-      const uint64_t frequency = level.frequencies[document];
-      level.frequencies[document] = 0;
-      if (!isWorthALook) {
+      const uint64_t frequency = std::exchange(level.frequencies[document], 0);
+      // More pages than make a list worth while are only forgotten.
+      if (++documentCount * leastGain > postingCount) {
         continue;
       }
-      ++documentCount;
       highest = std::max(highest, frequency);
       const auto weight = static_cast<uint32_t>(std::min<uint64_t>(frequency, UINT32_MAX));
       appendNumber(entries, format::postingNumber(document - next, weight));
@@ -87,13 +98,14 @@ void MergedListsBuilder::_close(Level& level) {
       next = document + 1;
     }
   }
-  if (isWorthALook && level.postingCount >= leastGain * documentCount &&
-      highest < format::mergedFrequencyLimit) {
-    appendNumber(list.bytes, static_cast<uint32_t>(documentCount));
+  if (documentCount * leastGain <= postingCount && highest < format::mergedFrequencyLimit) {
+    List list{format::blockKey(level.prefix),
+              static_cast<uint32_t>(std::min<size_t>(postingCount, UINT32_MAX)),
+              {}};
+    appendNumber(list.bytes, documentCount);
     list.bytes.insert(list.bytes.end(), entries.begin(), entries.end());
     _lists.push_back(std::move(list));
   }
-  level.postingCount = 0;
   level.prefix.clear();
 }
 

@@ -33,13 +33,24 @@ class MergedListsBuilder {
   std::vector<uint8_t> finish();
 
  private:
+  struct Entry {
+    uint32_t document;
+    uint32_t frequency;
+  };
   /// The prefix of one length that the terms now coming begin with.
   struct Level {
     std::string prefix;
     size_t postingCount = 0;
+    /// Those that there are, as long as they are too few for a list; else they are in the sums.
+    std::vector<Entry> few;
     /// Of each page, and the pages that have any.
     std::vector<uint64_t> frequencies;
     DocumentFilter touched;
+
+    void add(const Entry& entry) noexcept {
+      frequencies[entry.document] += entry.frequency;
+      touched.insert(entry.document);
+    }
   };
   struct List {
     uint64_t key;

@@ -11,6 +11,7 @@
 #include <bit>
 #include <cstdint>
 #include <cstring>
+#include <span>
 #include <vector>
 
 namespace searchkit {
@@ -29,71 +30,104 @@ inline uint32_t positionBits(uint32_t length, uint32_t count) noexcept {
   return mean == 0 ? 0 : static_cast<uint32_t>(std::bit_width(mean)) - 1;
 }
 
-/// Appends bits. Thread-safety: confined to one thread.
+/// Bits one after the other, the lowest first; at most 64.
+struct BitCode {
+  uint64_t bits = 0;
+  uint32_t length = 0;
+
+  void append(const BitCode& other) noexcept {
+    bits |= other.bits << length;
+    length += other.length;
+  }
+};
+
+/// A number of at least 1: in unary how many bits follow the highest, then these.
+inline BitCode countCode(uint32_t number) noexcept {
+  const uint32_t low = static_cast<uint32_t>(std::bit_width(number | 1)) - 1;
+  const uint64_t ones = (uint64_t{1} << low) - 1;
+  return {ones | (number & ones) << (low + 1), 2 * low + 1};
+}
+
+/// The distance's bits above the low ones in unary, then those.
+inline BitCode distanceCode(uint32_t distance, uint32_t lowBits) noexcept {
+  const uint32_t high = distance >> lowBits;
+  if (high >= longestUnary) {
+    return {((uint64_t{1} << longestUnary) - 1) | uint64_t{distance} << longestUnary,
+            longestUnary + 32};
+  }
+  const uint64_t low = distance & ((uint64_t{1} << lowBits) - 1);
+  return {((uint64_t{1} << high) - 1) | low << (high + 1), high + 1 + lowBits};
+}
+
+/// Appends bits, the lowest first. Thread-safety: confined to one thread.
 class BitWriter {
  public:
   void clear() noexcept {
-    _bytes.clear();
+    _length = 0;
     _pending = 0;
     _count = 0;
   }
 
   /// The lowest `count` bits of `bits`, all others being 0; at most 32.
-  void append(uint32_t bits, uint32_t count) {
-    _pending |= uint64_t{bits} << _count;
+  void append(uint64_t bits, uint32_t count) {
+    _pending |= bits << _count;
     _count += count;
-    while (_count >= 8) {
-      _bytes.push_back(static_cast<uint8_t>(_pending));
-      _pending >>= 8;
-      _count -= 8;
+    if (_count >= 32) {
+      if (_length + sizeof(uint32_t) > _bytes.size()) {
+        _bytes.resize(std::max<size_t>(_bytes.size() * 2, 256));
+      }
+      const auto low = static_cast<uint32_t>(_pending);
+      std::memcpy(_bytes.data() + _length, &low, sizeof low);
+      _length += sizeof low;
+      _pending >>= 32;
+      _count -= 32;
     }
   }
 
-  /// As many ones, at most 32.
-  void appendOnes(uint32_t count) {
-    append(static_cast<uint32_t>((uint64_t{1} << count) - 1), count);
-  }
-
-  /// A number of at least 1: in unary how many bits follow the highest, then these.
-  void appendCount(uint32_t number) {
-    const uint32_t bits = static_cast<uint32_t>(std::bit_width(number | 1)) - 1;
-    appendOnes(bits);
-    append(0, 1);
-    append(number & static_cast<uint32_t>((uint64_t{1} << bits) - 1), bits);
-  }
-
-  void appendDistance(uint32_t distance, uint32_t lowBits) {
-    const uint32_t high = distance >> lowBits;
-    if (high >= longestUnary) {
-      appendOnes(longestUnary);
-      append(distance, 32);
+  void append(const BitCode& code) {
+    if (code.length <= 32) {
+      append(code.bits, code.length);
       return;
     }
-    appendOnes(high);
-    append(0, 1);
-    append(distance & static_cast<uint32_t>((uint64_t{1} << lowBits) - 1), lowBits);
+    append(code.bits & _ones(32), 32);
+    append(code.bits >> 32, code.length - 32);
   }
 
-  uint64_t bitCount() const noexcept { return _bytes.size() * 8 + _count; }
-
-  /// Fills the last byte up with zeros.
-  const std::vector<uint8_t>& finish() {
-    if (_count > 0) {
-      append(0, 8 - _count);
-    }
-    return _bytes;
+  void appendCount(uint32_t number) { append(countCode(number)); }
+  void appendDistance(uint32_t distance, uint32_t lowBits) {
+    append(distanceCode(distance, lowBits));
   }
 
-  /// Appends what another one has.
-  void append(const BitWriter& other) {
-    for (const uint8_t byte : other._bytes) {
-      append(byte, 8);
+  /// The first `count` bits of the bytes, after which eight more bytes can be read.
+  void append(const uint8_t* bytes, uint64_t count) {
+    for (; count > 32; count -= 32, bytes += sizeof(uint32_t)) {
+      append(_word(bytes) & _ones(32), 32);
     }
-    append(static_cast<uint32_t>(other._pending), other._count);
+    append(_word(bytes) & _ones(static_cast<uint32_t>(count)), static_cast<uint32_t>(count));
+  }
+
+  uint64_t bitCount() const noexcept { return uint64_t{_length} * 8 + _count; }
+
+  /// The bits so far, the last byte filled up with zeros. Nothing is appended after that until
+  /// clear(), which is when they go; there are some more bytes after them.
+  std::span<const uint8_t> finish() {
+    const uint32_t count = _count;
+    append(0, 32 - count);
+    const size_t length = _length - sizeof(uint32_t) + (count + 7) / 8;
+    return std::span<const uint8_t>(_bytes).first(length);
   }
 
  private:
+  static uint64_t _ones(uint32_t count) noexcept { return (uint64_t{1} << count) - 1; }
+  static uint64_t _word(const uint8_t* bytes) noexcept {
+    uint64_t word;
+    std::memcpy(&word, bytes, sizeof word);
+    return word;
+  }
+
+  // Room; so many bytes of it are written.
   std::vector<uint8_t> _bytes;
+  size_t _length = 0;
   uint64_t _pending = 0;
   uint32_t _count = 0;
 };

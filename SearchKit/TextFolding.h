@@ -45,6 +45,10 @@ struct Run {
 /// Appends the runs of folded text, in order.
 void findRuns(std::u16string_view folded, std::vector<Run>& runs);
 
+/// The dictionaries work on whole runs in memory of several times their length, and text without
+/// any punctuation may be one run of megabytes: longer runs are cut after so many characters.
+inline constexpr size_t longestDictionaryPiece = 4096;
+
 /// Appends the ends of the words of a run of unspaced letters, as ICU's dictionaries see them; the
 /// last is the length of the run. Thread-safety: may be called from any thread.
 void findWordEnds(std::u16string_view run, std::vector<size_t>& ends);

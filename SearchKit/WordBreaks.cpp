@@ -27,15 +27,11 @@ UBreakIterator* threadBreakIterator() {
   return iterator.get();
 }
 
-// The dictionaries work on whole runs in memory of several times their length, and text without
-// any punctuation may be one run of megabytes.
-constexpr size_t longestPiece = 4096;
-
 size_t pieceEnd(std::u16string_view run, size_t begin) {
-  if (run.size() - begin <= longestPiece) {
+  if (run.size() - begin <= longestDictionaryPiece) {
     return run.size();
   }
-  size_t end = begin + longestPiece;
+  size_t end = begin + longestDictionaryPiece;
   if (U16_IS_TRAIL(run[end])) {
     --end;
   }

@@ -20,9 +20,9 @@ namespace {
 constexpr char wordMark = '\xFF';
 
 bool isCommand(std::string_view argument) {
-  static constexpr std::string_view commands[] = {"search", "suggest", "similar", "anchor",
-                                                  "books",  "models",  "index",   "scan",
-                                                  "add",    "remove",  "publish"};
+  static constexpr std::string_view commands[] = {
+      "search", "suggest", "similar", "anchor",  "books",  "models", "index",
+      "scan",   "add",     "remove",  "publish", "status", "watch"};
   return std::find(std::begin(commands), std::end(commands), argument) != std::end(commands);
 }
 
@@ -67,6 +67,8 @@ struct Parser {
   CLI::App* add = nullptr;
   CLI::App* remove = nullptr;
   CLI::App* publish = nullptr;
+  CLI::App* status = nullptr;
+  CLI::App* watch = nullptr;
 
   CommandLine common;
   std::string cacheFolder;
@@ -80,6 +82,8 @@ struct Parser {
   AddCommand addCommand;
   RemoveCommand removeCommand;
   PublishCommand publishCommand;
+  StatusCommand statusCommand;
+  WatchCommand watchCommand;
   bool noInstalledBooks = false;
   bool noWait = false;
   bool noDaemon = false;
@@ -88,6 +92,7 @@ struct Parser {
   CLI::App* _addCommand(const std::string& name, const std::string& description);
   CLI::App* _addSuggestCommand(const std::string& name, const std::string& description);
   void _addCommandsForRemoteBooks();
+  void _addCommandsThatWatch();
 };
 
 CLI::App* Parser::_addCommand(const std::string& name, const std::string& description) {
@@ -187,6 +192,22 @@ Parser::Parser() {
   scan->add_flag("--force", scanCommand.evenIfUnchanged, "Index unchanged books, too");
 
   _addCommandsForRemoteBooks();
+  _addCommandsThatWatch();
+}
+
+void Parser::_addCommandsThatWatch() {
+  status = _addCommand("status", "Say how things are, and what is being done");
+  status->add_flag("--json", statusCommand.json, "Write one JSON object");
+
+  watch = _addCommand("watch", "Print pages as they are found, and as books come and go");
+  watch->add_option("words", watchCommand.words, "What to look for")
+      ->required()
+      ->option_text("WORDS...");
+  watch->add_option("--book", watchCommand.books, "Only in this book; may be repeated")
+      ->allow_extra_args(false)
+      ->option_text("ID");
+  watch->add_flag("--once", watchCommand.once, "End when the search has ended");
+  watch->add_flag("--json", watchCommand.json, "Write one JSON object a line");
 }
 
 void Parser::_addCommandsForRemoteBooks() {
@@ -269,6 +290,12 @@ std::optional<CommandLine> parseCommandLine(const std::vector<std::string>& argu
     unmark(parser.suggestCommand.words);
     unmark(parser.suggestCommand.books);
     line.command = parser.suggestCommand;
+  } else if (parser.status->parsed()) {
+    line.command = parser.statusCommand;
+  } else if (parser.watch->parsed()) {
+    unmark(parser.watchCommand.words);
+    unmark(parser.watchCommand.books);
+    line.command = parser.watchCommand;
   } else if (parser.models->parsed()) {
     line.command = parser.modelsCommand;
   } else if (parser.anchor->parsed()) {

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <random>
+#include <span>
 #include <vector>
 
 namespace searchkit {
@@ -21,8 +22,9 @@ TEST(PackedPositions, comeBackAsTheyWereWritten) {
       writer.appendCount(number % (1U << maximumCountBits) + 1);
     }
     const uint64_t bitCount = writer.bitCount();
-    const std::vector<uint8_t> bytes = writer.finish();
+    const std::span<const uint8_t> bytes = writer.finish();
     BitReader reader(bytes.data(), bytes.data() + bytes.size());
+    EXPECT_EQ(bytes.size(), (bitCount + 7) / 8);
     for (const uint32_t number : numbers) {
       uint32_t distance = 0;
       uint32_t count = 0;
@@ -37,13 +39,60 @@ TEST(PackedPositions, comeBackAsTheyWereWritten) {
 }
 
 TEST(PackedPositions, appendOneStreamToAnother) {
-  BitWriter first;
-  BitWriter second;
-  first.append(5, 3);
-  second.append(0x1234567, 29);
-  first.append(second);
-  EXPECT_EQ(first.bitCount(), 32U);
-  EXPECT_EQ(first.finish(), (std::vector<uint8_t>{0x3D, 0x2B, 0x1A, 0x09}));
+  std::mt19937 random(3);
+  for (uint32_t length = 0; length < 200; ++length) {
+    std::vector<uint8_t> bits(length / 8 + 9);
+    for (uint8_t& byte : bits) {
+      byte = static_cast<uint8_t>(random());
+    }
+    BitWriter writer;
+    writer.append(5, 3);
+    writer.append(bits.data(), length);
+    writer.append(1, 1);
+    ASSERT_EQ(writer.bitCount(), length + 4);
+    const std::span<const uint8_t> bytes = writer.finish();
+    const auto bit = [&](size_t at) { return (bytes[at / 8] >> at % 8 & 1) != 0; };
+    EXPECT_EQ(bytes[0] & 7, 5);
+    for (size_t i = 0; i < length; ++i) {
+      ASSERT_EQ(bit(i + 3), (bits[i / 8] >> i % 8 & 1) != 0) << length << " bits, bit " << i;
+    }
+    EXPECT_TRUE(bit(length + 3));
+  }
+}
+
+TEST(PackedPositions, areNothingBeforeThereAreAny) {
+  BitWriter writer;
+  EXPECT_EQ(writer.bitCount(), 0U);
+  EXPECT_TRUE(writer.finish().empty());
+  writer.clear();
+  writer.append(1, 1);
+  EXPECT_EQ(writer.finish().size(), 1U);
+}
+
+TEST(PackedPositions, areTheSameAsCodesAndInAStream) {
+  std::mt19937 random(9);
+  for (int round = 0; round < 1000; ++round) {
+    const uint32_t distance = static_cast<uint32_t>(random()) >> random() % 32;
+    const uint32_t lowBits = random() % 32;
+    const BitCode code = distanceCode(distance, lowBits);
+    BitReader reader(reinterpret_cast<const uint8_t*>(&code.bits),
+                     reinterpret_cast<const uint8_t*>(&code.bits + 1));
+    uint32_t read = 0;
+    ASSERT_TRUE(reader.readDistance(lowBits, read));
+    EXPECT_EQ(read, distance);
+    EXPECT_EQ(reader.position(), code.length);
+    BitCode two = countCode(distance % 1000 + 1);
+    const uint32_t firstLength = two.length;
+    two.append(distanceCode(distance % 1000, 8));
+    BitReader both(reinterpret_cast<const uint8_t*>(&two.bits),
+                   reinterpret_cast<const uint8_t*>(&two.bits + 1));
+    ASSERT_TRUE(both.readCount(read));
+    EXPECT_EQ(read, distance % 1000 + 1);
+    EXPECT_EQ(both.position(), firstLength);
+    ASSERT_TRUE(both.readDistance(8, read));
+    EXPECT_EQ(read, distance % 1000);
+    EXPECT_EQ(both.position(), two.length);
+  }
 }
 
 TEST(PackedPositions, endWhereTheBytesEnd) {

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <cstring>
 #include <random>
 #include <string>
 #include <vector>
@@ -123,7 +125,9 @@ TEST(Tokenizer, tablesAgreeWithTheLibrary) {
       "½",      "²",      "ª",       "ŉ",      "東",     "カ",     "ﾞ",        "ー",     "ไ",
       "ท",      "ี",       "한",      "😀",      "\xFF",   "\xC3",   "\xE2\x80", "\u00A0", "…",
       "\u0345", "क",      "ि",       "\n",     ".",      "_",      "×",        "\u02BC", "\u205F",
-      "\u2060", "\u202A", "𝐀\u0308", "₿",    "ﷺ",      "\u00B4", "¨",        "·",      "€"};
+      "\u2060", "\u202A", "𝐀\u0308", "₿",    "ﷺ",      "\u00B4", "¨",        "·",      "€",
+      "京都",   "が",     "\u3099",  "、",     "。",     "（",     "Ａ",       "・",     "々",
+      "ᄒ",     "ᅡ",     "ᆫ",      "하",     "\u3000", "１",     "ｶ",        "豈",     "𠀀"};
   std::mt19937 random(20240611);
   Tokenizer tokenizer;
   for (int round = 0; round < 60000; ++round) {
@@ -137,6 +141,80 @@ TEST(Tokenizer, tablesAgreeWithTheLibrary) {
     tokenizer.tokenizeByLibrary(text,
                                 [&](std::string_view term, bool) { byLibrary.emplace_back(term); });
     ASSERT_EQ(byTables, byLibrary) << "round " << round << ": " << text;
+  }
+}
+
+Terms byLibrary(std::string_view text) {
+  Terms all;
+  Tokenizer().tokenizeByLibrary(text, [&](std::string_view term, bool) { all.emplace_back(term); });
+  return all;
+}
+
+TEST(Tokenizer, characterByCharacterAgreesWithTheLibrary) {
+  for (uint32_t character = 0x80; character < 0x10000; ++character) {
+    if (character >= 0xD800 && character < 0xE000) {
+      continue;
+    }
+    std::string text = "a";
+    if (character < 0x800) {
+      text += static_cast<char>(0xC0 | character >> 6);
+    } else {
+      text += static_cast<char>(0xE0 | character >> 12);
+      text += static_cast<char>(0x80 | (character >> 6 & 0x3F));
+    }
+    text += static_cast<char>(0x80 | (character & 0x3F));
+    const std::string alone = text.substr(1);
+    text += "b " + alone + " 東" + alone + "京 " + alone + alone;
+    ASSERT_EQ(terms(text), byLibrary(text)) << std::hex << character;
+  }
+}
+
+// Words are found in blocks: they may begin and end anywhere in one.
+TEST(Tokenizer, takesWordsOfAnyLengthAnywhere) {
+  for (size_t before = 0; before < 140; ++before) {
+    for (const size_t length : {1U, 2U, 7U, 8U, 9U, 63U, 64U, 65U, 128U, 200U}) {
+      const std::string word(length, 'W');
+      const std::string lower(length, 'w');
+      const std::string gap(before, '.');
+      EXPECT_EQ(terms(gap + word), Terms{lower});
+      EXPECT_EQ(terms(gap + word + "-" + word), (Terms{lower, lower}));
+      EXPECT_EQ(terms(gap + word + "’s"), (Terms{lower, "s"}));
+      EXPECT_EQ(terms(gap + word + "é x"), (Terms{lower + "e", "x"}));
+      EXPECT_EQ(terms("a " + gap + word + "東"), (Terms{"a", lower, "東"}));
+    }
+  }
+}
+
+TEST(Tokenizer, findsTheSameWordsInARunThatComesAgain) {
+  std::mt19937 random(17);
+  const std::vector<std::string> phrases{"印刷の設定", "用紙を選ぶ", "打印文件", "프린터를",
+                                         "カラー"};
+  Tokenizer tokenizer;
+  for (int round = 0; round < 20000; ++round) {
+    std::string text;
+    for (auto count = 1 + random() % 3; count > 0; --count) {
+      text += phrases[random() % phrases.size()];
+    }
+    text += round % 7 == 0 ? "。" + std::to_string(round) : std::string();
+    Terms found;
+    tokenizer.tokenize(text, [&](std::string_view term, bool) { found.emplace_back(term); });
+    if (round % 50 == 0 || round < 100) {
+      ASSERT_EQ(found, byLibrary(text)) << text;
+    }
+    ASSERT_FALSE(found.empty());
+  }
+}
+
+TEST(Tokenizer, termsCanBeReadAFewBytesFurther) {
+  Tokenizer tokenizer;
+  for (const char* text : {"a", "ab é", "東", "x東y", "ไทย", "日本語 z"}) {
+    const std::string exact(text);
+    tokenizer.tokenize(exact, [&](std::string_view term, bool) {
+      char copy[Tokenizer::readableLength];
+      std::memcpy(copy, term.data(), sizeof copy);
+      EXPECT_EQ(std::string_view(copy, std::min(term.size(), sizeof copy)),
+                term.substr(0, sizeof copy));
+    });
   }
 }
 
