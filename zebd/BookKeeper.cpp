@@ -270,7 +270,8 @@ void BookKeeper::_finishScanWhenDone() {
              std::to_string(changes.failed) + " failed");
   for (const Done& done : std::exchange(_current, {})) {
     if (done) {
-      done(changes);
+      // Whatever becomes of one, the others are told, and the guard is given back.
+      platform::runLoggingExceptions([&] { done(changes); });
     }
   }
   _host.owner().enableShutdown();
