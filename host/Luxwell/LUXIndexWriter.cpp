@@ -468,17 +468,29 @@ LUXIndexWriter::LUXIndexWriter(std::shared_ptr<const HelpTokenizer> tokenizer)
 LUXIndexWriter::~LUXIndexWriter() = default;
 
 void LUXIndexWriter::addDocument(const LUXDocument& document) {
-  if (!_implementation->keys.insert(document.key).second) {
+  addDocument(LUXDocumentView{document.key,
+                              document.title,
+                              document.description,
+                              document.excludedFromSearch,
+                              {document.blocks.begin(), document.blocks.end()}});
+}
+
+void LUXIndexWriter::addDocument(const LUXDocumentView& document) {
+  Page page{std::string(document.key),
+            std::string(document.title),
+            std::optional<std::string>(document.description),
+            document.excludedFromSearch,
+            {},
+            {}};
+  if (!_implementation->keys.insert(page.key).second) {
     throw platform::Exception(platform::invalidArgumentException,
-                              "the page " + document.key + " comes twice");
+                              "the page " + page.key + " comes twice");
   }
-  Page page{
-      document.key, document.title, document.description, document.excludedFromSearch, {}, {}};
   std::vector<LUXWordSequence::Word>& words = _implementation->words;
   words.clear();
   _implementation->addText(document.title, page);
   page.sequence.titleLength = words.size();
-  for (const std::string& block : document.blocks) {
+  for (const std::string_view block : document.blocks) {
     _implementation->addText(block, page);
   }
   page.sequence.words.assign(words.begin(), words.end());
