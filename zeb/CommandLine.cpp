@@ -22,7 +22,7 @@ constexpr char wordMark = '\xFF';
 bool isCommand(std::string_view argument) {
   static constexpr std::string_view commands[] = {
       "search", "suggest", "similar", "anchor",  "books",  "models", "index",
-      "scan",   "add",     "remove",  "publish", "status", "watch"};
+      "scan",   "add",     "remove",  "publish", "status", "watch",  "doctor"};
   return std::find(std::begin(commands), std::end(commands), argument) != std::end(commands);
 }
 
@@ -67,6 +67,7 @@ struct Parser {
   CLI::App* add = nullptr;
   CLI::App* remove = nullptr;
   CLI::App* publish = nullptr;
+  CLI::App* doctor = nullptr;
   CLI::App* status = nullptr;
   CLI::App* watch = nullptr;
 
@@ -82,6 +83,7 @@ struct Parser {
   AddCommand addCommand;
   RemoveCommand removeCommand;
   PublishCommand publishCommand;
+  DoctorCommand doctorCommand;
   StatusCommand statusCommand;
   WatchCommand watchCommand;
   bool noInstalledBooks = false;
@@ -92,6 +94,7 @@ struct Parser {
   CLI::App* _addCommand(const std::string& name, const std::string& description);
   CLI::App* _addSuggestCommand(const std::string& name, const std::string& description);
   void _addCommandsForRemoteBooks();
+  void _addDoctor();
   void _addCommandsThatWatch();
 };
 
@@ -139,8 +142,8 @@ Parser::Parser() {
       ->option_text("SECONDS");
   app.add_flag("--verbose", common.verbosity, "Say more; may be repeated");
   app.footer(
-      "Exit status: 0 something was found, 1 nothing was found, 2 the command line is wrong,\n"
-      "3 failure.");
+      "Exit status: 0 something was found, 1 nothing was found (doctor: something is wrong),\n"
+      "2 the command line is wrong, 3 failure.");
 
   search = _addCommand("search", "Find pages by words or the beginnings of words");
   search->add_option("words", searchCommand.words, "What to look for; asked for without any")
@@ -192,6 +195,7 @@ Parser::Parser() {
   scan->add_flag("--force", scanCommand.evenIfUnchanged, "Index unchanged books, too");
 
   _addCommandsForRemoteBooks();
+  _addDoctor();
   _addCommandsThatWatch();
 }
 
@@ -239,6 +243,13 @@ void Parser::_addCommandsForRemoteBooks() {
       ->option_text("ID");
   publish->add_option("--language", publishCommand.language, "Language of folders that do not say")
       ->option_text("TAG");
+}
+
+void Parser::_addDoctor() {
+  doctor = _addCommand("doctor", "Say why a book is missing or has no index");
+  doctor->add_option("books", doctorCommand.books, "Of the books only these")->option_text("ID...");
+  doctor->add_flag("--network", doctorCommand.asksServers, "Ask the servers of remote books, too");
+  doctor->add_flag("--json", doctorCommand.json, "Write one JSON object");
 }
 
 void unmark(std::vector<std::string>& arguments) {
@@ -322,6 +333,9 @@ std::optional<CommandLine> parseCommandLine(const std::vector<std::string>& argu
     parser.publishCommand.site = unmarked(parser.publishCommand.site);
     parser.publishCommand.language = unmarked(parser.publishCommand.language);
     line.command = parser.publishCommand;
+  } else if (parser.doctor->parsed()) {
+    unmark(parser.doctorCommand.books);
+    line.command = parser.doctorCommand;
   } else {
     unmark(parser.scanCommand.folders);
     unmark(parser.scanCommand.languages);

@@ -117,10 +117,19 @@ struct PublishCommand {
   std::string language;
 };
 
+/// Says what is wrong.
+struct DoctorCommand {
+  /// Of the books only these; all where there is none.
+  std::vector<std::string> books;
+  /// Whether servers are asked, too.
+  bool asksServers = false;
+  bool json = false;
+};
+
 struct CommandLine {
   std::variant<SearchCommand, SuggestCommand, AnchorCommand, BooksCommand, ModelsCommand,
                StatusCommand, WatchCommand, IndexCommand, ScanCommand, AddCommand, RemoveCommand,
-               PublishCommand>
+               PublishCommand, DoctorCommand>
       command;
   ColorMode color = ColorMode::automatic;
   /// The caches folder, for indexes and the catalogue, when the user names one.

@@ -19,6 +19,7 @@
 #include "platform/WorkerThreads.h"
 #include "zeb/DaemonBooks.h"
 #include "zeb/DaemonClient.h"
+#include "zeb/Doctor.h"
 #include "zeb/HelpSearch.h"
 #include "zeb/Indexing.h"
 #include "zeb/Interactive.h"
@@ -78,6 +79,9 @@ class Session {
   }
   ExitCode operator()(RemoveCommand command);
   ExitCode operator()(const PublishCommand& command);
+  ExitCode operator()(const DoctorCommand& command) {
+    return examine(command, _catalogue, _installation, _waiting, _usesDaemon, _console);
+  }
 
  private:
   /// Asks the search and shows what it says; absent when the search broke off, else whether

@@ -120,6 +120,15 @@ bool fetchIndexes(const std::vector<CatalogueEntry>& entries, const Installation
 
 }  // namespace
 
+std::optional<std::string> problemOfCatalogue(const std::string& url, const Waiting& waiting) {
+  const auto address = platform::URL::URLWithString(url);
+  if (!address) {
+    return "its address is none";
+  }
+  const auto answer = askForCatalogue(*address, waiting);
+  return answer->catalogue() == nullptr ? std::optional(answer->reason()) : std::nullopt;
+}
+
 ExitCode addBooks(const AddCommand& command, const Catalogue& catalogue,
                   const Installation& installation, const Waiting& waiting, Console& console) {
   const std::optional<platform::URL> url = zebd::addressOfCatalogue(command.url);

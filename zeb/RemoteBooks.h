@@ -32,4 +32,7 @@ ExitCode removeBooks(const RemoveCommand& command, const Catalogue& catalogue,
 size_t refreshRemoteBooks(const Catalogue& catalogue, const Installation& installation,
                           const Waiting& waiting, Console& console);
 
+/// Asks a server for a catalogue: what is wrong with the answer; absent when nothing is.
+std::optional<std::string> problemOfCatalogue(const std::string& url, const Waiting& waiting);
+
 }  // namespace zeb

@@ -87,6 +87,15 @@ TEST_F(DaemonProgramTest, CommandLineAsksTheDaemonAndAnswersTheSameAsWithoutIt) 
   }
 }
 
+TEST_F(DaemonProgramTest, DoctorAsksTheDaemonAndFindsNothingWrongWithWhatItHasMade) {
+  EXPECT_TRUE(waitUntilIndexed("2"));
+  const Variable address("DBUS_SESSION_BUS_ADDRESS", bus.address());
+  const std::string output = folder.path("zeb output");
+  tests::ChildProcess program(ZEB_PROGRAM, {"doctor", "--json"}, output);
+  EXPECT_EQ(program.wait(), 0) << contents(output);
+  EXPECT_THAT(contents(output), AllOf(HasSubstr("\"books\": 2"), HasSubstr("\"running\"")));
+}
+
 TEST_F(DaemonProgramTest, CommandLineDoesWithoutTheDaemonWhereItIsToldTo) {
   const Variable address("DBUS_SESSION_BUS_ADDRESS", bus.address());
   const std::string output = folder.path("zeb output");
