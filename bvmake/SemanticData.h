@@ -13,8 +13,8 @@ class HelpTokenizer;
 
 namespace bvmake {
 
-/// A page as the semantic data take it: under its path without the slash in front. It stands in what
-/// is given.
+/// A page as the semantic data take it: under its path without the slash in front. It stands in
+/// what is given.
 LUXDocumentView semanticDocument(const PreparedPage& page);
 
 /// Whether there is a language of this tag or name ("de", "German").
