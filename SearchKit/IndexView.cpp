@@ -45,6 +45,7 @@ std::optional<IndexView> IndexView::make(std::span<const uint8_t> bytes) {
     return std::nullopt;
   }
   view._mergedCount = view._measuredMergedCount();
+  view._scorer = Scorer(view._documentCount, view._wordCount);
   return view;
 }
 

@@ -7,6 +7,7 @@
 #include <string_view>
 
 #include "SearchKit/IndexFormat.h"
+#include "SearchKit/Scoring.h"
 #include "SearchKit/SearchKit.h"
 #include "platform/Data.h"
 
@@ -24,6 +25,7 @@ class IndexView {
   uint32_t documentCount() const noexcept { return _documentCount; }
   uint32_t termCount() const noexcept { return _termCount; }
   uint64_t wordCount() const noexcept { return _wordCount; }
+  const Scorer& scorer() const noexcept { return _scorer; }
   uint32_t tokenizerRules() const noexcept { return _tokenizerRules; }
   uint32_t minimumTermLength() const noexcept { return _minimumTermLength; }
   uint32_t termsPerBlock() const noexcept { return _termsPerBlock; }
@@ -97,6 +99,7 @@ class IndexView {
   uint32_t _blockCount = 0;
   uint32_t _mergedCount = 0;
   bool _hasPackedPositions = false;
+  Scorer _scorer;
   std::span<const uint8_t> _sections[format::lastKnownSection + 1];
 };
 
