@@ -28,8 +28,7 @@ class DictionaryBlock {
     const uint32_t width = uint32_t{1} << (flags & format::postingsWidthMask);
     uint32_t extraLength = 0;
     if (width > sizeof(uint32_t) || (flags & ~format::knownBlockFlags) != 0 ||
-        ((flags & format::hasLongPositions) != 0 &&
-         !format::readNumber(at, _end, extraLength)) ||
+        ((flags & format::hasLongPositions) != 0 && !format::readNumber(at, _end, extraLength)) ||
         static_cast<uint64_t>(_end - at) < uint64_t{count} * (width + 2) + extraLength) {
       return false;
     }
@@ -61,13 +60,14 @@ class DictionaryBlock {
   /// Of all entries before this one.
   uint64_t postingsBefore(uint32_t entry) const noexcept {
     uint64_t sum = 0;
-    if (_width == 1) {
-      for (uint32_t i = 0; i < entry; ++i) {
-        sum += _postingsLengths[i];
-      }
-      return sum;
+    uint32_t first = 0;
+    // Of that many entries the lengths of positions follow, and can be read as well.
+    if (_width == 1 && _count >= sizeof(uint64_t)) {
+      sum = _sumOfBytes(_postingsLengths, entry) +
+            _sumOfBytes(_postingsLengths + 8, entry < 8 ? 0 : entry - 8);
+      first = 2 * sizeof(uint64_t);
     }
-    for (uint32_t i = 0; i < entry; ++i) {
+    for (uint32_t i = first; i < entry; ++i) {
       sum += postingsLength(i);
     }
     return sum;
@@ -102,6 +102,15 @@ class DictionaryBlock {
   }
 
  private:
+  // Of the first `count` of eight bytes, or of all when it is higher.
+  static uint64_t _sumOfBytes(const uint8_t* bytes, uint32_t count) noexcept {
+    constexpr uint64_t everySecond = 0x00FF00FF00FF00FF;
+    const auto word = format::load<uint64_t>(bytes);
+    const uint64_t kept = count >= 8 ? word : word & ((uint64_t{1} << count * 8) - 1);
+    const uint64_t pairs = (kept & everySecond) + (kept >> 8 & everySecond);
+    return pairs * 0x0001000100010001 >> 48;
+  }
+
   const uint8_t* _heads = nullptr;
   const uint8_t* _postingsLengths = nullptr;
   const uint8_t* _positionsLengths = nullptr;
