@@ -290,7 +290,9 @@ std::optional<std::string> textFromBytes(std::string_view bytes, Markup markup) 
   if (isBinary(text)) {
     return std::nullopt;
   }
-  std::erase(text, '\0');
+  if (text.find('\0') != std::string::npos) {
+    std::erase(text, '\0');
+  }
   return text;
 }
 

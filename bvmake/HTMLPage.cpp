@@ -82,7 +82,7 @@ struct ParserDeleter {
 
 }  // namespace
 
-std::optional<Page> readHTMLPage(std::string text, platform::Error* error) {
+std::optional<Page> readHTMLPage(std::string text, platform::Error* error, HTMLThinning thinning) {
   const auto refuse = [error](std::string description) -> std::optional<Page> {
     if (error != nullptr) {
       *error = platform::formatError(std::move(description));
@@ -92,7 +92,8 @@ std::optional<Page> readHTMLPage(std::string text, platform::Error* error) {
   if (text.size() > static_cast<size_t>(std::numeric_limits<int>::max())) {
     return refuse("too large");
   }
-  if (std::optional<std::string> problem = tameMarkup(text, Markup::html)) {
+  if (std::optional<std::string> problem =
+          thinning == HTMLThinning::on ? tameAndThinHTML(text) : tameMarkup(text, Markup::html)) {
     return refuse(std::move(*problem));
   }
   Session session;

@@ -9,6 +9,10 @@
 
 namespace bvmake {
 
+/// Whether markup without bearing on the page is left out before the parser sees it. The page is
+/// the same with and without.
+enum class HTMLThinning { on, off };
+
 /// Reads a page from its text (well-formed UTF-8, no NUL). HTML of any quality is taken; what is
 /// refused, with `error` set when given, are the few constructions that would cost the parser time
 /// out of proportion: see maximumAttributeCount and maximumNestingWork.
@@ -18,7 +22,8 @@ namespace bvmake {
 /// `aria-hidden`, `display: none`); navigation (`nav` and the roles that mean it); and, outside the
 /// main content, headers, footers and asides. Where a page marks its main content (`main`), only
 /// that is read. Anchors are taken from everywhere.
-std::optional<Page> readHTMLPage(std::string text, platform::Error* error = nullptr);
+std::optional<Page> readHTMLPage(std::string text, platform::Error* error = nullptr,
+                                 HTMLThinning thinning = HTMLThinning::on);
 
 /// Bound on the work that misnested tags make for the parser: the sum over all of them of the depth
 /// at which they stand.

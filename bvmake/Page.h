@@ -48,6 +48,8 @@ struct Page {
     return !title.empty() || !description.empty() || !keywords.empty() || !headings.empty() ||
            !body.empty();
   }
+
+  friend bool operator==(const Page&, const Page&) = default;
 };
 
 }  // namespace bvmake

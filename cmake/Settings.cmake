@@ -5,7 +5,10 @@ set(CMAKE_CXX_EXTENSIONS OFF)
 set(CMAKE_POSITION_INDEPENDENT_CODE ON)
 
 set(CMAKE_CXX_FLAGS_DEV "-O1 -g1" CACHE STRING "Flags of the Dev build type" FORCE)
-set(CMAKE_CXX_FLAGS_RELEASE "-O2 -DNDEBUG" CACHE STRING "Flags of the Release build type" FORCE)
+# Hardened as the distribution's own packages are: pages and downloads come from anywhere.
+set(CMAKE_CXX_FLAGS_RELEASE "-O2 -DNDEBUG -D_FORTIFY_SOURCE=2 -fstack-protector-strong"
+    CACHE STRING "Flags of the Release build type" FORCE)
+add_link_options($<$<CONFIG:Release>:LINKER:-z,relro,-z,now>)
 
 set(ZEB_SANITIZE "" CACHE STRING "Value for -fsanitize, empty for none")
 option(ZEB_FUZZ "Link fuzz targets with libFuzzer instead of the corpus replayer" OFF)

@@ -123,6 +123,11 @@ Current& currentHolder() {
 
 }  // namespace
 
+std::optional<std::string> userDefaultsPath() {
+  const auto settings = folderOfTheUser("XDG_CONFIG_HOME", ".config");
+  return settings ? std::optional(*settings + "/zeb/settings.plist") : std::nullopt;
+}
+
 Environment Environment::system() {
   Environment environment;
   environment.clock = systemClock();
@@ -133,9 +138,9 @@ Environment Environment::system() {
   environment.dataDirectories = sharedDataFolders();
   environment.processLauncher = systemProcessLauncher();
   environment.processTable = systemProcessTable();
-  const auto settings = folderOfTheUser("XDG_CONFIG_HOME", ".config");
-  environment.userDefaults = settings ? userDefaultsFromFile(*settings + "/zeb/settings.plist")
-                                      : userDefaultsFromDictionary({});
+  const auto settings = userDefaultsPath();
+  environment.userDefaults =
+      settings ? userDefaultsFromFile(*settings) : userDefaultsFromDictionary({});
   environment.notificationCenter = localNotificationCenter();
   environment.standardOutput = [](const std::string& text) {
     std::fwrite(text.data(), 1, text.size(), stdout);

@@ -7,6 +7,7 @@
 #include <unicode/utf8.h>
 
 #include <algorithm>
+#include <cstring>
 #include <limits>
 #include <map>
 #include <memory>
@@ -200,12 +201,26 @@ int numericCompare(std::string_view a, std::string_view b) {
 }
 
 bool isValidUTF8(std::string_view bytes) noexcept {
-  bool valid = true;
-  forEachCharacter(bytes, [&](const Character& character) {
-    valid = character.code >= 0;
-    return valid;
-  });
-  return valid;
+  const auto* const text = reinterpret_cast<const uint8_t*>(bytes.data());
+  const size_t length = bytes.size();
+  size_t at = 0;
+  while (at < length) {
+    // Most text is ASCII for the most part: eight bytes at a time.
+    uint64_t word = 0;
+    if (length - at >= sizeof word) {
+      std::memcpy(&word, text + at, sizeof word);
+      if ((word & 0x8080808080808080U) == 0) {
+        at += sizeof word;
+        continue;
+      }
+    }
+    UChar32 code = 0;
+    U8_NEXT(text, at, length, code);
+    if (code < 0) {
+      return false;
+    }
+  }
+  return true;
 }
 
 std::string stringByRepairingUTF8(std::string_view bytes) {

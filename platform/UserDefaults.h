@@ -2,6 +2,7 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 
@@ -22,6 +23,10 @@ class UserDefaults {
   /// left aside.
   int64_t integerForKey(std::string_view key) const;
 };
+
+/// The file of the user's settings: zeb/settings.plist under XDG_CONFIG_HOME or HOME, whether it is
+/// there or not. Absent where there is neither folder.
+std::optional<std::string> userDefaultsPath();
 
 /// Settings in a property list file with a dictionary, read anew whenever the file has changed. A
 /// file that is missing or no property list holds no settings.

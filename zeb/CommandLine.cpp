@@ -20,9 +20,9 @@ namespace {
 constexpr char wordMark = '\xFF';
 
 bool isCommand(std::string_view argument) {
-  static constexpr std::string_view commands[] = {"search", "suggest", "similar", "anchor",
-                                                  "books",  "models",  "index",   "scan",
-                                                  "add",    "remove",  "publish"};
+  static constexpr std::string_view commands[] = {
+      "search", "suggest", "similar", "anchor",  "books",  "models", "index",
+      "scan",   "add",     "remove",  "publish", "status", "watch",  "doctor"};
   return std::find(std::begin(commands), std::end(commands), argument) != std::end(commands);
 }
 
@@ -67,6 +67,9 @@ struct Parser {
   CLI::App* add = nullptr;
   CLI::App* remove = nullptr;
   CLI::App* publish = nullptr;
+  CLI::App* doctor = nullptr;
+  CLI::App* status = nullptr;
+  CLI::App* watch = nullptr;
 
   CommandLine common;
   std::string cacheFolder;
@@ -80,6 +83,9 @@ struct Parser {
   AddCommand addCommand;
   RemoveCommand removeCommand;
   PublishCommand publishCommand;
+  DoctorCommand doctorCommand;
+  StatusCommand statusCommand;
+  WatchCommand watchCommand;
   bool noInstalledBooks = false;
   bool noWait = false;
   bool noDaemon = false;
@@ -88,6 +94,8 @@ struct Parser {
   CLI::App* _addCommand(const std::string& name, const std::string& description);
   CLI::App* _addSuggestCommand(const std::string& name, const std::string& description);
   void _addCommandsForRemoteBooks();
+  void _addDoctor();
+  void _addCommandsThatWatch();
 };
 
 CLI::App* Parser::_addCommand(const std::string& name, const std::string& description) {
@@ -134,8 +142,8 @@ Parser::Parser() {
       ->option_text("SECONDS");
   app.add_flag("--verbose", common.verbosity, "Say more; may be repeated");
   app.footer(
-      "Exit status: 0 something was found, 1 nothing was found, 2 the command line is wrong,\n"
-      "3 failure.");
+      "Exit status: 0 something was found, 1 nothing was found (doctor: something is wrong),\n"
+      "2 the command line is wrong, 3 failure.");
 
   search = _addCommand("search", "Find pages by words or the beginnings of words");
   search->add_option("words", searchCommand.words, "What to look for; asked for without any")
@@ -187,6 +195,23 @@ Parser::Parser() {
   scan->add_flag("--force", scanCommand.evenIfUnchanged, "Index unchanged books, too");
 
   _addCommandsForRemoteBooks();
+  _addDoctor();
+  _addCommandsThatWatch();
+}
+
+void Parser::_addCommandsThatWatch() {
+  status = _addCommand("status", "Say how things are, and what is being done");
+  status->add_flag("--json", statusCommand.json, "Write one JSON object");
+
+  watch = _addCommand("watch", "Print pages as they are found, and as books come and go");
+  watch->add_option("words", watchCommand.words, "What to look for")
+      ->required()
+      ->option_text("WORDS...");
+  watch->add_option("--book", watchCommand.books, "Only in this book; may be repeated")
+      ->allow_extra_args(false)
+      ->option_text("ID");
+  watch->add_flag("--once", watchCommand.once, "End when the search has ended");
+  watch->add_flag("--json", watchCommand.json, "Write one JSON object a line");
 }
 
 void Parser::_addCommandsForRemoteBooks() {
@@ -218,6 +243,13 @@ void Parser::_addCommandsForRemoteBooks() {
       ->option_text("ID");
   publish->add_option("--language", publishCommand.language, "Language of folders that do not say")
       ->option_text("TAG");
+}
+
+void Parser::_addDoctor() {
+  doctor = _addCommand("doctor", "Say why a book is missing or has no index");
+  doctor->add_option("books", doctorCommand.books, "Of the books only these")->option_text("ID...");
+  doctor->add_flag("--network", doctorCommand.asksServers, "Ask the servers of remote books, too");
+  doctor->add_flag("--json", doctorCommand.json, "Write one JSON object");
 }
 
 void unmark(std::vector<std::string>& arguments) {
@@ -269,6 +301,12 @@ std::optional<CommandLine> parseCommandLine(const std::vector<std::string>& argu
     unmark(parser.suggestCommand.words);
     unmark(parser.suggestCommand.books);
     line.command = parser.suggestCommand;
+  } else if (parser.status->parsed()) {
+    line.command = parser.statusCommand;
+  } else if (parser.watch->parsed()) {
+    unmark(parser.watchCommand.words);
+    unmark(parser.watchCommand.books);
+    line.command = parser.watchCommand;
   } else if (parser.models->parsed()) {
     line.command = parser.modelsCommand;
   } else if (parser.anchor->parsed()) {
@@ -295,6 +333,9 @@ std::optional<CommandLine> parseCommandLine(const std::vector<std::string>& argu
     parser.publishCommand.site = unmarked(parser.publishCommand.site);
     parser.publishCommand.language = unmarked(parser.publishCommand.language);
     line.command = parser.publishCommand;
+  } else if (parser.doctor->parsed()) {
+    unmark(parser.doctorCommand.books);
+    line.command = parser.doctorCommand;
   } else {
     unmark(parser.scanCommand.folders);
     unmark(parser.scanCommand.languages);

@@ -63,6 +63,20 @@ struct BooksCommand {
   bool json = false;
 };
 
+/// Books, models, the daemon, and what is being done.
+struct StatusCommand {
+  bool json = false;
+};
+
+/// Pages as they are found, now and later.
+struct WatchCommand {
+  std::vector<std::string> words;
+  std::vector<std::string> books;
+  bool json = false;
+  /// Only now.
+  bool once = false;
+};
+
 struct IndexCommand {
   std::vector<std::string> folders;
   /// None, or one a folder.
@@ -103,9 +117,19 @@ struct PublishCommand {
   std::string language;
 };
 
+/// Says what is wrong.
+struct DoctorCommand {
+  /// Of the books only these; all where there is none.
+  std::vector<std::string> books;
+  /// Whether servers are asked, too.
+  bool asksServers = false;
+  bool json = false;
+};
+
 struct CommandLine {
   std::variant<SearchCommand, SuggestCommand, AnchorCommand, BooksCommand, ModelsCommand,
-               IndexCommand, ScanCommand, AddCommand, RemoveCommand, PublishCommand>
+               StatusCommand, WatchCommand, IndexCommand, ScanCommand, AddCommand, RemoveCommand,
+               PublishCommand, DoctorCommand>
       command;
   ColorMode color = ColorMode::automatic;
   /// The caches folder, for indexes and the catalogue, when the user names one.

@@ -17,7 +17,9 @@
 #include "platform/Processes.h"
 #include "platform/Strings.h"
 #include "platform/WorkerThreads.h"
-#include "zeb/DaemonSearches.h"
+#include "zeb/DaemonBooks.h"
+#include "zeb/DaemonClient.h"
+#include "zeb/Doctor.h"
 #include "zeb/HelpSearch.h"
 #include "zeb/Indexing.h"
 #include "zeb/Interactive.h"
@@ -26,9 +28,12 @@
 #include "zeb/Publishing.h"
 #include "zeb/RemoteBooks.h"
 #include "zeb/Scan.h"
+#include "zeb/Status.h"
+#include "zeb/Watch.h"
 #include "zebd/BookFolder.h"
 #include "zebd/Catalogue.h"
 #include "zebd/Models.h"
+#include "zebd/Subscriptions.h"
 
 namespace zeb {
 
@@ -56,27 +61,43 @@ class Session {
   ExitCode operator()(const AnchorCommand& command);
   ExitCode operator()(const ModelsCommand& command);
   ExitCode operator()(const BooksCommand& command);
+  ExitCode operator()(const StatusCommand& command);
+  ExitCode operator()(const WatchCommand& command);
   ExitCode operator()(const IndexCommand& command);
   ExitCode operator()(const ScanCommand& command) {
+    // What lies elsewhere is not the daemon's.
+    if (auto daemon = command.root == "/" ? _connectToDaemon() : nullptr) {
+      return scanWithDaemon(command, std::move(daemon), _waiting, _console);
+    }
     return scan(command, _catalogue, _installation, _waiting, _console, _verbosity);
   }
   ExitCode operator()(const AddCommand& command) {
+    if (auto daemon = _connectToDaemon()) {
+      return addBooksWithDaemon(command, std::move(daemon), _waiting, _console);
+    }
     return addBooks(command, _catalogue, _installation, _waiting, _console);
   }
-  ExitCode operator()(const RemoveCommand& command) {
-    return removeBooks(command, _catalogue, _installation, _console);
-  }
+  ExitCode operator()(RemoveCommand command);
   ExitCode operator()(const PublishCommand& command);
+  ExitCode operator()(const DoctorCommand& command) {
+    return examine(command, _catalogue, _installation, _waiting, _usesDaemon, _console);
+  }
 
  private:
   /// Asks the search and shows what it says; absent when the search broke off, else whether
   /// anything was found.
   using Question = std::function<std::optional<bool>(HelpSearch& search)>;
 
+  std::vector<ListedBook> _listedBooks() const;
   ExitCode _searchInteractively(const SearchCommand& command);
-  ExitCode _ask(const std::vector<std::string>& bookIDs, const Question& question);
+  /// `makesIndexes`: whether books that have no index yet are indexed before the question.
+  ExitCode _ask(const std::vector<std::string>& bookIDs, const Question& question,
+                bool makesIndexes = true);
   std::unique_ptr<HelpSearch> _startSearch(std::vector<CatalogueEntry> entries);
-  std::unique_ptr<DaemonSearches> _daemon() const;
+  std::unique_ptr<DaemonClient> _connectToDaemon() const {
+    return _usesDaemon ? DaemonClient::connect() : nullptr;
+  }
+  std::unique_ptr<DaemonClient> _daemon() const;
   bool _knowsBooks(const std::vector<CatalogueEntry>& entries,
                    const std::vector<std::string>& bookIDs);
   void _makeMissingIndexes(HelpSearch& search, const std::vector<std::string>& bookIDs);
@@ -158,12 +179,13 @@ std::optional<bool> Session::_show(const std::string& asked, const std::optional
 }
 
 /// The daemon, if it is to be asked and there is one.
-std::unique_ptr<DaemonSearches> Session::_daemon() const {
-  auto daemon = _usesDaemon ? DaemonSearches::connect() : nullptr;
+std::unique_ptr<DaemonClient> Session::_daemon() const {
+  auto daemon = _connectToDaemon();
   if (daemon != nullptr && _catalogue.entries().empty()) {
     // It has just begun, and looks for books anyway.
     _console.progress("looking for books");
-    (void)daemon->rescan(platform::Seconds(_waiting.limit));
+    std::string problem;
+    (void)daemon->scan({}, platform::Seconds(_waiting.limit), problem);
     _console.clearProgress();
   }
   return daemon;
@@ -171,7 +193,7 @@ std::unique_ptr<DaemonSearches> Session::_daemon() const {
 
 /// A host in this process; null where it cannot be had, which has been said then.
 std::unique_ptr<HelpSearch> Session::_startSearch(std::vector<CatalogueEntry> entries) {
-  followLanguages(_catalogue, entries);
+  zebd::followLanguages(_catalogue, entries);
   platform::Error error;
   auto search = HelpSearch::start(entries, _installation, error);
   if (search == nullptr) {
@@ -180,7 +202,8 @@ std::unique_ptr<HelpSearch> Session::_startSearch(std::vector<CatalogueEntry> en
   return search;
 }
 
-ExitCode Session::_ask(const std::vector<std::string>& bookIDs, const Question& question) {
+ExitCode Session::_ask(const std::vector<std::string>& bookIDs, const Question& question,
+                       bool makesIndexes) {
   auto daemon = _daemon();
   std::vector<CatalogueEntry> entries = _catalogue.entries();
   if (!_knowsBooks(entries, bookIDs)) {
@@ -192,7 +215,9 @@ ExitCode Session::_ask(const std::vector<std::string>& bookIDs, const Question& 
   if (search == nullptr) {
     return ExitCode::failure;
   }
-  _makeMissingIndexes(*search, bookIDs);
+  if (makesIndexes) {
+    _makeMissingIndexes(*search, bookIDs);
+  }
   const std::optional<bool> found = question(*search);
   if (!found) {
     _console.error("the search broke off; --verbose says more");
@@ -282,7 +307,28 @@ ExitCode Session::operator()(const ModelsCommand& command) {
   return models.empty() ? ExitCode::nothingFound : ExitCode::success;
 }
 
-ExitCode Session::operator()(const BooksCommand& command) {
+ExitCode Session::operator()(const StatusCommand& command) {
+  const auto daemon = _connectToDaemon();
+  const StatusReport report = statusReport(_listedBooks(), daemon.get());
+  if (command.json) {
+    printStatusAsJSON(report, _console);
+  } else {
+    printStatus(report, _console);
+  }
+  return ExitCode::success;
+}
+
+ExitCode Session::operator()(const WatchCommand& command) {
+  const std::string words = joined(command.words);
+  return _ask(
+      command.books,
+      [&](HelpSearch& search) {
+        return watch(search, command, words, _console, [] { return false; });
+      },
+      command.once);
+}
+
+std::vector<ListedBook> Session::_listedBooks() const {
   std::vector<ListedBook> books;
   for (CatalogueEntry& entry : _catalogue.entries()) {
     const std::shared_ptr<ZEBHelpBook> book = zebd::bookOfEntry(entry);
@@ -293,6 +339,11 @@ ExitCode Session::operator()(const BooksCommand& command) {
     books.push_back(
         {std::move(entry), book == nullptr ? std::nullopt : zebd::indexPathOfBook(*book)});
   }
+  return books;
+}
+
+ExitCode Session::operator()(const BooksCommand& command) {
+  const std::vector<ListedBook> books = _listedBooks();
   if (command.json) {
     printBooksAsJSON(books, _console);
   } else if (books.empty()) {
@@ -317,6 +368,9 @@ ExitCode Session::operator()(const IndexCommand& command) {
   if (!_hasIdentifierForEach(command.folders, command.bookIDs)) {
     return ExitCode::usage;
   }
+  if (auto daemon = _connectToDaemon()) {
+    return indexWithDaemon(command, std::move(daemon), _waiting, _console);
+  }
   bool succeeded = true;
   std::vector<CatalogueEntry> books;
   for (size_t i = 0; i < command.folders.size(); ++i) {
@@ -333,6 +387,17 @@ ExitCode Session::operator()(const IndexCommand& command) {
   const IndexingCounts counts =
       Update(_catalogue, _waiting, _console).run(books, {}, _installation, true);
   return succeeded && counts.failed == 0 ? ExitCode::success : ExitCode::failure;
+}
+
+ExitCode Session::operator()(RemoveCommand command) {
+  ExitCode code = ExitCode::success;
+  if (const auto daemon = _connectToDaemon()) {
+    code = removeRemoteBooksWithDaemon(command, _catalogue, *daemon, _waiting, _console);
+  }
+  const ExitCode rest = command.names.empty()
+                            ? ExitCode::success
+                            : removeBooks(command, _catalogue, _installation, _console);
+  return code == ExitCode::success ? rest : code;
 }
 
 ExitCode Session::operator()(const PublishCommand& command) {

@@ -15,11 +15,11 @@
 #include "platform/Strings.h"
 #include "platform/ThreadSafety.h"
 #include "platform/URL.h"
-#include "zeb/DaemonSearches.h"
-#include "zeb/RemoteBooks.h"
+#include "zeb/DaemonClient.h"
 #include "zeb/SearchProvider.h"
 #include "zebd/BookFolder.h"
 #include "zebd/Host.h"
+#include "zebd/Subscriptions.h"
 
 namespace zeb {
 
@@ -148,12 +148,18 @@ class Reports {
     const platform::MutexLock lock(_mutex);
     _bookIDs.insert(bookID);
     _last = now;
+    ++_count;
   }
   /// Whether no report has come for `span`.
   bool areQuietFor(platform::Seconds span) const {
     const platform::Clock::Instant now = elapsedNow();
     const platform::MutexLock lock(_mutex);
     return !_last || now - *_last >= span;
+  }
+  /// How many there were.
+  uint64_t count() const {
+    const platform::MutexLock lock(_mutex);
+    return _count;
   }
   std::set<std::string> take() {
     const platform::MutexLock lock(_mutex);
@@ -164,6 +170,7 @@ class Reports {
   mutable platform::Mutex _mutex;
   std::set<std::string> _bookIDs GUARDED_BY(_mutex);
   std::optional<platform::Clock::Instant> _last GUARDED_BY(_mutex);
+  uint64_t _count GUARDED_BY(_mutex) = 0;
 };
 
 }  // namespace
@@ -171,7 +178,7 @@ class Reports {
 struct HelpSearch::Implementation {
   /// Null where the daemon searches.
   std::unique_ptr<Host> host;
-  std::unique_ptr<DaemonSearches> daemon;
+  std::unique_ptr<DaemonClient> daemon;
   std::unique_ptr<HostedSearches> hosted;
   std::shared_ptr<Reports> reports = std::make_shared<Reports>();
 
@@ -253,6 +260,7 @@ class HelpSearch::Live : public LiveSearch {
 
   void cancel() override { _search->cancel(); }
   bool ended() const override { return _search->ended(); }
+  bool finished() const override { return _search->finished(); }
   LiveAnswer answer(size_t limit) const override {
     const Items items = _search->items();
     LiveAnswer answer;
@@ -267,6 +275,12 @@ class HelpSearch::Live : public LiveSearch {
  private:
   const std::shared_ptr<RunningSearch> _search;
 };
+
+std::shared_ptr<LiveSearch> HelpSearch::beginSearch(std::string_view words,
+                                                    const std::vector<std::string>& bookIDs) {
+  return std::make_shared<Live>(
+      _implementation->provider().begin(requestFor(words, bookIDs, {ZEBHelpArticleResult}, 0)));
+}
 
 std::shared_ptr<LiveSearch> HelpSearch::beginLiveSearch(std::string_view text,
                                                         const std::vector<std::string>& bookIDs) {
@@ -287,7 +301,7 @@ std::unique_ptr<HelpSearch> HelpSearch::start(const std::vector<CatalogueEntry>&
     settings.userHelpCachesDirectoryPath =
         platform::stringByAppendingPathComponent(*caches, ZEBDaemonBundleID);
   }
-  forgetKnownIndicesWhenDue(entries);
+  zebd::forgetKnownIndicesWhenDue(entries);
   auto implementation = std::make_unique<Implementation>();
   implementation->host = Host::start(installation.pluginBundlePath, std::move(settings), error);
   if (implementation->host == nullptr) {
@@ -306,10 +320,17 @@ std::unique_ptr<HelpSearch> HelpSearch::start(const std::vector<CatalogueEntry>&
   return std::unique_ptr<HelpSearch>(new HelpSearch(std::move(implementation)));
 }
 
-std::unique_ptr<HelpSearch> HelpSearch::withDaemon(std::unique_ptr<DaemonSearches> daemon) {
+std::unique_ptr<HelpSearch> HelpSearch::withDaemon(std::unique_ptr<DaemonClient> daemon) {
   auto implementation = std::make_unique<Implementation>();
   implementation->daemon = std::move(daemon);
   return std::unique_ptr<HelpSearch>(new HelpSearch(std::move(implementation)));
+}
+
+DaemonClient* HelpSearch::daemon() const { return _implementation->daemon.get(); }
+
+uint64_t HelpSearch::changeCount() const {
+  return _implementation->daemon != nullptr ? _implementation->daemon->changeCount()
+                                            : _implementation->reports->count();
 }
 
 std::vector<std::string> HelpSearch::booksWithoutIndex(
@@ -410,6 +431,33 @@ HelpSearch::Indexing HelpSearch::makeIndexes(const std::vector<std::string>& boo
 }
 
 bool HelpSearch::fetchIndexes(const std::vector<std::string>& bookIDs, platform::Seconds limit) {
+  if (_implementation->daemon != nullptr) {
+    const auto lackingCount = [&] {
+      const auto books = _implementation->daemon->books();
+      return books ? std::count_if(books->begin(), books->end(),
+                                   [&](const zebd::BookStatus& book) {
+                                     return !book.indexPath &&
+                                            std::find(bookIDs.begin(), bookIDs.end(),
+                                                      book.bookID) != bookIDs.end();
+                                   })
+                   : 0;
+    };
+    // What comes anew can be seen; whether what is there is the newest cannot.
+    const bool allAreNew = static_cast<size_t>(lackingCount()) == bookIDs.size();
+    platform::Clock::Instant lastWork = elapsedNow();
+    platform::Clock::Instant nextLook = lastWork;
+    return Host::runMainLoopUntil(
+        [&] {
+          const platform::Clock::Instant now = elapsedNow();
+          if (now < nextLook) {
+            return false;
+          }
+          nextLook = now + daemonPace;
+          lastWork = _implementation->daemon->isBusy() ? now : lastWork;
+          return now - lastWork > modelSpan || (allAreNew && lackingCount() == 0);
+        },
+        limit);
+  }
   const auto collector =
       std::make_shared<HostedSearch>(nullptr, _implementation->host->sharedBookshelf());
   _implementation->host->registerBooks(bookIDs, collector);

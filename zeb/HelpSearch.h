@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <functional>
 #include <memory>
 #include <optional>
@@ -19,7 +20,7 @@ namespace zeb {
 using zebd::CatalogueEntry;
 using zebd::Installation;
 
-class DaemonSearches;
+class DaemonClient;
 
 /// A page that was found, ready to be shown.
 struct FoundPage {
@@ -62,6 +63,8 @@ class LiveSearch {
   /// The answer is no longer wanted.
   virtual void cancel() = 0;
   virtual bool ended() const = 0;
+  /// Whether all that was found is there; false while it runs, and for one that broke off.
+  virtual bool finished() const = 0;
   /// What was found up to now, at most so many pages and completions.
   virtual LiveAnswer answer(size_t limit) const = 0;
 };
@@ -77,11 +80,17 @@ class HelpSearch {
                                            const Installation& installation,
                                            platform::Error& error);
   /// A client of the daemon, which looks after the books and their indexes by itself: of the
-  /// functions below, those that fetch and remove indexes are not for it.
-  static std::unique_ptr<HelpSearch> withDaemon(std::unique_ptr<DaemonSearches> daemon);
+  /// functions below, removeIndexes() is not for it.
+  static std::unique_ptr<HelpSearch> withDaemon(std::unique_ptr<DaemonClient> daemon);
   ~HelpSearch();
   HelpSearch(const HelpSearch&) = delete;
   HelpSearch& operator=(const HelpSearch&) = delete;
+
+  /// The daemon that searches; null where this process does.
+  DaemonClient* daemon() const;
+
+  /// Grows when an index comes, changes or goes: what was found may no longer be all.
+  uint64_t changeCount() const;
 
   /// Those of the books for which there is no index yet, by identifier. Remote books are not among
   /// them: their indexes are a server's.
@@ -133,6 +142,10 @@ class HelpSearch {
   std::optional<std::vector<Suggestion>> similarSearches(std::string_view words,
                                                          const std::vector<std::string>& bookIDs,
                                                          size_t limit);
+
+  /// Begins a search for pages and returns at once. The main loop has to run on.
+  std::shared_ptr<LiveSearch> beginSearch(std::string_view words,
+                                          const std::vector<std::string>& bookIDs);
 
   /// Begins a search for completions and pages and returns at once. The main loop has to run on; it
   /// is woken at the end.

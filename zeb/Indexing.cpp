@@ -20,11 +20,9 @@ namespace zeb {
 
 // An update removes indexes before it makes them anew, and must not find those gone that it has
 // made. Without a lock, where none can be had, it goes on: what then fails says so itself.
-std::string lockPathOfCatalogue(const Catalogue& catalogue) { return catalogue.folder() + ".lock"; }
-
 std::optional<platform::FileLock> lockCatalogue(const Catalogue& catalogue, Console& console) {
   (void)platform::Environment::current()->files->createDirectoryWithParents(catalogue.folder());
-  const std::string path = lockPathOfCatalogue(catalogue);
+  const std::string path = catalogue.lockPath();
   std::optional<platform::FileLock> lock = platform::FileLock::tryLock(path);
   if (!lock) {
     console.progress("waiting for another update to end");

@@ -34,9 +34,6 @@ struct IndexingCounts {
 /// so on the console. Absent where no lock can be had.
 std::optional<platform::FileLock> lockCatalogue(const Catalogue& catalogue, Console& console);
 
-/// The file that is locked for that.
-std::string lockPathOfCatalogue(const Catalogue& catalogue);
-
 /// One bringing up to date. Runs the main loop; confined to the main thread.
 class Update {
  public:

@@ -32,15 +32,7 @@ ExitCode removeBooks(const RemoveCommand& command, const Catalogue& catalogue,
 size_t refreshRemoteBooks(const Catalogue& catalogue, const Installation& installation,
                           const Waiting& waiting, Console& console);
 
-/// Has the entries of remote books say in which language each is now, in the catalogue, too: the
-/// best of those that are here. Where one has changed, the plug-in of the next host looks at every
-/// book anew: what it remembers is the former index.
-void followLanguages(const Catalogue& catalogue, std::vector<CatalogueEntry>& entries);
-
-/// Has the plug-in of the next host look at every book anew, which is when it asks servers: at
-/// once, or (when due) when it has not done so for some hours and there are books that a server may
-/// renew. Nothing is lost: indexes stay where they are.
-void forgetKnownIndices();
-void forgetKnownIndicesWhenDue(const std::vector<CatalogueEntry>& entries);
+/// Asks a server for a catalogue: what is wrong with the answer; absent when nothing is.
+std::optional<std::string> problemOfCatalogue(const std::string& url, const Waiting& waiting);
 
 }  // namespace zeb

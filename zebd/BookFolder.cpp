@@ -75,11 +75,11 @@ bool holdsPages(const std::string& folder) {
   return false;
 }
 
+}  // namespace
+
 std::string pagesFolderOf(const CatalogueEntry& entry) {
   return platform::stringByDeletingLastPathComponent(entry.accessPagePath);
 }
-
-}  // namespace
 
 std::optional<CatalogueEntry> entryForFolder(const std::string& folder,
                                              const std::optional<std::string>& bookID,
@@ -98,7 +98,7 @@ std::optional<CatalogueEntry> entryForFolder(const std::string& folder,
     entry.language = described->localization();
     entry.accessPagePath = described->accessPagePath().value_or(accessPageIn(folder));
   } else if (hasInformationList(folder)) {
-    reason = "its information list does not describe a book";
+    reason = noBookReason;
     return std::nullopt;
   } else {
     entry.bookID =
@@ -115,7 +115,7 @@ std::optional<CatalogueEntry> entryForFolder(const std::string& folder,
     entry.title = entry.bookID;
   }
   if (entry.type != ZEBHelpBookType4 && !holdsPages(pagesFolderOf(entry))) {
-    reason = "there are no pages in it";
+    reason = noPagesReason;
     return std::nullopt;
   }
   entry.fingerprint = fmt::format("{}:{}", recipe, folderFingerprint(pagesFolderOf(entry)));

@@ -23,6 +23,9 @@ std::optional<CatalogueEntry> entryForFolder(const std::string& folder,
                                              const std::string& language, std::string& reason,
                                              const std::string& accessPage = {});
 
+/// The folder of the pages of a book on this machine.
+std::string pagesFolderOf(const CatalogueEntry& entry);
+
 /// The book that the entry is about; one from a server in the language that suits its reader best
 /// now, of those that are known and here. Null when the folder's information list is no longer that
 /// of this book.

@@ -4,6 +4,7 @@
 #include <set>
 #include <utility>
 
+#include "host/Zebrine/RNXObjectManager.h"
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "host/Zebrine/ZEBLog.h"
@@ -29,6 +30,9 @@ constexpr platform::Seconds newsLimit{5};
 
 struct BookKeeper::Found {
   std::vector<CatalogueEntry> books;
+  /// Of the folders that the request names.
+  std::vector<std::string> folderBooks;
+  std::vector<BookFailure> failures;
   std::vector<CatalogueEntry> gone;
   /// False when looking broke off: then what is missing here may well be there.
   bool isComplete = false;
@@ -61,8 +65,8 @@ void BookKeeper::begin() {
   _host.announceBooks();
 }
 
-void BookKeeper::scan(Done done) {
-  _waiting.push_back(std::move(done));
+void BookKeeper::scan(ScanRequest request, Done done) {
+  _waiting.push_back({std::move(request), std::move(done)});
   if (!_isScanning) {
     _startScan();
   }
@@ -70,27 +74,46 @@ void BookKeeper::scan(Done done) {
 
 void BookKeeper::_startScan() {
   _isScanning = true;
-  _current = std::exchange(_waiting, {});
   _changes = {};
+  do {
+    _request = std::move(_waiting.front().request);
+    _current.push_back(std::move(_waiting.front().done));
+    _waiting.pop_front();
+  } while (_request.isPlain() && !_waiting.empty() && _waiting.front().request.isPlain());
+  if (!_request.languages.empty()) {
+    _settings.languages = _request.languages;
+  }
   _host.owner().disableShutdown();
-  platform::startNamedThread("book-scan", [weak = std::weak_ptr<BookKeeper*>(_self),
-                                           settings = _settings, catalogue = _catalogue] {
-    const auto found = std::make_shared<Found>();
-    platform::runLoggingExceptions([&] {
-      BookDiscovery discovery([](const std::string& folder, const std::string& reason) {
-        ZEBLog(4, "Passed over %@: %@", folder, reason);
+  platform::startNamedThread(
+      "book-scan",
+      [weak = std::weak_ptr<BookKeeper*>(_self), settings = _settings, folders = _request.folders,
+       installedBooks = _request.installedBooks, catalogue = _catalogue] {
+        const auto found = std::make_shared<Found>();
+        platform::runLoggingExceptions([&] {
+          BookDiscovery discovery([](const std::string& folder, const std::string& reason) {
+            ZEBLog(4, "Passed over %@: %@", folder, reason);
+          });
+          for (const ScanRequest::Folder& folder : folders) {
+            std::string reason;
+            if (discovery.add(folder.path, folder.bookID, {}, reason)) {
+              found->folderBooks.push_back(discovery.books().back().bookID);
+            } else {
+              found->failures.push_back({folder.path, reason});
+            }
+          }
+          if (installedBooks) {
+            discovery.addInstalled(settings.dataFolders, settings.languages);
+          }
+          found->gone = discovery.addKnown(catalogue);
+          found->books = discovery.books();
+          found->isComplete = true;
+        });
+        platform::RunLoop::main()->perform([weak, found] {
+          if (const auto self = weak.lock()) {
+            (*self)->_apply(found);
+          }
+        });
       });
-      discovery.addInstalled(settings.dataFolders, settings.languages);
-      found->gone = discovery.addKnown(catalogue);
-      found->books = discovery.books();
-      found->isComplete = true;
-    });
-    platform::RunLoop::main()->perform([weak, found] {
-      if (const auto self = weak.lock()) {
-        (*self)->_apply(found);
-      }
-    });
-  });
 }
 
 void BookKeeper::_apply(const std::shared_ptr<const Found>& found) {
@@ -100,7 +123,7 @@ void BookKeeper::_apply(const std::shared_ptr<const Found>& found) {
     return;
   }
   (void)platform::Environment::current()->files->createDirectoryWithParents(_catalogue.folder());
-  _lock = platform::FileLock::tryLock(_catalogue.folder() + ".lock");
+  _lock = platform::FileLock::tryLock(_catalogue.lockPath());
   if (!_lock && platform::Environment::current()->files->fileExistsAtPath(_catalogue.folder())) {
     platform::RunLoop::main()->performAfterDelay(lockPace,
                                                  [weak = std::weak_ptr<BookKeeper*>(_self), found] {
@@ -123,14 +146,21 @@ void BookKeeper::_apply(const std::shared_ptr<const Found>& found) {
 }
 
 void BookKeeper::_applyLocked(const Found& found) {
+  if (_request.change) {
+    _request.change(_catalogue);
+  }
+  _changes.folderBooks = found.folderBooks;
+  _changes.failures = found.failures;
+  const std::set<std::string> ofFolders(found.folderBooks.begin(), found.folderBooks.end());
   std::set<std::string> known;
   for (const CatalogueEntry& entry : found.books) {
     known.insert(entry.bookID);
-    _enter(entry, _changes);
+    _enter(entry, _request.allBooksEvenIfUnchanged ||
+                      (_request.folderBooksEvenIfUnchanged && ofFolders.contains(entry.bookID)));
   }
   for (const CatalogueEntry& entry : _catalogue.entries()) {
     if (entry.isRemote() && known.insert(entry.bookID).second) {
-      _enter(entry, _changes);
+      _enter(entry, false);
     }
   }
   for (const CatalogueEntry& entry : found.gone) {
@@ -138,12 +168,12 @@ void BookKeeper::_applyLocked(const Found& found) {
   }
   for (const auto& book : _host.bookshelf().books()) {
     if (!known.contains(book.first)) {
-      _forget(book.first, _changes);
+      _forget(book.first);
     }
   }
 }
 
-void BookKeeper::_enter(CatalogueEntry entry, BookChanges& changes) {
+void BookKeeper::_enter(CatalogueEntry entry, bool evenIfUnchanged) {
   const std::optional<CatalogueEntry> former = _catalogue.entry(entry.bookID);
   if (former && entry.type == ZEBHelpBookType3) {
     // The folder does not say that the user subscribed.
@@ -151,18 +181,19 @@ void BookKeeper::_enter(CatalogueEntry entry, BookChanges& changes) {
   }
   const auto announced = _announced.find(entry.bookID);
   const bool isOnShelf = announced != _announced.end();
-  if (former == entry && isOnShelf && announced->second == entry) {
-    ++changes.unchanged;
+  if (former == entry && isOnShelf && announced->second == entry && !evenIfUnchanged) {
+    ++_changes.unchanged;
     return;
   }
   const auto book = bookOfEntry(entry);
   if (book == nullptr) {
-    ++changes.failed;
+    ++_changes.failed;
     return;
   }
-  ++changes.changed;
+  ++_changes.changed;
+  _changes.changedBooks.push_back(entry.bookID);
   _host.bookshelf().addBook(book);
-  const bool isNewToUs = former == entry && !isOnShelf;
+  const bool isNewToUs = former == entry && !isOnShelf && !evenIfUnchanged;
   if (!isNewToUs && (former || isOnShelf || indexPathOfBook(*book))) {
     // What is remembered of a book by this name may be its index in another language or place.
     _dropping[entry.bookID] = entry;
@@ -173,8 +204,8 @@ void BookKeeper::_enter(CatalogueEntry entry, BookChanges& changes) {
   }
 }
 
-void BookKeeper::_forget(const std::string& bookID, BookChanges& changes) {
-  ++changes.forgotten;
+void BookKeeper::_forget(const std::string& bookID) {
+  ++_changes.forgotten;
   _host.removeIndexOfBook(bookID);
   _host.bookshelf().removeBook(bookID);
   _announced.erase(bookID);
@@ -218,19 +249,96 @@ void BookKeeper::_finishScanWhenDone() {
   }
   _isScanning = false;
   _lock.reset();
-  const BookChanges changes = _changes;
+  const ScanRequest request = std::exchange(_request, {});
+  const BookChanges changes = std::exchange(_changes, {});
+  if (request.asksServers) {
+    _askServers();
+  }
+  if (!request.isPlain()) {
+    // Those that have changed, and those whose turn has not come yet.
+    std::vector<std::string> bookIDs = changes.changedBooks;
+    for (const auto& book : _host.bookshelf().books()) {
+      if (!indexPathOfBook(*book.second)) {
+        bookIDs.push_back(book.first);
+      }
+    }
+    _registerNow(bookIDs);
+  }
   ZEBLog(3, "Books: %@",
          std::to_string(changes.changed) + " changed, " + std::to_string(changes.unchanged) +
              " unchanged, " + std::to_string(changes.forgotten) + " forgotten, " +
              std::to_string(changes.failed) + " failed");
   for (const Done& done : std::exchange(_current, {})) {
     if (done) {
-      done(changes);
+      // Whatever becomes of one, the others are told, and the guard is given back.
+      platform::runLoggingExceptions([&] { done(changes); });
     }
   }
   _host.owner().enableShutdown();
   if (!_waiting.empty()) {
     _startScan();
+  }
+}
+
+namespace {
+
+/// Keeps the host from leaving until books are registered.
+class Registration : public SearchReceiver {
+ public:
+  explicit Registration(Owner& owner) : _owner(owner) { _owner.disableShutdown(); }
+
+  void foundResults(const ZEBResultBatch& /*batch*/) override {}
+  void searchEnded(bool /*finished*/) override { _owner.enableShutdown(); }
+
+ private:
+  Owner& _owner;
+};
+
+}  // namespace
+
+void BookKeeper::_registerNow(const std::vector<std::string>& bookIDs) {
+  if (bookIDs.empty()) {
+    // That would mean all.
+    return;
+  }
+  _host.registerBooks(bookIDs, std::make_shared<Registration>(_host.owner()));
+}
+
+/// The plug-in asks servers when it looks at a book, and goes by what is known of the catalogues
+/// then.
+void BookKeeper::_askServers() {
+  std::set<std::string> addresses;
+  std::vector<std::string> bookIDs;
+  for (const auto& announced : _announced) {
+    const CatalogueEntry& entry = announced.second;
+    bookIDs.push_back(entry.bookID);
+    if (entry.catalogueURL) {
+      addresses.insert(*entry.catalogueURL);
+    }
+  }
+  if (addresses.empty()) {
+    return;
+  }
+  // Gives the guard back when the last answer has come, whatever it says.
+  const std::shared_ptr<void> all(
+      nullptr, [weak = std::weak_ptr<BookKeeper*>(_self), bookIDs](const void* /*nothing*/) {
+        platform::RunLoop::main()->perform([weak, bookIDs] {
+          if (const auto self = weak.lock()) {
+            forgetKnownIndices();
+            (*self)->_host.lookAtBooksAnew();
+            // Whoever waits for the servers' books would have to wait for the turns of all others.
+            (*self)->_registerNow(bookIDs);
+            (*self)->_host.owner().enableShutdown();
+          }
+        });
+      });
+  _host.owner().disableShutdown();
+  for (const std::string& address : addresses) {
+    if (const auto url = platform::URL::URLWithString(address)) {
+      RNXObjectManager::sharedObjectManager()->loadCatalogue(
+          *url, [all](const std::shared_ptr<const RNXCatalogue>& /*catalogue*/,
+                      const std::optional<platform::Error>& /*error*/) {});
+    }
   }
 }
 

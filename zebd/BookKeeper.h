@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstddef>
+#include <deque>
 #include <functional>
 #include <map>
 #include <memory>
@@ -12,10 +13,42 @@
 #include "platform/DistributedNotificationCenter.h"
 #include "platform/FileLock.h"
 #include "zebd/Catalogue.h"
+#include "zebd/Subscriptions.h"
 
 namespace zebd {
 
 class Host;
+
+/// What is to be looked for. As it stands: whatever has changed. Who asks for more than that waits
+/// for it: the indexes of books that have changed are then made or fetched at once, and not when
+/// the plug-in finds the time.
+struct ScanRequest {
+  struct Folder {
+    std::string path;
+    /// Absent: as the folder itself says, or else its name.
+    std::optional<std::string> bookID;
+  };
+
+  /// Folders that are to become books, beside those that are books already.
+  std::vector<Folder> folders;
+  /// Whether the help folders of the computer are looked through.
+  bool installedBooks = true;
+  /// From now on in place of the former ones, where there are any; best first.
+  std::vector<std::string> languages;
+  /// Whether indexes are made anew even where pages have not changed.
+  bool folderBooksEvenIfUnchanged = false;
+  bool allBooksEvenIfUnchanged = false;
+  /// Whether servers are asked for what has changed of books that are from there.
+  bool asksServers = false;
+  /// Changes the catalogue while nobody else does, before the books are brought in line with it.
+  std::function<void(const Catalogue& catalogue)> change;
+
+  /// Whether one scan will do for this request and others like it.
+  bool isPlain() const {
+    return folders.empty() && installedBooks && languages.empty() && !allBooksEvenIfUnchanged &&
+           !asksServers && change == nullptr;
+  }
+};
 
 /// What a scan has changed.
 struct BookChanges {
@@ -25,6 +58,12 @@ struct BookChanges {
   size_t forgotten = 0;
   /// Books that could not be entered into the catalogue.
   size_t failed = 0;
+
+  std::vector<std::string> changedBooks;
+  /// The books of the folders that the request names.
+  std::vector<std::string> folderBooks;
+  /// Folders that are no books.
+  std::vector<BookFailure> failures;
 };
 
 /// Brings the bookshelf, the catalogue and, through the plug-in, the indexes in line with the help
@@ -57,7 +96,8 @@ class BookKeeper {
   /// Looks for what has changed, after a scan that is under way. `done`, where there is one, is
   /// called on the main thread when the books are on the bookshelf and announced; their indexes are
   /// made after that.
-  void scan(Done done);
+  void scan(Done done) { scan({}, std::move(done)); }
+  void scan(ScanRequest request, Done done);
   bool isScanning() const { return _isScanning; }
 
   /// Folders that are to be watched for books that come and go, and trees for pages that change.
@@ -68,26 +108,33 @@ class BookKeeper {
 
  private:
   struct Found;
+  struct Waiting {
+    ScanRequest request;
+    Done done;
+  };
 
   void _startScan();
   void _apply(const std::shared_ptr<const Found>& found);
   void _applyLocked(const Found& found);
-  void _enter(CatalogueEntry entry, BookChanges& changes);
-  void _forget(const std::string& bookID, BookChanges& changes);
+  void _enter(CatalogueEntry entry, bool evenIfUnchanged);
+  void _forget(const std::string& bookID);
+  void _askServers();
+  void _registerNow(const std::vector<std::string>& bookIDs);
   void _registrationChanged(const std::string& bookID);
   void _store(const CatalogueEntry& entry);
   void _finishScanWhenDone();
   void _giveUpWaiting();
 
   Host& _host;
-  const Settings _settings;
+  Settings _settings;
   const Catalogue _catalogue;
   /// Lets what is posted to the main loop find out that this object is gone.
   const std::shared_ptr<BookKeeper*> _self;
   platform::DistributedNotificationCenter::Observation _observation;
 
   bool _isScanning = false;
-  std::vector<Done> _waiting;
+  std::deque<Waiting> _waiting;
+  ScanRequest _request;
   std::vector<Done> _current;
   BookChanges _changes;
   std::optional<platform::FileLock> _lock;

@@ -13,12 +13,18 @@
 #include <vector>
 
 #include "host/Zebrine/ZEBConstants.h"
+#include "host/Zebrine/ZEBHelpBook.h"
 #include "host/Zebrine/ZEBLog.h"
 #include "platform/Environment.h"
 #include "platform/RunLoop.h"
+#include "platform/Strings.h"
 #include "platform/ThreadSafety.h"
 #include "zebd/HelpService.h"
 #include "zebd/Models.h"
+
+#ifndef ZEB_VERSION
+#define ZEB_VERSION "0"
+#endif
 
 namespace zebd {
 
@@ -33,26 +39,9 @@ constexpr size_t itemsPerSignal = 100;
 
 constexpr const char* badRequest = "org.zeb.Help1.Error.BadRequest";
 constexpr const char* refused = "org.zeb.Help1.Error.Refused";
+constexpr const char* unreachable = "org.zeb.Help1.Error.Unreachable";
+constexpr const char* unknownBook = "org.zeb.Help1.Error.UnknownBook";
 constexpr const char* unknownHandle = "org.zeb.Help1.Error.UnknownHandle";
-
-const std::map<std::string, std::string>& kindsByName() {
-  static const std::map<std::string, std::string> kinds = {
-      {"pages", ZEBHelpArticleResult},
-      {"suggestions", ZEBHelpSuggestionResult},
-      {"similar", ZEBHelpSimilarSuggestionResult},
-      {"actions", ZEBHelpActionResult},
-  };
-  return kinds;
-}
-
-std::string nameOfKind(const std::string& kind) {
-  for (const auto& entry : kindsByName()) {
-    if (entry.second == kind) {
-      return entry.first;
-    }
-  }
-  return "pages";
-}
 
 std::string nameOfEnding(SearchEnding ending) {
   switch (ending) {
@@ -103,6 +92,75 @@ Dictionary dictionaryOfModel(const ListedModel& model) {
   return dictionary;
 }
 
+using Failures = std::vector<sdbus::Struct<std::string, std::string>>;
+
+Failures failuresOf(const std::vector<BookFailure>& failures) {
+  Failures answer;
+  for (const BookFailure& failure : failures) {
+    answer.emplace_back(failure.what, failure.reason);
+  }
+  return answer;
+}
+
+/// Throws sdbus::Error where somebody says more than can be meant.
+void checkTexts(const Strings& texts) {
+  const auto isBad = [](const std::string& text) {
+    return text.size() > HelpService::maximumTextLength || !platform::isValidUTF8(text) ||
+           text.find('\0') != std::string::npos;
+  };
+  if (texts.size() > HelpService::maximumBookCount ||
+      std::any_of(texts.begin(), texts.end(), isBad)) {
+    throw sdbus::Error(badRequest, "a list or a text is too long, or no text");
+  }
+}
+
+void checkBookIDs(const Strings& bookIDs) {
+  checkTexts(bookIDs);
+  for (const std::string& bookID : bookIDs) {
+    if (!ZEBHelpBook::isValidBookID(bookID)) {
+      throw sdbus::Error(badRequest, "\"" + bookID + "\" cannot be a book's identifier");
+    }
+  }
+}
+
+/// What is to be scanned. Throws sdbus::Error for what it may not be.
+ScanRequest scanWithOptions(const Strings& folders, const Dictionary& options) {
+  checkTexts(folders);
+  ScanRequest request;
+  for (const std::string& folder : folders) {
+    if (!folder.starts_with('/')) {
+      throw sdbus::Error(badRequest, "the path of a folder has to begin with a slash");
+    }
+    request.folders.push_back({folder, std::nullopt});
+  }
+  for (const auto& [name, value] : options) {
+    if (name == "books") {
+      const auto bookIDs = value.get<Strings>();
+      checkBookIDs(bookIDs);
+      if (bookIDs.size() != folders.size()) {
+        throw sdbus::Error(badRequest, "there has to be one book a folder");
+      }
+      for (size_t i = 0; i < bookIDs.size(); ++i) {
+        request.folders[i].bookID = bookIDs[i];
+      }
+    } else if (name == "installed") {
+      request.installedBooks = value.get<bool>();
+    } else if (name == "languages") {
+      request.languages = value.get<Strings>();
+      checkTexts(request.languages);
+    } else if (name == "force") {
+      request.allBooksEvenIfUnchanged = value.get<bool>();
+    } else if (name == "forceFolders") {
+      request.folderBooksEvenIfUnchanged = value.get<bool>();
+    } else if (name == "servers") {
+      request.asksServers = value.get<bool>();
+    } else {
+      throw sdbus::Error(badRequest, "there is no option \"" + name + "\"");
+    }
+  }
+  return request;
+}
+
 /// What a client may say beside the text. Throws sdbus::Error for what it may not.
 SearchRequest requestWithOptions(std::string text, const Dictionary& options) {
   SearchRequest request;
@@ -124,11 +182,11 @@ SearchRequest requestWithOptions(std::string text, const Dictionary& options) {
     }
   }
   for (const std::string& kind : kinds) {
-    const auto found = kindsByName().find(kind);
-    if (found == kindsByName().end()) {
+    const std::optional<std::string> known = kindOfName(kind);
+    if (!known) {
       throw sdbus::Error(badRequest, "there is no kind of result \"" + kind + "\"");
     }
-    request.kinds.push_back(found->second);
+    request.kinds.push_back(*known);
   }
   return request;
 }
@@ -160,9 +218,28 @@ struct BusService::Implementation : SearchListener,
   void registerMembers();
   void registerSearches();
   void registerQuestions();
+  void registerChanges();
+  void bookChanged(const std::string& bookID, bool isIndexed);
   void listen();
   void stop();
   void clientLeft(const std::string& client);
+
+  /// Sends the answer, and counts it.
+  using Done = std::function<void(const std::function<void()>& send)>;
+
+  /// What a request is answered with, once: results or an error.
+  template <typename... Answers>
+  struct Reply {
+    std::shared_ptr<sdbus::Result<Answers...>> result;
+    Done done;
+
+    void operator()(const Answers&... answers) const {
+      done([&] { result->returnResults(answers...); });
+    }
+    void fail(const sdbus::Error& error) const {
+      done([&] { result->returnError(error); });
+    }
+  };
 
   /// Has the request carried out on the main thread, if it may be. To be called while the bus hands
   /// the request over. What `carryOut` throws of sdbus::Error becomes the answer.
@@ -182,7 +259,7 @@ struct BusService::Implementation : SearchListener,
             return;
           }
           self->events.activity();
-          const auto done = [weak, client](const auto& send) {
+          const Done done = [weak, client](const std::function<void()>& send) {
             try {
               send();
             } catch (const sdbus::Error& error) {
@@ -193,9 +270,7 @@ struct BusService::Implementation : SearchListener,
             }
           };
           try {
-            carryOut(*self, client, [answer, done](const Answers&... answers) {
-              done([&] { answer->returnResults(answers...); });
-            });
+            carryOut(*self, client, Reply<Answers...>{answer, done});
           } catch (const sdbus::Error& error) {
             done([&] { answer->returnError(error); });
           }
@@ -417,7 +492,8 @@ void BusService::Implementation::registerQuestions() {
                   {"scanning", status.isScanning},
                   {"guards", status.guardCount},
                   {"running", status.running.count()},
-                  {"process", static_cast<int64_t>(::getpid())}});
+                  {"process", static_cast<int64_t>(::getpid())},
+                  {"version", std::string(ZEB_VERSION)}});
         });
       });
   object->registerMethod("Rescan")
@@ -425,9 +501,75 @@ void BusService::Implementation::registerQuestions() {
       .withOutputParamNames("changed", "unchanged", "forgotten", "failed")
       .implementedAs([this](sdbus::Result<uint32_t, uint32_t, uint32_t, uint32_t>&& result) {
         take(std::move(result), [](Implementation& self, const std::string&, const auto& answer) {
-          self.service->scan([answer](const BookChanges& changes) {
+          self.service->scan({}, [answer](const BookChanges& changes) {
             answer(static_cast<uint32_t>(changes.changed), static_cast<uint32_t>(changes.unchanged),
                    static_cast<uint32_t>(changes.forgotten), static_cast<uint32_t>(changes.failed));
+          });
+        });
+      });
+}
+
+void BusService::Implementation::registerChanges() {
+  object->registerMethod("Scan")
+      .onInterface(ZEBBusInterface)
+      .withInputParamNames("folders", "options")
+      .withOutputParamNames("changes")
+      .implementedAs([this](sdbus::Result<Dictionary>&& result, Strings folders,
+                            Dictionary options) {
+        take(std::move(result), [folders = std::move(folders), options = std::move(options)](
+                                    Implementation& self, const std::string&, const auto& answer) {
+          self.service->scan(scanWithOptions(folders, options),
+                             [answer](const BookChanges& changes) {
+                               answer({{"changed", changes.changedBooks},
+                                       {"folderBooks", changes.folderBooks},
+                                       {"unchanged", static_cast<uint32_t>(changes.unchanged)},
+                                       {"forgotten", static_cast<uint32_t>(changes.forgotten)},
+                                       {"failed", static_cast<uint32_t>(changes.failed)},
+                                       {"failures", failuresOf(changes.failures)}});
+                             });
+        });
+      });
+  object->registerMethod("AddRemote")
+      .onInterface(ZEBBusInterface)
+      .withInputParamNames("address", "books", "languages")
+      .withOutputParamNames("added", "failures")
+      .implementedAs([this](sdbus::Result<Dictionaries, Failures>&& result, std::string address,
+                            Strings books, Strings languages) {
+        take(std::move(result), [address = std::move(address), books = std::move(books),
+                                 languages = std::move(languages)](
+                                    Implementation& self, const std::string&, const auto& answer) {
+          checkTexts({address});
+          checkBookIDs(books);
+          checkTexts(languages);
+          self.service->addRemote(address, {books, languages}, [answer](const AddedBooks& added) {
+            if (added.problem) {
+              answer.fail(sdbus::Error(unreachable, *added.problem));
+              return;
+            }
+            Dictionaries entries;
+            for (const CatalogueEntry& entry : added.entries) {
+              entries.push_back(
+                  {{"id", entry.bookID}, {"title", entry.title}, {"language", entry.language}});
+            }
+            answer(entries, failuresOf(added.failures));
+          });
+        });
+      });
+  object->registerMethod("RemoveRemote")
+      .onInterface(ZEBBusInterface)
+      .withInputParamNames("name")
+      .withOutputParamNames("removed")
+      .implementedAs([this](sdbus::Result<Strings>&& result, std::string name) {
+        take(std::move(result), [name = std::move(name)](Implementation& self, const std::string&,
+                                                         const auto& answer) {
+          checkTexts({name});
+          self.service->removeRemote(name, [answer, name](const RemovedBooks& removed) {
+            if (!removed.wasFound) {
+              answer.fail(sdbus::Error(unknownBook,
+                                       "there is no book on a server called \"" + name + "\""));
+              return;
+            }
+            answer(removed.bookIDs);
           });
         });
       });
@@ -436,6 +578,10 @@ void BusService::Implementation::registerQuestions() {
 void BusService::Implementation::registerMembers() {
   registerSearches();
   registerQuestions();
+  registerChanges();
+  object->registerSignal("BookChanged")
+      .onInterface(ZEBBusInterface)
+      .withParameters<std::string, bool>("book", "indexed");
   object->finishRegistration();
   departures = connection->addMatch(
       "type='signal',sender='org.freedesktop.DBus',interface='org.freedesktop.DBus',"
@@ -454,6 +600,14 @@ void BusService::Implementation::registerMembers() {
           }
         });
       });
+}
+
+void BusService::Implementation::bookChanged(const std::string& bookID, bool isIndexed) {
+  try {
+    object->emitSignal("BookChanged").onInterface(ZEBBusInterface).withArguments(bookID, isIndexed);
+  } catch (const sdbus::Error& error) {
+    ZEBLog(1, "Cannot tell clients of a book: %@", error.getMessage());
+  }
 }
 
 void BusService::Implementation::listen() {
@@ -501,6 +655,12 @@ std::shared_ptr<SearchListener> BusService::listener() const { return _implement
 bool BusService::serve(HelpService& service, Events events, platform::Error& error) {
   _implementation->service = &service;
   _implementation->events = std::move(events);
+  service.setBookObserver([weak = std::weak_ptr<Implementation>(_implementation)](
+                              const std::string& bookID, bool isIndexed) {
+    if (const auto self = weak.lock()) {
+      self->bookChanged(bookID, isIndexed);
+    }
+  });
   try {
     _implementation->registerMembers();
     _implementation->connection->requestName(ZEBBusName);

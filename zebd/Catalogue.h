@@ -54,6 +54,8 @@ class Catalogue {
   explicit Catalogue(std::string folder) : _folder(std::move(folder)) {}
 
   const std::string& folder() const noexcept { return _folder; }
+  /// The file that programs lock (platform::FileLock) while they change more than one entry.
+  std::string lockPath() const { return _folder + ".lock"; }
 
   /// All books, by identifier.
   std::vector<CatalogueEntry> entries() const;

@@ -168,12 +168,21 @@ int runDaemon(const DaemonOptions& options, const Installation& installation) {
     ZEBLog(1, "There is no caches folder");
     return 1;
   }
+  const Catalogue catalogue(stringByAppendingPathComponent(
+      options.cacheFolder ? *options.cacheFolder
+                          : stringByAppendingPathComponent(*environment->cachesDirectory, "zeb"),
+      "books"));
   platform::Error error;
   auto bus = BusService::connect({}, error);
   OwnerSettings settings;
   settings.shouldBeLazy = computerShouldBeLazy(environment->processorCount());
   settings.userHelpCachesDirectoryPath =
       stringByAppendingPathComponent(*environment->cachesDirectory, ZEBDaemonBundleID);
+  if (bus != nullptr) {
+    std::vector<CatalogueEntry> entries = catalogue.entries();
+    followLanguages(catalogue, entries);
+    forgetKnownIndicesWhenDue(entries);
+  }
   auto host = bus == nullptr
                   ? nullptr
                   : Host::start(installation.pluginBundlePath, std::move(settings), error);
@@ -184,10 +193,7 @@ int runDaemon(const DaemonOptions& options, const Installation& installation) {
   BookKeeper::Settings books;
   books.dataFolders = environment->dataDirectories;
   books.languages = environment->preferredLanguages;
-  books.catalogueFolder = stringByAppendingPathComponent(
-      options.cacheFolder ? *options.cacheFolder
-                          : stringByAppendingPathComponent(*environment->cachesDirectory, "zeb"),
-      "books");
+  books.catalogueFolder = catalogue.folder();
   const auto listener = bus->listener();
   Daemon daemon(std::move(bus),
                 std::make_unique<HelpService>(std::move(host), std::move(books), listener),

@@ -1,5 +1,7 @@
 #include "zebd/FoundItem.h"
 
+#include <map>
+
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "host/Zebrine/ZEBResult.h"
@@ -10,6 +12,17 @@
 namespace zebd {
 
 namespace {
+
+/// Kind and name.
+const std::map<std::string, std::string>& namesOfKinds() {
+  static const std::map<std::string, std::string> names = {
+      {ZEBHelpArticleResult, "pages"},
+      {ZEBHelpSuggestionResult, "suggestions"},
+      {ZEBHelpSimilarSuggestionResult, "similar"},
+      {ZEBHelpActionResult, "actions"},
+  };
+  return names;
+}
 
 using Records = std::vector<std::shared_ptr<ZEBResult>>;
 
@@ -44,6 +57,24 @@ FoundItem itemOfText(const std::string& text) {
 }
 
 }  // namespace
+
+std::string nameOfKind(const std::string& kind) {
+  for (const auto& [known, name] : namesOfKinds()) {
+    if (known == kind) {
+      return name;
+    }
+  }
+  return {};
+}
+
+std::optional<std::string> kindOfName(const std::string& name) {
+  for (const auto& [kind, known] : namesOfKinds()) {
+    if (known == name) {
+      return kind;
+    }
+  }
+  return std::nullopt;
+}
 
 std::vector<FoundItem> itemsOfBatch(const ZEBResultBatch& batch, const Bookshelf& bookshelf) {
   std::vector<FoundItem> items;

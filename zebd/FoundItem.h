@@ -25,6 +25,11 @@ struct FoundItem {
   bool isExactMatch = false;
 };
 
+/// What clients call the kinds of result ("pages", "suggestions", "similar", "actions"), and back;
+/// absent, or empty, for others.
+std::string nameOfKind(const std::string& kind);
+std::optional<std::string> kindOfName(const std::string& name);
+
 /// The items of a batch, in its order. A page without a title bears the name of its file; a book
 /// that is not on the shelf has its identifier for a title.
 std::vector<FoundItem> itemsOfBatch(const ZEBResultBatch& batch, const Bookshelf& bookshelf);

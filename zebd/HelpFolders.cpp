@@ -214,7 +214,7 @@ void Manuals::_addFolder(const std::string& folder, const std::string& accessPag
   } else if (isGeneratedReference(*real)) {
     _passedOver(folder, "it is an interface description made by a generator");
   } else if (!ZEBHelpBook::isValidBookID(bookID)) {
-    _passedOver(folder, "its name cannot be a book's identifier");
+    _passedOver(folder, noNameReason);
   } else {
     _found.push_back({bookID, *real, {}, accessPage});
     _seen.insert(*real);
@@ -281,14 +281,14 @@ std::vector<HelpFolder> applicationHelpFolders(const std::vector<std::string>& d
     }
     const std::string& anyFolder = translations.begin()->second;
     if (languages.empty()) {
-      passedOver(anyFolder, "there are no pages in it");
+      passedOver(anyFolder, noPagesReason);
       continue;
     }
     const std::optional<std::string> language = bestLanguage(languages, fallbacks);
     if (!language) {
-      passedOver(anyFolder, "it is in none of the user's languages");
+      passedOver(anyFolder, noLanguageReason);
     } else if (!ZEBHelpBook::isValidBookID(application)) {
-      passedOver(anyFolder, "its name cannot be a book's identifier");
+      passedOver(anyFolder, noNameReason);
     } else {
       folders.push_back({application, translations.at(*language), *language, {}});
     }

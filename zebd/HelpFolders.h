@@ -19,7 +19,13 @@ struct HelpFolder {
   std::string accessPage = {};
 };
 
-/// Told of each folder that was passed over, and why.
+/// Reasons for passing a folder over that somebody can do something about.
+inline constexpr const char* noPagesReason = "there are no pages in it";
+inline constexpr const char* noLanguageReason = "it is in none of the user's languages";
+inline constexpr const char* noNameReason = "its name cannot be a book's identifier";
+inline constexpr const char* noBookReason = "its information list does not describe a book";
+
+/// Told of each folder that was passed over, and why: one of these reasons, or another.
 using PassedOver = std::function<void(const std::string& folder, const std::string& reason)>;
 
 // Data folders are those like /usr/share; what an earlier one has counts before what is in a later

@@ -3,9 +3,12 @@
 #include <algorithm>
 #include <utility>
 
+#include "host/Zebrine/RNXCatalogue.h"
+#include "host/Zebrine/RNXObjectManager.h"
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "platform/Environment.h"
+#include "platform/RunLoop.h"
 #include "platform/Strings.h"
 #include "zebd/BookFolder.h"
 
@@ -28,13 +31,90 @@ HelpService::HelpService(std::unique_ptr<Host> host, BookKeeper::Settings books,
       _start(elapsedNow()),
       _books(*_host, std::move(books)),
       _searches(*_host, std::move(listener)),
-      _watcher([this] { _books.scan([this](const BookChanges&) { _watch(); }); }) {}
+      _watcher([this] { _books.scan([this](const BookChanges&) { _watch(); }); }),
+      _self(std::make_shared<HelpService*>(this)) {
+  _host->owner().setBookModifiedHandler(
+      [observer = _observer](const std::shared_ptr<ZEBHelpBook>& book) {
+        platform::RunLoop::main()->perform([observer, book] {
+          if (*observer) {
+            const bool isIndexed = book != nullptr && indexPathOfBook(*book);
+            (*observer)(book == nullptr ? std::string() : book->bookID(), isIndexed);
+          }
+        });
+      });
+}
 
-HelpService::~HelpService() = default;
+HelpService::~HelpService() { *_observer = nullptr; }
 
 void HelpService::begin() {
   _books.begin();
   _books.scan([this](const BookChanges&) { _watch(); });
+}
+
+void HelpService::scan(ScanRequest request, BookKeeper::Done done) {
+  _books.scan(std::move(request), [this, done = std::move(done)](const BookChanges& changes) {
+    done(changes);
+    _watch();
+  });
+}
+
+void HelpService::addRemote(const std::string& address, WantedBooks wanted,
+                            std::function<void(const AddedBooks& added)> done) {
+  const std::optional<platform::URL> url = addressOfCatalogue(address);
+  if (!url) {
+    done({"\"" + address + "\" is no address of a web server", {}, {}});
+    return;
+  }
+  _host->owner().disableShutdown();
+  RNXObjectManager::sharedObjectManager()->loadCatalogue(
+      *url, [weak = std::weak_ptr<HelpService*>(_self), url = *url, wanted = std::move(wanted),
+             done = std::move(done)](const std::shared_ptr<const RNXCatalogue>& published,
+                                     const std::optional<platform::Error>& error) {
+        platform::RunLoop::main()->perform([weak, url, wanted, done, published, error] {
+          if (const auto self = weak.lock()) {
+            (*self)->_add(url, published, error, wanted, done);
+            (*self)->_host->owner().enableShutdown();
+          }
+        });
+      });
+}
+
+void HelpService::_add(const platform::URL& address,
+                       const std::shared_ptr<const RNXCatalogue>& published,
+                       const std::optional<platform::Error>& error, WantedBooks wanted,
+                       const std::function<void(const AddedBooks& added)>& done) {
+  if (published == nullptr) {
+    done({address.absoluteString() + ": " + (error ? error->description : "there is no catalogue"),
+          {},
+          {}});
+    return;
+  }
+  const auto added = std::make_shared<AddedBooks>();
+  ScanRequest request;
+  request.change = [added, published, address,
+                    wanted = std::move(wanted)](const Catalogue& catalogue) {
+    added->entries = subscribe(*published, address, wanted, catalogue, added->failures);
+  };
+  scan(std::move(request), [added, done](const BookChanges&) { done(*added); });
+}
+
+void HelpService::removeRemote(const std::string& name,
+                               std::function<void(const RemovedBooks& removed)> done) {
+  const auto removed = std::make_shared<RemovedBooks>();
+  ScanRequest request;
+  request.change = [removed, name](const Catalogue& catalogue) {
+    for (const CatalogueEntry& entry : unsubscribe(name, catalogue, removed->wasFound)) {
+      if (entry.isRemote()) {
+        catalogue.remove(entry.bookID);
+        removed->bookIDs.push_back(entry.bookID);
+      } else {
+        // It stands for itself here, and would be found again at once.
+        removed->wasFound = false;
+      }
+    }
+  };
+  scan(std::move(request),
+       [removed, done = std::move(done)](const BookChanges&) { done(*removed); });
 }
 
 void HelpService::_watch() { _watcher.watch(_books.watchedFolders(), _books.watchedTrees()); }

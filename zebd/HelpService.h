@@ -6,12 +6,15 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "zebd/BookKeeper.h"
 #include "zebd/ClientSearches.h"
 #include "zebd/FolderWatcher.h"
 #include "zebd/Host.h"
+
+struct RNXCatalogue;
 
 namespace zebd {
 
@@ -39,6 +42,21 @@ struct ServiceStatus {
   platform::Seconds running{0};
 };
 
+/// What became of a subscription.
+struct AddedBooks {
+  /// Why there is nothing of the publisher's; absent when there is.
+  std::optional<std::string> problem;
+  std::vector<CatalogueEntry> entries;
+  std::vector<BookFailure> failures;
+};
+
+/// What became of forgetting books.
+struct RemovedBooks {
+  /// Whether there was anything of this name.
+  bool wasFound = false;
+  std::vector<std::string> bookIDs;
+};
+
 /// A host whose books are kept up to date and whose plug-in serves several clients.
 /// Thread-safety: confined to the main thread, which has to run its loop.
 class HelpService {
@@ -61,7 +79,22 @@ class HelpService {
   static std::optional<std::string> objection(const SearchRequest& request);
 
   ClientSearches& searches() { return _searches; }
-  void scan(BookKeeper::Done done) { _books.scan(std::move(done)); }
+  void scan(BookKeeper::Done done) { scan({}, std::move(done)); }
+  void scan(ScanRequest request, BookKeeper::Done done);
+
+  /// Subscribes to books of the catalogue at `address` (see subscribe()). `done` is called on the
+  /// main thread when the books are on the bookshelf; their indexes are fetched after that.
+  void addRemote(const std::string& address, WantedBooks wanted,
+                 std::function<void(const AddedBooks& added)> done);
+  /// Forgets books on servers (see unsubscribe()) and deletes what was fetched of them, a little
+  /// later. Books that are on this computer stay.
+  void removeRemote(const std::string& name, std::function<void(const RemovedBooks& removed)> done);
+
+  /// Told, on the main thread, of each book whose index has changed; the identifier is empty for
+  /// one that is no longer on the bookshelf.
+  using BookObserver = std::function<void(const std::string& bookID, bool isIndexed)>;
+  void setBookObserver(BookObserver observer) { *_observer = std::move(observer); }
+
   std::vector<BookStatus> books() const;
   ServiceStatus status() const;
 
@@ -71,12 +104,18 @@ class HelpService {
 
  private:
   void _watch();
+  void _add(const platform::URL& address, const std::shared_ptr<const RNXCatalogue>& published,
+            const std::optional<platform::Error>& error, WantedBooks wanted,
+            const std::function<void(const AddedBooks& added)>& done);
 
   const std::unique_ptr<Host> _host;
   const platform::Clock::Instant _start;
   BookKeeper _books;
   ClientSearches _searches;
   FolderWatcher _watcher;
+  /// What is posted to the main loop finds it, and finds it empty when this object is gone.
+  const std::shared_ptr<BookObserver> _observer = std::make_shared<BookObserver>();
+  const std::shared_ptr<HelpService*> _self;
 };
 
 }  // namespace zebd

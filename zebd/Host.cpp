@@ -91,6 +91,10 @@ void Host::userLanguagesDidChange() {
       service->takeLocalization(entry.second);
     }
   }
+  lookAtBooksAnew();
+}
+
+void Host::lookAtBooksAnew() {
   _plugin->notifyEvent(ZEBPluginEventLanguageChanged, {});
   announceBooks();
 }

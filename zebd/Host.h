@@ -62,6 +62,10 @@ class Host {
   /// until its index has come.
   void userLanguagesDidChange();
 
+  /// Has the plug-in forget what it knows of all books, which are announced to it anew: it looks at
+  /// their indexes again, and asks servers for those of books that are from there.
+  void lookAtBooksAnew();
+
   /// Has the book's index forgotten, and deleted where it was generated, a little later. On the
   /// main thread. The owner's handler hears when it is done.
   void removeIndexOfBook(const std::string& bookID);

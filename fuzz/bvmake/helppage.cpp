@@ -1,9 +1,12 @@
-// Any bytes as a help page of either kind: whatever comes out must be what Page promises.
+// Any bytes as a help page of either kind: whatever comes out must be what Page promises, and what
+// is left out of HTML before it is parsed must make no difference.
 #include <cstdint>
 #include <cstdlib>
 #include <string>
 #include <unordered_set>
 
+#include "bvmake/CharacterSet.h"
+#include "bvmake/HTMLPage.h"
 #include "bvmake/PageReader.h"
 #include "bvmake/Summary.h"
 #include "bvmake/TextRun.h"
@@ -52,11 +55,20 @@ void check(const bvmake::Page& page, bvmake::Summarizer& summarizer) {
   require(summary.size() <= 4 * bvmake::maximumSummaryLength);
 }
 
+void checkThinning(std::string_view bytes) {
+  const auto text = bvmake::textFromBytes(bytes, bvmake::Markup::html);
+  if (text) {
+    require(bvmake::readHTMLPage(*text, nullptr, bvmake::HTMLThinning::on) ==
+            bvmake::readHTMLPage(*text, nullptr, bvmake::HTMLThinning::off));
+  }
+}
+
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
   static bvmake::Summarizer summarizer;
   const std::string_view bytes(reinterpret_cast<const char*>(data), size);
+  checkThinning(bytes);
   for (const bvmake::PageKind kind : {bvmake::PageKind::html, bvmake::PageKind::mallard}) {
     platform::Error error;
     if (const auto page = bvmake::readPage(kind, bytes, &error)) {

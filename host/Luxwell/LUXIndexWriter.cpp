@@ -1,20 +1,22 @@
 #include "host/Luxwell/LUXIndexWriter.h"
 
 #include <algorithm>
+#include <array>
 #include <cstdint>
-#include <functional>
 #include <string_view>
-#include <unordered_map>
 #include <unordered_set>
 #include <utility>
 
 #include "host/Luxwell/HelpLUXIndex.h"
 #include "host/Luxwell/HelpTokenizer.h"
+#include "host/Luxwell/LUXBigrams.h"
+#include "host/Luxwell/LUXNumbering.h"
 #include "host/Luxwell/LUXNumbers.h"
-#include "host/Luxwell/LUXPairTable.h"
 #include "host/Luxwell/LUXParallel.h"
 #include "host/Luxwell/LUXPhraseFinder.h"
 #include "host/Luxwell/LUXSectionedData.h"
+#include "host/Luxwell/LUXTextOrder.h"
+#include "host/Luxwell/LUXTokenSectionWriter.h"
 #include "host/Luxwell/LUXTokenSections.h"
 #include "platform/Exception.h"
 #include "platform/PropertyList.h"
@@ -28,35 +30,6 @@ constexpr uint32_t none = 0xFFFFFFFF;
 
 // A piece of work while the data are written.
 constexpr size_t pagesAtOnce = 64;
-
-struct TextHash {
-  using is_transparent = void;
-  size_t operator()(std::string_view text) const noexcept {
-    return std::hash<std::string_view>()(text);
-  }
-};
-
-// Strings by number, in the order in which they came.
-class Names {
- public:
-  uint32_t numberOf(std::string_view name) {
-    const auto found = _numbers.find(name);
-    if (found != _numbers.end()) {
-      return found->second;
-    }
-    const auto number = static_cast<uint32_t>(_names.size());
-    _numbers.emplace(std::string(name), number);
-    _names.emplace_back(name);
-    return number;
-  }
-  size_t count() const noexcept { return _names.size(); }
-  const std::string& operator[](size_t number) const noexcept { return _names[number]; }
-  const std::vector<std::string>& all() const noexcept { return _names; }
-
- private:
-  std::unordered_map<std::string, uint32_t, TextHash, std::equal_to<>> _numbers;
-  std::vector<std::string> _names;
-};
 
 // A word as it is written.
 struct Surface {
@@ -72,8 +45,48 @@ struct Surface {
 struct Whole {
   uint32_t form = 0;
   // Of its last word in the page.
-  size_t place = 0;
+  uint32_t place = 0;
 };
+
+// Texts one after the other, by number.
+class Texts {
+ public:
+  void add(std::string_view text) {
+    _text += text;
+    _ends.push_back(_text.size());
+  }
+  size_t size() const noexcept { return _ends.size(); }
+  std::string_view operator[](size_t number) const noexcept {
+    const size_t from = number == 0 ? 0 : _ends[number - 1];
+    return std::string_view(_text).substr(from, _ends[number] - from);
+  }
+
+ private:
+  std::string _text;
+  std::vector<size_t> _ends;
+};
+
+// What texts come to as tokens of one kind, of which there is one for each different text.
+struct Ranking {
+  // Texts that are different, in order.
+  std::vector<uint32_t> order;
+  // By the number of a text.
+  std::vector<uint32_t> rank;
+};
+
+template <typename AllTexts>
+Ranking rankingOf(const AllTexts& texts) {
+  Ranking ranking;
+  ranking.rank.resize(texts.size());
+  for (const uint32_t number :
+       LUXOrderOfTexts(texts.size(), [&](uint32_t i) { return texts[i]; })) {
+    if (ranking.order.empty() || texts[ranking.order.back()] != texts[number]) {
+      ranking.order.push_back(number);
+    }
+    ranking.rank[number] = static_cast<uint32_t>(ranking.order.size() - 1);
+  }
+  return ranking;
+}
 
 struct Page {
   std::string key;
@@ -101,13 +114,13 @@ struct LUXIndexWriter::Implementation {
   std::shared_ptr<const HelpTokenizer> tokenizer;
   std::unordered_set<std::string> keys;
   std::vector<Page> pages;
-  Names surfaceNames;
+  LUXStringNumbering surfaceNames;
   std::vector<Surface> surfaces;
-  Names forms;
-  Names stems;
-  // By their stems.
-  LUXPairTable bigrams;
+  LUXStringNumbering forms;
+  LUXStringNumbering stems;
   size_t threadCount = 1;
+  // Of the page that is being added.
+  std::vector<LUXWordSequence::Word> words;
   std::vector<HelpTokenizer::Segment> segments;
   std::string buffer;
 
@@ -138,10 +151,10 @@ struct LUXIndexWriter::Implementation {
       }
       if (!segment.whole.empty() && !breaks) {
         if (const std::string form = tokenizer->formOfSurface(segment.whole); !form.empty()) {
-          page.wholes.push_back({forms.numberOf(form), page.sequence.words.size()});
+          page.wholes.push_back({forms.numberOf(form), static_cast<uint32_t>(words.size())});
         }
       }
-      page.sequence.words.push_back({number, breaks});
+      words.emplace_back(number, breaks);
       breaks = false;
     }
   }
@@ -164,7 +177,7 @@ struct LUXIndexWriter::Implementation {
     }
     for (Page& page : other.pages) {
       for (LUXWordSequence::Word& word : page.sequence.words) {
-        word.number = surfaceOfOther[word.number];
+        word = {surfaceOfOther[word.number()], word.breaksChain()};
       }
       for (Whole& whole : page.wholes) {
         whole.form = forms.numberOf(other.forms[whole.form]);
@@ -177,7 +190,7 @@ struct LUXIndexWriter::Implementation {
   // Which surface each form is shown as: as it is written where it does not begin a sentence, as
   // far as one can know: in small letters if it ever is.
   std::vector<uint32_t> displaySurfaces() const {
-    std::vector<uint32_t> best(forms.count(), none);
+    std::vector<uint32_t> best(forms.size(), none);
     for (uint32_t number = 0; number < surfaces.size(); ++number) {
       if (surfaces[number].form != none) {
         uint32_t& chosen = best[surfaces[number].form];
@@ -199,8 +212,8 @@ struct LUXIndexWriter::Implementation {
 
   // Forms that may begin or end a phrase: no stop words, and nothing without a letter.
   std::vector<bool> edgeForms() const {
-    std::vector<bool> mayStand(forms.count());
-    for (size_t form = 0; form < forms.count(); ++form) {
+    std::vector<bool> mayStand(forms.size());
+    for (size_t form = 0; form < forms.size(); ++form) {
       mayStand[form] = !hasNoLetter(forms[form]);
     }
     for (const Surface& surface : surfaces) {
@@ -211,106 +224,155 @@ struct LUXIndexWriter::Implementation {
     return mayStand;
   }
 
-  LUXPhraseFinder phrases() const {
-    std::vector<const LUXWordSequence*> sequences;
-    sequences.reserve(pages.size());
+  std::vector<const LUXWordSequence*> sequences() const {
+    std::vector<const LUXWordSequence*> all;
+    all.reserve(pages.size());
     for (const Page& page : pages) {
-      sequences.push_back(&page.sequence);
+      all.push_back(&page.sequence);
     }
-    std::vector<uint32_t> formOfSurface;
-    formOfSurface.reserve(surfaces.size());
+    return all;
+  }
+
+  std::vector<uint32_t> formsOfSurfaces() const {
+    std::vector<uint32_t> all;
+    all.reserve(surfaces.size());
     for (const Surface& surface : surfaces) {
-      formOfSurface.push_back(surface.form);
+      all.push_back(surface.form);
     }
-    LUXPhraseFinder finder;
-    finder.find(sequences, formOfSurface, edgeForms(), threadCount);
-    return finder;
+    return all;
   }
 
-  // Calls the sink with the stems of each pair that makes a bigram, and the place of the second.
-  template <typename Sink>
-  void forEachBigram(const Page& page, Sink sink) const {
-    uint32_t before = none;
-    for (size_t at = 0; at < page.sequence.words.size(); ++at) {
-      const LUXWordSequence::Word& word = page.sequence.words[at];
-      const uint32_t stem = surfaces[word.number].stem;
-      if (before != none && stem != none && !word.breaksChain) {
-        sink(before, stem, at);
-      }
-      before = stem;
-    }
-  }
-
-  // Numbers the bigrams, and returns their names.
-  std::vector<std::string> numberBigrams() {
-    std::vector<std::string> names;
-    for (const Page& page : pages) {
-      forEachBigram(page, [&](uint32_t first, uint32_t second, size_t) {
-        if (bigrams.numberOf(first, second).second) {
-          names.push_back(stems[first] + ' ' + stems[second]);
-        }
-      });
-    }
-    return names;
-  }
-
-  std::vector<std::string> phraseNames(const LUXPhraseFinder& finder) const {
+  Texts phraseNames(const LUXPhraseFinder& finder) const {
     const std::vector<uint32_t> displays = displaySurfaces();
-    std::vector<std::string> names;
-    names.reserve(finder.phrases().size());
+    Texts names;
+    std::string display;
     for (const LUXPhrase& phrase : finder.phrases()) {
-      std::string display;
+      display.clear();
       for (size_t i = 0; i < phrase.statistics.length; ++i) {
         HelpTokenizer::appendToDisplay(display, surfaceNames[displays[phrase.words[i]]]);
       }
-      names.push_back(std::move(display));
+      names.add(display);
     }
     return names;
   }
 
-  // By the position of the page; empty where the title is too long for a token or has no words.
-  std::vector<std::string> titleNames() const {
-    std::vector<std::string> names;
-    names.reserve(pages.size());
+  // The titles that are tokens, and which of them is each page's. None where the title is too long
+  // for a token or has no words.
+  Texts titleNames(std::vector<uint32_t>& titleOfPage) const {
+    Texts names;
     for (const Page& page : pages) {
-      names.push_back(tokenizer->tokenizedStringFromString(page.title));
-      if (names.back().size() > LUXTokenTable::maximumTokenLength) {
-        names.back().clear();
+      const std::string name = tokenizer->tokenizedStringFromString(page.title);
+      const bool isToken = !name.empty() && name.size() <= LUXTokenTable::maximumTokenLength;
+      titleOfPage.push_back(isToken ? static_cast<uint32_t>(names.size()) : none);
+      if (isToken) {
+        names.add(name);
       }
     }
     return names;
   }
 
-  LUXTokenSections tokens(const LUXPhraseFinder& finder) {
-    std::vector<std::string> titles = titleNames();
-    // The titles that are tokens, and which of them is each page's.
-    std::vector<std::string> kept;
-    std::vector<uint32_t> titleOfPage(pages.size(), none);
-    for (size_t number = 0; number < pages.size(); ++number) {
-      if (!titles[number].empty()) {
-        titleOfPage[number] = static_cast<uint32_t>(kept.size());
-        kept.push_back(std::move(titles[number]));
+  // What the tokens of the book are.
+  struct TokenData {
+    Ranking stems;
+    Ranking forms;
+    Ranking phrases;
+    Ranking titles;
+    Texts phraseNames;
+    Texts titleNames;
+    std::vector<uint32_t> titleOfPage;
+    LUXBigrams bigrams;
+    // By surface, the rank of its stem.
+    std::vector<uint32_t> stemOfSurface;
+    // Where the numbers of each kind begin; and end.
+    std::array<uint32_t, LUXTokenKindCount + 1> starts{};
+    platform::Data tokenBytes;
+
+    uint32_t startOf(LUXTokenKind kind) const { return starts[static_cast<size_t>(kind)]; }
+  };
+
+  void writeTokens(TokenData& data) const {
+    LUXTokenSectionWriter writer;
+    const auto addAll = [&](LUXTokenKind kind, const auto& texts, const Ranking& ranking) {
+      for (const uint32_t number : ranking.order) {
+        writer.add(kind, texts[number]);
       }
+    };
+    addAll(LUXTokenKind::stem, stems, data.stems);
+    // A stem has no blank in it, and nothing that comes before one: the order of the stems is that
+    // of the pairs.
+    std::string name;
+    uint32_t before = none;
+    size_t beginning = 0;
+    data.bigrams.forEach([&](uint32_t first, uint32_t second) {
+      if (first != before) {
+        name = stems[data.stems.order[first]];
+        name += ' ';
+        beginning = name.size();
+        before = first;
+      }
+      name.resize(beginning);
+      name += stems[data.stems.order[second]];
+      writer.add(LUXTokenKind::bigram, name);
+    });
+    addAll(LUXTokenKind::form, forms, data.forms);
+    addAll(LUXTokenKind::phrase, data.phraseNames, data.phrases);
+    addAll(LUXTokenKind::title, data.titleNames, data.titles);
+    data.tokenBytes = writer.finish();
+  }
+
+  void findTokens(const LUXPhraseFinder& finder, TokenData& data) const {
+    data.stems = rankingOf(stems);
+    data.forms = rankingOf(forms);
+    data.phraseNames = phraseNames(finder);
+    data.phrases = rankingOf(data.phraseNames);
+    data.titleNames = titleNames(data.titleOfPage);
+    data.titles = rankingOf(data.titleNames);
+    data.stemOfSurface.reserve(surfaces.size());
+    for (const Surface& surface : surfaces) {
+      data.stemOfSurface.push_back(surface.stem == none ? none : data.stems.rank[surface.stem]);
     }
-    LUXTokenSections sections(
-        {stems.all(), numberBigrams(), forms.all(), phraseNames(finder), std::move(kept)});
+    data.bigrams.find(sequences(), data.stemOfSurface, stems.size(), threadCount);
+    uint64_t start = 0;
+    const std::array<size_t, LUXTokenKindCount> counts = {
+        data.stems.order.size(), data.bigrams.size(), data.forms.order.size(),
+        data.phrases.order.size(), data.titles.order.size()};
+    for (size_t kind = 0; kind < counts.size(); ++kind) {
+      start += counts[kind];
+      data.starts[kind + 1] = static_cast<uint32_t>(start);
+    }
+    if (start >= none) {
+      throw platform::Exception(platform::invalidArgumentException,
+                                "a book too large for semantic data");
+    }
+  }
+
+  LUXTokenSections pageSections(const LUXPhraseFinder& finder, const TokenData& data) {
+    const std::vector<uint32_t> formOfSurface = formsOfSurfaces();
     // Each piece's pages are one part, so that they can be put in order.
-    std::vector<std::unique_ptr<LUXTokenSections::Pages>> parts((pages.size() + pagesAtOnce - 1) /
-                                                                pagesAtOnce);
+    std::vector<std::unique_ptr<LUXTokenSections>> parts((pages.size() + pagesAtOnce - 1) /
+                                                         pagesAtOnce);
+    const auto newPart = [&] {
+      return std::make_unique<LUXTokenSections>(data.starts.back(),
+                                                data.startOf(LUXTokenKind::phrase));
+    };
     LUXInParallel(pages.size(), pagesAtOnce, threadCount, [&](size_t from, size_t to) {
-      auto part = std::make_unique<LUXTokenSections::Pages>(sections);
+      auto part = newPart();
       for (size_t number = from; number < to; ++number) {
-        addWords(pages[number], *part);
-        for (const LUXPhraseFinder::Count& count : finder.countsOfPages()[number]) {
-          part->add(LUXTokenKind::phrase, count.phrase, count.titleCount, count.bodyCount);
-        }
-        if (titleOfPage[number] != none) {
-          part->add(LUXTokenKind::title, titleOfPage[number], 1, 0);
+        addWords(number, data, *part);
+        finder.forEachPhraseOfPage(
+            number, pages[number].sequence, formOfSurface, [&](uint32_t phrase, bool inTitle) {
+              const uint32_t token = data.startOf(LUXTokenKind::phrase) + data.phrases.rank[phrase];
+              inTitle ? part->addInTitle(token) : part->addInBody(token);
+            });
+        if (data.titleOfPage[number] != none) {
+          part->addInTitle(data.startOf(LUXTokenKind::title) +
+                           data.titles.rank[data.titleOfPage[number]]);
         }
         part->endPage();
       }
       parts[from / pagesAtOnce] = std::move(part);
     });
+    LUXTokenSections sections(data.starts.back(), data.startOf(LUXTokenKind::phrase));
     for (auto& part : parts) {
       sections.append(*part);
       part.reset();
@@ -318,28 +380,30 @@ struct LUXIndexWriter::Implementation {
     return sections;
   }
 
-  void addWords(const Page& page, LUXTokenSections::Pages& sections) const {
+  void addWords(size_t number, const TokenData& data, LUXTokenSections& sections) const {
+    const Page& page = pages[number];
     const size_t titleLength = page.sequence.titleLength;
-    const auto add = [&](LUXTokenKind kind, uint32_t token, size_t at) {
+    const auto add = [&](uint32_t token, size_t at) {
       if (at < titleLength) {
-        sections.add(kind, token, 1, 0, 0);
+        sections.addInTitle(token);
       } else {
-        const size_t before = std::min<size_t>(at - titleLength, LUXTokenCount::farDown);
-        sections.add(kind, token, 0, 1, static_cast<uint8_t>(before));
+        sections.addInBody(token, static_cast<uint8_t>(
+                                      std::min<size_t>(at - titleLength, LUXTokenCount::farDown)));
       }
     };
+    const uint32_t formStart = data.startOf(LUXTokenKind::form);
     for (size_t at = 0; at < page.sequence.words.size(); ++at) {
-      const Surface& surface = surfaces[page.sequence.words[at].number];
-      add(LUXTokenKind::form, surface.form, at);
-      if (surface.stem != none) {
-        add(LUXTokenKind::stem, surface.stem, at);
+      const uint32_t surface = page.sequence.words[at].number();
+      add(formStart + data.forms.rank[surfaces[surface].form], at);
+      if (data.stemOfSurface[surface] != none) {
+        add(data.stemOfSurface[surface], at);
       }
     }
-    forEachBigram(page, [&](uint32_t first, uint32_t second, size_t at) {
-      add(LUXTokenKind::bigram, bigrams.at(first, second), at);
-    });
+    const uint32_t bigramStart = data.startOf(LUXTokenKind::bigram);
+    data.bigrams.forEachOfPage(number, page.sequence, data.stemOfSurface,
+                               [&](uint32_t bigram, size_t at) { add(bigramStart + bigram, at); });
     for (const Whole& whole : page.wholes) {
-      add(LUXTokenKind::form, whole.form, whole.place);
+      add(formStart + data.forms.rank[whole.form], whole.place);
     }
   }
 
@@ -379,14 +443,18 @@ struct LUXIndexWriter::Implementation {
   platform::Data finish() {
     std::sort(pages.begin(), pages.end(),
               [](const Page& a, const Page& b) { return a.key < b.key; });
-    const LUXPhraseFinder finder = phrases();
-    LUXTokenSections sections = tokens(finder);
+    LUXPhraseFinder finder;
+    finder.find(sequences(), formsOfSurfaces(), edgeForms(), threadCount);
+    TokenData data;
+    findTokens(finder, data);
+    writeTokens(data);
+    LUXTokenSections sections = pageSections(finder, data);
     return LUXSectionedData(
                {section(HelpLUXIndex::attributesSectionType, attributes(finder)),
                 section(HelpLUXIndex::countsSectionType, sections.countBytes()),
                 section(HelpLUXIndex::keysSectionType, keyRecords().finish()),
                 section(HelpLUXIndex::propertiesSectionType, propertyRecords().finish()),
-                section(HelpLUXIndex::tokensSectionType, sections.tokenBytes()),
+                section(HelpLUXIndex::tokensSectionType, data.tokenBytes),
                 section(HelpLUXIndex::placesSectionType, sections.placeBytes())})
         .write();
   }
@@ -406,11 +474,14 @@ void LUXIndexWriter::addDocument(const LUXDocument& document) {
   }
   Page page{
       document.key, document.title, document.description, document.excludedFromSearch, {}, {}};
+  std::vector<LUXWordSequence::Word>& words = _implementation->words;
+  words.clear();
   _implementation->addText(document.title, page);
-  page.sequence.titleLength = page.sequence.words.size();
+  page.sequence.titleLength = words.size();
   for (const std::string& block : document.blocks) {
     _implementation->addText(block, page);
   }
+  page.sequence.words.assign(words.begin(), words.end());
   _implementation->pages.push_back(std::move(page));
 }
 

@@ -24,13 +24,18 @@ class LUXStringNumbering {
   std::string_view operator[](size_t number) const noexcept;
 
  private:
+  /// The hash stands beside the number, so that looking for a string reads no other string.
+  struct Slot {
+    uint32_t hash = 0;
+    uint32_t number = none;
+  };
+
   size_t _slotOf(std::string_view string, uint32_t hash) const noexcept;
   void _grow();
 
   std::string _text;
   std::vector<uint32_t> _ends;
-  std::vector<uint32_t> _hashes;
-  std::vector<uint32_t> _slots;
+  std::vector<Slot> _slots;
 };
 
 /// Pairs of numbers below LUXStringNumbering::none, in the same way.

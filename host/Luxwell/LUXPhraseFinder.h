@@ -7,54 +7,54 @@
 #include <vector>
 
 #include "host/Luxwell/LUXPhraseScore.h"
+#include "host/Luxwell/LUXWordSequence.h"
 
 inline constexpr size_t LUXPhraseMaximumLength = 4;
 
-/// The words of one page by number, in order.
-struct LUXWordSequence {
-  struct Word {
-    uint32_t number = 0;
-    /// No phrase reaches from the word before to this one.
-    bool breaksChain = false;
-  };
-
-  std::vector<Word> words;
-  /// So many words at the beginning are the title; the first after them breaks the chain.
-  size_t titleLength = 0;
-};
-
 struct LUXPhrase {
   std::array<uint32_t, LUXPhraseMaximumLength> words{};
-  /// totalPageCount, longer phrases and all else filled in.
   LUXPhraseStatistics statistics;
 };
 
 /// Finds every group of up to four words that follow one another, neither the first nor the last of
 /// which is a word that must not stand there, in at least two pages; single words in any number of
-/// pages. Longer groups are only looked for where all their parts are in two pages, so that what is
-/// found once takes little memory.
-/// Thread-safety: confined to one thread.
+/// pages.
+///
+/// Groups grow a word at a time, and only where both their parts are in two pages. Most pairs of
+/// words are there once, though: a first look over the pages notes in two bits, found by a hash,
+/// whether a pair may be there twice, and only those get a place in a table (the idea is that of
+/// J. Park, M. Chen, P. Yu, "An effective hash-based algorithm for mining association rules",
+/// 1995). So what is found once takes neither time nor memory to speak of.
+/// Thread-safety: confined to one thread; once find() has returned, immutable.
 class LUXPhraseFinder {
  public:
-  struct Count {
-    uint32_t phrase = 0;
-    uint32_t titleCount = 0;
-    uint32_t bodyCount = 0;
-  };
-
   static constexpr uint32_t minimumPageCount = 2;
 
   /// The numbers in the pages stand for words by way of `wordOfNumber`: several may be one word.
-  /// `mayStandAtEdge` has one entry for each word. The pages are not used afterwards. Up to
-  /// `threadCount` threads take part; what is found does not depend on their number.
+  /// `mayStandAtEdge` has one entry for each word. Up to `threadCount` threads take part; what is
+  /// found does not depend on their number, but the order of the phrases does. May be called once.
+  /// Throws platform::Exception "InvalidArgumentException" for two thousand million words.
   void find(const std::vector<const LUXWordSequence*>& pages,
             const std::vector<uint32_t>& wordOfNumber, const std::vector<bool>& mayStandAtEdge,
             size_t threadCount = 1);
 
   const std::vector<LUXPhrase>& phrases() const noexcept { return _phrases; }
 
-  /// The phrases of each page, in order of their numbers, which are positions in phrases().
-  const std::vector<std::vector<Count>>& countsOfPages() const noexcept { return _counts; }
+  /// Calls `sink(uint32_t phrase, bool inTitle)` for each place of a page at which a phrase is, in
+  /// no particular order. `words` and `wordOfNumber` are those that find() had.
+  template <typename Sink>
+  void forEachPhraseOfPage(size_t page, const LUXWordSequence& sequence,
+                           const std::vector<uint32_t>& wordOfNumber, Sink sink) const {
+    for (size_t at = 0; at < sequence.words.size(); ++at) {
+      const uint32_t phrase = _phraseOfWord[wordOfNumber[sequence.words[at].number()]];
+      if (phrase != none) {
+        sink(phrase, at < sequence.titleLength);
+      }
+    }
+    for (const Occurrence occurrence : _longer[page]) {
+      sink(occurrence >> 1U, (occurrence & 1U) != 0);
+    }
+  }
 
  private:
   static constexpr uint32_t none = 0xFFFFFFFF;
@@ -63,32 +63,52 @@ class LUXPhraseFinder {
   struct Group {
     uint32_t first = none;
     uint32_t second = none;
+    uint32_t frequency = 0;
     uint32_t pageCount = 0;
     uint32_t lastPage = none;
+    uint32_t titleCount = 0;
+    uint32_t lastTitle = none;
     uint32_t phrase = none;
+
+    void count(uint32_t page, bool inTitle) noexcept;
   };
-  using Groups = std::vector<Group>;
-  using Positions = std::vector<std::vector<uint32_t>>;
-
+  /// The groups of one length. They are found in parts, each by one thread: the lowest bits of a
+  /// group's number say which part it is in.
+  using Groups = std::vector<std::vector<Group>>;
   using Pages = std::vector<const LUXWordSequence*>;
+  /// A phrase of two words or more, and in the lowest bit whether it is in the title.
+  using Occurrence = uint32_t;
 
+  const Group& _group(size_t level, uint32_t number) const noexcept {
+    return _levels[level][number & _partMask][number >> _partBits];
+  }
   void _findSingleWords(const Pages& pages, const std::vector<uint32_t>& wordOfNumber,
                         size_t wordCount);
   void _findLonger(const Pages& pages);
-  void _keep(const Pages& pages, const std::vector<bool>& mayStandAtEdge);
-  void _countInPage(size_t level, size_t page, size_t titleLength);
+  void _findPart(const Pages& pages, uint32_t part, std::vector<Group>& groups);
+  template <typename Prepare, typename Take>
+  void _forEachPair(const Pages& pages, uint32_t part, Prepare prepare, Take take) const;
+  void _keep(size_t pageCount, const std::vector<bool>& mayStandAtEdge);
+  void _settle(const Pages& pages);
   void _countLongerPhrases();
   uint32_t _wordOf(size_t level, uint32_t group, size_t i) const;
 
   size_t _threadCount = 1;
+  unsigned _partBits = 0;
+  uint32_t _partMask = 0;
   /// By length less one.
   std::vector<Groups> _levels;
-  /// The group that begins at each word of each page, of the longest length so far.
-  Positions _positions;
+  /// Where each page's words begin in the two below.
+  std::vector<size_t> _starts;
+  /// The group that begins at each word of each page, of the longest length so far, where it is in
+  /// two pages.
+  std::vector<uint32_t> _positions;
+  std::vector<uint32_t> _nextPositions;
   std::vector<LUXPhrase> _phrases;
   /// Which group a phrase is, by number.
   std::vector<uint32_t> _groupOfPhrase;
-  std::vector<std::vector<Count>> _counts;
+  std::vector<uint32_t> _phraseOfWord;
+  std::vector<std::vector<Occurrence>> _longer;
 };
 
 /// The score of the last phrase that still gets into a budget of `budget` phrases of `shortest` to

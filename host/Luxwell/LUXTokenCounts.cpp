@@ -6,11 +6,10 @@
 #include <utility>
 
 #include "host/Luxwell/LUXNumbers.h"
+#include "host/Luxwell/LUXTokenSectionWriter.h"
 #include "platform/Exception.h"
 #include "platform/Strings.h"
 
-using luxnumbers::appendUInt32;
-using luxnumbers::appendVarnumber;
 using luxnumbers::readUInt32;
 using luxnumbers::readVarnumber;
 
@@ -64,24 +63,12 @@ std::shared_ptr<const LUXTokenTable> LUXTokenTable::withTokens(
 }
 
 platform::Data LUXTokenTable::sectionBytes() const {
-  std::string out;
-  for (size_t kind = 0; kind < LUXTokenKindCount; ++kind) {
-    appendUInt32(out, _kindStarts[kind + 1] - _kindStarts[kind]);
+  LUXTokenSectionWriter writer;
+  for (size_t number = 0; number < size(); ++number) {
+    const Token token = tokenAt(number);
+    writer.add(token.kind, token.token);
   }
-  for (size_t kind = 0; kind < LUXTokenKindCount; ++kind) {
-    std::string_view before;
-    for (uint32_t number = _kindStarts[kind]; number < _kindStarts[kind + 1]; ++number) {
-      const std::string_view token = tokenAt(number).token;
-      const auto differ =
-          std::mismatch(before.begin(), before.end(), token.begin(), token.end()).second;
-      const auto shared = static_cast<size_t>(differ - token.begin());
-      appendVarnumber(out, shared);
-      appendVarnumber(out, token.size() - shared);
-      out += token.substr(shared);
-      before = token;
-    }
-  }
-  return platform::Data::adopt(std::move(out));
+  return writer.finish();
 }
 
 std::shared_ptr<const LUXTokenTable> LUXTokenTable::withSectionBytes(const platform::Data& bytes) {

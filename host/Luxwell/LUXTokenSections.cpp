@@ -1,62 +1,91 @@
 #include "host/Luxwell/LUXTokenSections.h"
 
 #include <algorithm>
-#include <numeric>
+#include <array>
+#include <bit>
 #include <utility>
 
-#include "host/Luxwell/LUXNumbers.h"
+namespace {
 
-using luxnumbers::appendVarnumber;
+// Sorting by digits looks at each of so many once more, so that few things are sorted by comparing.
+constexpr unsigned digitBits = 11;
+constexpr size_t digitCount = size_t{1} << digitBits;
+constexpr size_t fewestForDigits = 256;
 
-LUXTokenSections::LUXTokenSections(Names names) {
-  Names sorted;
-  uint32_t start = 0;
-  for (size_t kind = 0; kind < LUXTokenKindCount; ++kind) {
-    std::vector<uint32_t> order(names[kind].size());
-    std::iota(order.begin(), order.end(), 0);
-    std::sort(order.begin(), order.end(),
-              [&](uint32_t a, uint32_t b) { return names[kind][a] < names[kind][b]; });
-    _numbers[kind].resize(order.size());
-    for (const uint32_t number : order) {
-      if (sorted[kind].empty() || sorted[kind].back() != names[kind][number]) {
-        sorted[kind].push_back(std::move(names[kind][number]));
-      }
-      _numbers[kind][number] = start + static_cast<uint32_t>(sorted[kind].size() - 1);
-    }
-    start += static_cast<uint32_t>(sorted[kind].size());
+constexpr size_t longestVarnumber = 5;
+
+char* writeVarnumber(char* out, uint64_t value) noexcept {
+  for (; value >= 0x80; value >>= 7U) {
+    *out++ = static_cast<char>((value & 0x7FU) | 0x80U);
   }
-  _table = LUXTokenTable::withTokens(sorted);
+  *out++ = static_cast<char>(value);
+  return out;
 }
 
-void LUXTokenSections::append(Pages& pages) {
+}  // namespace
+
+LUXTokenSections::LUXTokenSections(size_t tokenCount, uint32_t firstWithoutPlace)
+    : _tokenBits(static_cast<unsigned>(std::bit_width(tokenCount))),
+      _firstWithoutPlace(firstWithoutPlace) {}
+
+void LUXTokenSections::append(LUXTokenSections& pages) {
   _records.append(pages._records);
   _places.append(pages._places);
 }
 
-void LUXTokenSections::Pages::endPage() {
-  std::sort(_page.begin(), _page.end(),
-            [](const auto& a, const auto& b) { return a.number < b.number; });
-  std::string& bytes = _records.beginRecord();
-  std::string& places = _places.beginRecord();
-  const uint32_t firstWithoutPlace = _sections._table->startOfKind(LUXTokenKind::phrase);
-  uint32_t next = 0;
-  for (size_t i = 0; i < _page.size();) {
-    LUXTokenCounts::Entry sum = _page[i];
-    for (++i; i < _page.size() && _page[i].number == sum.number; ++i) {
-      sum.titleCount += _page[i].titleCount;
-      sum.bodyCount += _page[i].bodyCount;
-      sum.wordsBefore = std::min(sum.wordsBefore, _page[i].wordsBefore);
-    }
-    const bool isPlain = sum.titleCount == 0 && sum.bodyCount == 1;
-    appendVarnumber(bytes, static_cast<uint64_t>(sum.number - next) << 1U | (isPlain ? 0U : 1U));
-    if (!isPlain) {
-      appendVarnumber(bytes, sum.titleCount);
-      appendVarnumber(bytes, sum.bodyCount);
-    }
-    if (sum.number < firstWithoutPlace) {
-      places.push_back(static_cast<char>(sum.wordsBefore));
-    }
-    next = sum.number + 1;
+// In order of tokens; in which order a token's occurrences are makes no difference.
+void LUXTokenSections::_sortPage() {
+  if (_page.size() < fewestForDigits) {
+    std::sort(_page.begin(), _page.end());
+    return;
   }
+  _sorted.resize(_page.size());
+  for (unsigned bit = shift; bit < shift + _tokenBits; bit += digitBits) {
+    std::array<uint32_t, digitCount> ends{};
+    for (const uint64_t occurrence : _page) {
+      ++ends[occurrence >> bit & (digitCount - 1)];
+    }
+    uint32_t begin = 0;
+    for (uint32_t& end : ends) {
+      begin += std::exchange(end, begin);
+    }
+    for (const uint64_t occurrence : _page) {
+      _sorted[ends[occurrence >> bit & (digitCount - 1)]++] = occurrence;
+    }
+    _page.swap(_sorted);
+  }
+}
+
+void LUXTokenSections::endPage() {
+  _sortPage();
+  _bytes.resize(std::max(_bytes.size(), _page.size() * 3 * longestVarnumber));
+  _placeBytes.resize(std::max(_placeBytes.size(), _page.size()));
+  char* out = _bytes.data();
+  char* place = _placeBytes.data();
+  uint32_t next = 0;
+  for (auto at = _page.begin(); at != _page.end();) {
+    const uint64_t token = *at >> shift;
+    uint32_t titleCount = 0;
+    uint32_t bodyCount = 0;
+    uint8_t wordsBefore = LUXTokenCount::farDown;
+    for (; at != _page.end() && *at >> shift == token; ++at) {
+      const uint32_t inTitle = (*at & title) != 0 ? 1 : 0;
+      titleCount += inTitle;
+      bodyCount += 1 - inTitle;
+      wordsBefore = std::min(wordsBefore, static_cast<uint8_t>(*at));
+    }
+    const bool isPlain = titleCount == 0 && bodyCount == 1;
+    out = writeVarnumber(out, (token - next) << 1U | (isPlain ? 0U : 1U));
+    if (!isPlain) {
+      out = writeVarnumber(out, titleCount);
+      out = writeVarnumber(out, bodyCount);
+    }
+    if (token < _firstWithoutPlace) {
+      *place++ = static_cast<char>(wordsBefore);
+    }
+    next = static_cast<uint32_t>(token) + 1;
+  }
+  _records.beginRecord().append(_bytes.data(), out);
+  _places.beginRecord().append(_placeBytes.data(), place);
   _page.clear();
 }

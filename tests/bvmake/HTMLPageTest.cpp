@@ -320,5 +320,74 @@ TEST(PageReader, kindsAreKnownByExtensionInAnyCase) {
   EXPECT_EQ(pageKindOfFileName("html"), std::nullopt);
 }
 
+void expectSameWhenThinned(const std::string& html) {
+  platform::Error error;
+  const auto page = readHTMLPage(html, &error, HTMLThinning::on);
+  ASSERT_TRUE(page) << error.description;
+  EXPECT_TRUE(page == readHTMLPage(html, nullptr, HTMLThinning::off)) << html;
+}
+
+TEST(HTMLPage, marksInAnyElementAreThinnedWithoutADifference) {
+  for (const std::string element :
+       {"a",       "address",  "applet",   "area",   "article",  "aside",    "b",      "body",
+        "br",      "button",   "caption",  "center", "col",      "colgroup", "dd",     "del",
+        "details", "dialog",   "dir",      "div",    "dl",       "dt",       "embed",  "fieldset",
+        "figure",  "font",     "footer",   "form",   "frame",    "frameset", "h1",     "head",
+        "header",  "hr",       "html",     "iframe", "img",      "input",    "ins",    "isindex",
+        "label",   "legend",   "li",       "link",   "main",     "map",      "menu",   "meta",
+        "nav",     "noframes", "noscript", "object", "ol",       "optgroup", "option", "p",
+        "param",   "pre",      "section",  "select", "span",     "strike",   "style",  "summary",
+        "svg",     "table",    "tbody",    "td",     "textarea", "tfoot",    "th",     "thead",
+        "title",   "tr",       "tt",       "u",      "ul",       "unknown",  "xmp"}) {
+    for (const std::string mark : {"span", "em", "code", "b", "tt", "font", "u", "small"}) {
+      const std::string marked = "<" + mark + " class='x'>marked</" + mark + ">";
+      for (const std::string& html :
+           {"<body><" + element + ">a " + marked + " b</" + element + ">c" + marked,
+            "<" + element + ">" + marked + marked + "<p>d", marked + "<" + element + ">e" + marked,
+            "<body><p>" + marked + "<" + element + ">f</p>" + marked + "</" + element + ">g"}) {
+        expectSameWhenThinned(html);
+      }
+    }
+  }
+}
+
+TEST(HTMLPage, whatIsMalformedIsThinnedWithoutADifference) {
+  for (const std::string html :
+       {"<body><span>a<em>b</span>c</em>d",
+        "<body><span>a<p>b</span>c</p>d",
+        "<body><span>a</em>b</span>",
+        "<body><span>a</span",
+        "<body><span>a</span x>b",
+        "<body><span/>a</span>b",
+        "<body><span a='1'b='2'>c</span>",
+        "<p title='<b>x'>y",
+        "<p class='x",
+        "<p class='x'title=\"z\"",
+        "<!-->a--><p>b",
+        "<!--->a--><p>b",
+        "<!--a--!>b-->c",
+        "a<!-- b",
+        "<script>a",
+        "<script>a</b></script>c",
+        "<style><!-- </style> --> a",
+        "<body>1 < 2 <b>3</b>",
+        "<BODY><SPAN CLASS=a ID=b>c</SPAN><A NAME='d'>e</A>",
+        "<body><p style='display:none'>a<p style='color:red'>b<p style='&#100;isplay:none'>c",
+        "<body><span>a<!-- b -->c</span>d",
+        "<body><b><i><u>a</u></i></b>b<![CDATA[<b>c</b>]]>",
+        "<body></body><span>a</span>b",
+        "<body><head><span>a</span></head>b",
+        "<html><span>a</span><body>b",
+        "<body>a  \n <p>  b </p>  \n c",
+        "<pre>a\n\n  <b>b</b>  c</pre>",
+        "<p hidden>a</p><p Hidden='until-found'>b</p><p class='a' hidden>c</p>",
+        "<title>a  <b>b</b></title><meta name='description' content='c' class='d'>"}) {
+    expectSameWhenThinned(html);
+    for (size_t length = 0; length < html.size(); ++length) {
+      expectSameWhenThinned(html.substr(0, length));
+    }
+  }
+}
+
 }  // namespace
 }  // namespace bvmake

@@ -222,7 +222,7 @@ TEST(Manual, ReferenceNamesEveryOptionAndNoOther) {
   const tests::World world;
   std::string help = world.zeb({"--help"}).out;
   for (const char* command :
-       {"search", "anchor", "books", "index", "scan", "add", "remove", "publish"}) {
+       {"search", "anchor", "books", "index", "scan", "add", "remove", "publish", "doctor"}) {
     help += world.zeb({command, "--help"}).out;
   }
   std::set<std::string> offered = optionsIn(help);

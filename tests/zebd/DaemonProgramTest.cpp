@@ -1,22 +1,10 @@
 #include <gmock/gmock.h>
-#include <signal.h>
-#include <unistd.h>
 
-#include <chrono>
-#include <cstdlib>
-#include <filesystem>
-#include <fstream>
-#include <iterator>
 #include <optional>
 #include <random>
 #include <sstream>
-#include <string>
-#include <thread>
-#include <vector>
 
-#include "tests/platform/TemporaryFolder.h"
-#include "tests/platform/services/PrivateBus.h"
-#include "tests/support/ChildProcess.h"
+#include "tests/zebd/DaemonWorld.h"
 #include "zebd/Daemon.h"
 
 namespace {
@@ -24,131 +12,14 @@ namespace {
 using testing::AllOf;
 using testing::HasSubstr;
 using testing::StartsWith;
+using tests::contents;
+using tests::Variable;
 
 namespace fs = std::filesystem;
 
-/// Sets a variable of this process, and so of its children, for a while.
-class Variable {
- public:
-  Variable(const char* name, const std::string& value) : _name(name) {
-    ::setenv(name, value.c_str(), 1);
-  }
-  ~Variable() { ::unsetenv(_name); }
-  Variable(const Variable&) = delete;
-  Variable& operator=(const Variable&) = delete;
-
- private:
-  const char* const _name;
-};
-
-std::string contents(const std::string& path) {
-  std::ifstream file(path);
-  return {std::istreambuf_iterator<char>(file), {}};
-}
-
-/// A session of its own, with a bus that starts the real daemon when somebody asks for it.
-class DaemonProgramTest : public testing::Test {
+class DaemonProgramTest : public testing::Test, protected tests::DaemonWorld {
  protected:
-  explicit DaemonProgramTest(const std::string& options = "--idle 3600")
-      : bus(_configuration(options)) {
-    page("garden", "Roses", "Cut roses in spring.");
-    page("kitchen", "Boiling", "Put water into a pot.");
-  }
-  ~DaemonProgramTest() override {
-    if (const pid_t process = daemonProcess(); process > 0) {
-      ::kill(process, SIGKILL);
-    }
-  }
-
-  void page(const std::string& book, const std::string& title, const std::string& text) const {
-    folder.write(
-        "share/help/en/" + book + "/index.html",
-        "<title>" + title + "</title><h1 id=\"top\">" + title + "</h1><p>" + text + "</p>");
-  }
-  /// Answers of the daemon, started by the bus where it does not run.
-  std::string gdbus(const std::vector<std::string>& arguments) const {
-    const std::string output = folder.path("output");
-    fs::remove(output);
-    std::vector<std::string> line = {
-        "call",   "--address",    bus.address(),   "--timeout",     "60",
-        "--dest", "org.zeb.zebd", "--object-path", "/org/zeb/Help", "--method"};
-    line.insert(line.end(), arguments.begin(), arguments.end());
-    tests::ChildProcess("/usr/bin/gdbus", line, output).wait();
-    return contents(output);
-  }
-  std::string status() const { return gdbus({"org.zeb.Help1.Status"}); }
-  bool isThere() const {
-    const std::string output = folder.path("owner");
-    fs::remove(output);
-    tests::ChildProcess(
-        "/usr/bin/gdbus",
-        {"call", "--address", bus.address(), "--dest", "org.freedesktop.DBus", "--object-path", "/",
-         "--method", "org.freedesktop.DBus.NameHasOwner", "org.zeb.zebd"},
-        output)
-        .wait();
-    return contents(output) == "(true,)\n";
-  }
-  /// The daemon that runs; 0 where none does.
-  pid_t daemonProcess() const {
-    const std::string output = folder.path("pid");
-    fs::remove(output);
-    tests::ChildProcess(
-        "/usr/bin/gdbus",
-        {"call", "--address", bus.address(), "--dest", "org.freedesktop.DBus", "--object-path", "/",
-         "--method", "org.freedesktop.DBus.GetConnectionUnixProcessID", "org.zeb.zebd"},
-        output)
-        .wait();
-    const std::string answer = contents(output);
-    constexpr std::string_view start = "(uint32 ";
-    return answer.starts_with(start) ? std::atoi(answer.c_str() + start.size()) : 0;
-  }
-  /// Waits for a state that is bound to come; false when that takes unreasonably long.
-  template <typename Condition>
-  static bool waitFor(const Condition& condition) {
-    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(120);
-    while (!condition()) {
-      if (std::chrono::steady_clock::now() > end) {
-        return false;
-      }
-      std::this_thread::sleep_for(std::chrono::milliseconds(20));
-    }
-    return true;
-  }
-  bool waitUntilIndexed(const std::string& count) const {
-    return waitFor(
-        [&] { return status().find("'indexed': <uint64 " + count) != std::string::npos; });
-  }
-  bool waitUntilGone(pid_t process) const {
-    return waitFor([&] { return daemonProcess() != process; });
-  }
-  /// Files that a writer leaves behind when it is killed.
-  std::vector<std::string> temporaryFiles() const {
-    std::vector<std::string> paths;
-    std::error_code error;
-    for (fs::recursive_directory_iterator entry(folder.path("cache"), error), end;
-         !error && entry != end; entry.increment(error)) {
-      const std::string name = entry->path().filename().string();
-      if (name.find(".tmp") != std::string::npos || name.find(".new") != std::string::npos) {
-        paths.push_back(entry->path().string());
-      }
-    }
-    return paths;
-  }
-  tests::TemporaryFolder folder;
-  const Variable cache{"XDG_CACHE_HOME", folder.path("cache")};
-  const Variable data{"XDG_DATA_HOME", folder.path("own")};
-  const Variable shared{"XDG_DATA_DIRS", folder.path("share")};
-  const Variable config{"XDG_CONFIG_HOME", folder.path("config")};
-  const Variable language{"LANGUAGE", "en"};
-  tests::PrivateBus bus;
-
- private:
-  /// The bus reads its service files when it starts, and notices changes late.
-  std::string _configuration(const std::string& options) const {
-    folder.write("services/org.zeb.zebd.service",
-                 "[D-BUS Service]\nName=org.zeb.zebd\nExec=" ZEB_DAEMON " " + options + "\n");
-    return "<servicedir>" + folder.path("services") + "</servicedir>";
-  }
+  using DaemonWorld::DaemonWorld;
 };
 
 class HastyDaemonTest : public DaemonProgramTest {
@@ -194,18 +65,8 @@ TEST_F(DaemonProgramTest, DaemonEndsWithItsBus) {
 TEST_F(DaemonProgramTest, CommandLineAsksTheDaemonAndAnswersTheSameAsWithoutIt) {
   page("long", "Many words",
        "Words about words. <h2 id=\"deep\">Deep inside</h2> Nothing of note.");
-  const auto zeb = [this](const std::vector<std::string>& arguments,
-                          const std::string& busAddress) {
-    const Variable address("DBUS_SESSION_BUS_ADDRESS", busAddress);
-    const std::string output = folder.path("zeb output");
-    fs::remove(output);
-    tests::ChildProcess program(ZEB_PROGRAM, arguments, output);
-    const int code = program.wait();
-    return std::to_string(code) + "\n" + contents(output);
-  };
-  const std::string none = "unix:path=" + folder.path("none");
   // The daemon finds the books, and indexes them while the first search waits.
-  EXPECT_THAT(zeb({"search", "--json", "spring"}, bus.address()),
+  EXPECT_THAT(zeb({"search", "--json", "spring"}),
               AllOf(StartsWith("0\n"), HasSubstr("\"title\": \"Roses\"")));
   EXPECT_TRUE(isThere());
   EXPECT_TRUE(waitUntilIndexed("3"));
@@ -222,8 +83,17 @@ TEST_F(DaemonProgramTest, CommandLineAsksTheDaemonAndAnswersTheSameAsWithoutIt) 
                                                        {"search", "--book", "garden", "roses"},
                                                        {"search", "--book", "no", "a"}};
   for (const auto& line : lines) {
-    EXPECT_EQ(zeb(line, bus.address()), zeb(line, none)) << testing::PrintToString(line);
+    EXPECT_EQ(zeb(line), zeb(line, false)) << testing::PrintToString(line);
   }
+}
+
+TEST_F(DaemonProgramTest, DoctorAsksTheDaemonAndFindsNothingWrongWithWhatItHasMade) {
+  EXPECT_TRUE(waitUntilIndexed("2"));
+  const Variable address("DBUS_SESSION_BUS_ADDRESS", bus.address());
+  const std::string output = folder.path("zeb output");
+  tests::ChildProcess program(ZEB_PROGRAM, {"doctor", "--json"}, output);
+  EXPECT_EQ(program.wait(), 0) << contents(output);
+  EXPECT_THAT(contents(output), AllOf(HasSubstr("\"books\": 2"), HasSubstr("\"running\"")));
 }
 
 TEST_F(DaemonProgramTest, CommandLineDoesWithoutTheDaemonWhereItIsToldTo) {
@@ -248,29 +118,6 @@ TEST_F(DaemonProgramTest, DaemonWithoutABusSaysSo) {
   tests::ChildProcess daemon(ZEB_DAEMON, {}, folder.path("log"));
   EXPECT_EQ(daemon.wait(), 1);
   EXPECT_THAT(contents(folder.path("log")), HasSubstr("there is no message bus"));
-}
-
-/// However a daemon ends, the next one serves, with nothing torn and nothing left lying about.
-TEST_F(DaemonProgramTest, DaemonThatIsKilledAtAnyMomentIsFollowedByOneThatServes) {
-  const char* asked = std::getenv("ZEB_KILLS");
-  const int kills = asked == nullptr ? 6 : std::atoi(asked);
-  std::mt19937 random(11);
-  for (int i = 0; i < kills; ++i) {
-    // Something to index, and to forget, in every round.
-    page("round" + std::to_string(i), "Round " + std::to_string(i), "In winter.");
-    fs::remove_all(folder.path("share/help/en/round" + std::to_string(i - 2)));
-    EXPECT_THAT(status(), HasSubstr("'process'"));
-    const pid_t process = daemonProcess();
-    ASSERT_GT(process, 0);
-    std::this_thread::sleep_for(std::chrono::milliseconds(random() % 400));
-    ASSERT_EQ(::kill(process, SIGKILL), 0);
-    EXPECT_TRUE(waitUntilGone(process));
-  }
-  const std::string books = kills == 1 ? "3" : "4";
-  EXPECT_TRUE(waitUntilIndexed(books)) << status();
-  EXPECT_THAT(gdbus({"org.zeb.Help1.StartSearch", "spring", "{}"}), StartsWith("(uint64 "));
-  EXPECT_TRUE(waitFor([this] { return temporaryFiles().empty(); }))
-      << testing::PrintToString(temporaryFiles());
 }
 
 class DaemonOptionsTest : public testing::Test {

@@ -2,6 +2,8 @@
 
 #include <gmock/gmock.h>
 
+#include <filesystem>
+
 #include "tests/platform/TemporaryFolder.h"
 
 namespace {
@@ -17,12 +19,39 @@ TEST(InstallationTest, ProgramOfABuildFolderUsesItsOwnParts) {
   EXPECT_EQ(installation.indexingToolPath, folder.path("bvmake/bvmake"));
 }
 
-TEST(InstallationTest, InstalledProgramUsesTheInstalledParts) {
+/// An installation below a folder, as the build lays it out.
+class InstalledProgramTest : public testing::Test {
+ protected:
+  static std::string under(const std::string& start, const std::string& way) {
+    return (std::filesystem::path(start) / way).lexically_normal().string();
+  }
+
   const tests::TemporaryFolder folder;
-  // Half a build folder is none.
+  const std::string programs = folder.path("usr/bin");
+  const std::string code = under(programs, ZEB_CODE_FROM_PROGRAMS);
+  const std::string daemons = under(programs, ZEB_DAEMON_FROM_PROGRAMS);
+};
+
+TEST_F(InstalledProgramTest, ProgramsAndDaemonUseThePartsOfTheirInstallation) {
+  std::filesystem::create_directories(code + "/HelpPlugin.bundle");
+  folder.write("usr/bin/bvmake", "");
+  for (const std::string& program : {programs + "/zeb", daemons + "/zebd"}) {
+    const Installation installation = Installation::ofProgramAtPath(program);
+    EXPECT_EQ(installation.pluginBundlePath, code + "/HelpPlugin.bundle") << program;
+    EXPECT_EQ(installation.indexingToolPath, programs + "/bvmake") << program;
+  }
+}
+
+TEST_F(InstalledProgramTest, WithoutAToolBesideItTheUsualOneIsUsed) {
+  std::filesystem::create_directories(code + "/HelpPlugin.bundle");
+  EXPECT_EQ(Installation::ofProgramAtPath(programs + "/zeb").indexingToolPath, "");
+}
+
+TEST_F(InstalledProgramTest, HalfABuildFolderIsNone) {
   folder.write("plugin/HelpPlugin.bundle/Info.plist", "");
-  const Installation installation = Installation::ofProgramAtPath(folder.path("bin/zeb"));
-  EXPECT_EQ(installation.pluginBundlePath, folder.path("lib/zeb/HelpPlugin.bundle"));
+  const Installation installation = Installation::ofProgramAtPath(programs + "/zeb");
+  EXPECT_EQ(installation.pluginBundlePath, code + "/HelpPlugin.bundle")
+      << "where it should be, for whoever is told that it is not there";
   EXPECT_EQ(installation.indexingToolPath, "");
 }
 
