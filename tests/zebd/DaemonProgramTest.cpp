@@ -136,29 +136,6 @@ TEST_F(DaemonProgramTest, DaemonWithoutABusSaysSo) {
   EXPECT_THAT(contents(folder.path("log")), HasSubstr("there is no message bus"));
 }
 
-/// However a daemon ends, the next one serves, with nothing torn and nothing left lying about.
-TEST_F(DaemonProgramTest, DaemonThatIsKilledAtAnyMomentIsFollowedByOneThatServes) {
-  const char* asked = std::getenv("ZEB_KILLS");
-  const int kills = asked == nullptr ? 6 : std::atoi(asked);
-  std::mt19937 random(11);
-  for (int i = 0; i < kills; ++i) {
-    // Something to index, and to forget, in every round.
-    page("round" + std::to_string(i), "Round " + std::to_string(i), "In winter.");
-    fs::remove_all(folder.path("share/help/en/round" + std::to_string(i - 2)));
-    EXPECT_THAT(status(), HasSubstr("'process'"));
-    const pid_t process = daemonProcess();
-    ASSERT_GT(process, 0);
-    std::this_thread::sleep_for(std::chrono::milliseconds(random() % 400));
-    ASSERT_EQ(::kill(process, SIGKILL), 0);
-    EXPECT_TRUE(waitUntilGone(process));
-  }
-  const std::string books = kills == 1 ? "3" : "4";
-  EXPECT_TRUE(waitUntilIndexed(books)) << status();
-  EXPECT_THAT(gdbus({"org.zeb.Help1.StartSearch", "spring", "{}"}), StartsWith("(uint64 "));
-  EXPECT_TRUE(waitFor([this] { return temporaryFiles().empty(); }))
-      << testing::PrintToString(temporaryFiles());
-}
-
 class DaemonOptionsTest : public testing::Test {
  protected:
   std::optional<zebd::DaemonOptions> parse(const std::vector<std::string>& arguments) {
