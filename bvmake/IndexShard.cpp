@@ -31,8 +31,9 @@ searchkit::Document keywordDocument(PreparedPage prepared) {
 
 IndexShard::IndexShard(const Options& options, std::shared_ptr<const HelpTokenizer> tokenizer)
     : _options(options),
-      _keywords({options.minimumTermLength}),
-      _semanticData(std::move(tokenizer)) {}
+      _keywords(std::make_unique<searchkit::IndexWriter>(
+          searchkit::IndexWriterOptions{options.minimumTermLength})),
+      _semanticData(std::make_unique<LUXIndexWriter>(std::move(tokenizer))) {}
 
 AddedFile IndexShard::add(PreparedFile file) {
   AddedFile added;
@@ -47,7 +48,7 @@ AddedFile IndexShard::add(PreparedFile file) {
 }
 
 void IndexShard::_addPage(PreparedPage page, AddedFile& added) {
-  _semanticData.addDocument(semanticDocument(page));
+  _semanticData->addDocument(semanticDocument(page));
   if (page.page.excludedFromSearch) {
     // Its words are those of the book all the same, and say how the book uses them.
     ++added.leftOutCount;
@@ -61,12 +62,22 @@ void IndexShard::_addPage(PreparedPage page, AddedFile& added) {
   if (_options.anchors) {
     added.anchors.push_back({page.path, std::move(page.page.anchors)});
   }
-  _keywords.add(keywordDocument(std::move(page)));
+  _keywords->add(keywordDocument(std::move(page)));
 }
 
 void IndexShard::absorb(IndexShard& other) {
-  _keywords.absorb(other._keywords);
-  _semanticData.absorb(other._semanticData);
+  _keywords->absorb(*other._keywords);
+  _semanticData->absorb(*other._semanticData);
+}
+
+platform::Data IndexShard::finishKeywords() {
+  const std::unique_ptr<searchkit::IndexWriter> writer = std::move(_keywords);
+  return writer->finish();
+}
+
+platform::Data IndexShard::finishSemanticData(size_t threadCount) {
+  const std::unique_ptr<LUXIndexWriter> writer = std::move(_semanticData);
+  return writer->finish(threadCount);
 }
 
 }  // namespace bvmake

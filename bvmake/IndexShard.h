@@ -48,23 +48,21 @@ class IndexShard {
   AddedFile add(PreparedFile file);
 
   /// Ahead of absorb(), in a thread of its own.
-  void prepareToFinish() { _keywords.sortTerms(); }
+  void prepareToFinish() { _keywords->sortTerms(); }
 
   /// Takes over another shard's pages; that one is not used afterwards.
   void absorb(IndexShard& other);
 
-  /// May both be called once, side by side.
-  platform::Data finishKeywords() { return _keywords.finish(); }
-  platform::Data finishSemanticData(size_t threadCount) {
-    return _semanticData.finish(threadCount);
-  }
+  /// May both be called once, side by side. What the result was made from is gone then.
+  platform::Data finishKeywords();
+  platform::Data finishSemanticData(size_t threadCount);
 
  private:
   void _addPage(PreparedPage page, AddedFile& added);
 
   const Options _options;
-  searchkit::IndexWriter _keywords;
-  LUXIndexWriter _semanticData;
+  std::unique_ptr<searchkit::IndexWriter> _keywords;
+  std::unique_ptr<LUXIndexWriter> _semanticData;
 };
 
 }  // namespace bvmake

@@ -66,7 +66,8 @@ bool isRead(std::string_view name, std::string_view value) {
 class Walker {
  public:
   Walker(std::string& text, Markup markup, bool thins)
-      : _text(text), _markup(markup), _thins(thins) {}
+      // To the parser a form feed is no blank.
+      : _text(text), _markup(markup), _thins(thins && text.find('\f') == std::string::npos) {}
 
   std::optional<std::string> walk() {
     while (true) {
@@ -270,7 +271,8 @@ class Walker {
     if (!rawName.empty() && !closed) {
       const size_t content = _at + 1;
       _skipRawText(rawName);
-      if (_thins && _at < _text.size() && content < _at - 2) {
+      _thins = _thins && _endsAt(_at + rawName.size());
+      if (_thins && content < _at - 2) {
         _leaveOut(content, _at - 2);
       }
     }
@@ -292,6 +294,12 @@ class Walker {
            equalsIgnoringCase(name, "frameset") || equalsIgnoringCase(name, "noframes");
   }
 
+  /// Whether an end tag has no more than its end here.
+  bool _endsAt(size_t at) const {
+    const size_t close = _text.find_first_not_of(" \t\n\r", at);
+    return close != std::string::npos && _text[close] == '>';
+  }
+
   void _openMark(const OpenMark& mark) {
     if (_openMarks == _marks.size()) {
       _openMarks = 0;
@@ -305,9 +313,7 @@ class Walker {
       ++end;
     }
     const std::string_view name = std::string_view(_text).substr(_at + 2, end - _at - 2);
-    const size_t close = _text.find_first_not_of(" \t\n\f\r", end);
-    _thins = !name.empty() && isLetter(name.front()) && close != std::string::npos &&
-             _text[close] == '>';
+    _thins = !name.empty() && isLetter(name.front()) && _endsAt(end);
     if (_openMarks > 0 && end < _text.size() && _text[end] == '>' &&
         equalsIgnoringCase(name, textMarks[_marks[_openMarks - 1].mark])) {
       const OpenMark mark = _marks[--_openMarks];

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <filesystem>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string_view>
@@ -260,17 +261,23 @@ class Run {
       whole.absorb(*_shards[shard]);
       _shards[shard].reset();
     }
-    platform::Data halves[2];
-    OrderedWork<bool>::run(_options.appendLUXOnly ? 1 : 2, limits,
+    // Keywords first: one after the other, the semantic data need more memory while they are made.
+    std::vector<std::function<void()>> halves;
+    platform::Data keywords;
+    platform::Data semanticData;
+    if (!_options.appendLUXOnly) {
+      halves.emplace_back([&] { keywords = whole.finishKeywords(); });
+    }
+    halves.emplace_back([&] { semanticData = whole.finishSemanticData(_workerCount); });
+    OrderedWork<bool>::run(halves.size(), limits,
                            {free,
                             [&](size_t piece, size_t) {
-                              halves[piece] = piece == 0 ? whole.finishSemanticData(_workerCount)
-                                                         : whole.finishKeywords();
+                              halves[piece]();
                               return true;
                             },
                             {}});
     _shards.clear();
-    return {halves[1], halves[0]};
+    return {keywords, semanticData};
   }
 
   const CreateOptions& _options;

@@ -49,15 +49,17 @@ void forEachBlock(const Page& page, Sink sink) {
 
 }  // namespace
 
-LUXDocument semanticDocument(const PreparedPage& prepared) {
-  LUXDocument document;
-  document.key = prepared.path.substr(prepared.path.starts_with('/') ? 1 : 0);
+LUXDocumentView semanticDocument(const PreparedPage& prepared) {
+  LUXDocumentView document;
+  document.key = prepared.path;
+  document.key.remove_prefix(document.key.starts_with('/') ? 1 : 0);
   document.title = prepared.title;
   if (!prepared.abstract.empty()) {
     document.description = prepared.abstract;
   }
   document.excludedFromSearch = prepared.page.excludedFromSearch;
-  forEachBlock(prepared.page, [&](const std::string& block) { document.blocks.push_back(block); });
+  forEachBlock(prepared.page,
+               [&](const std::string& block) { document.blocks.emplace_back(block); });
   return document;
 }
 

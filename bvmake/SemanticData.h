@@ -13,8 +13,9 @@ class HelpTokenizer;
 
 namespace bvmake {
 
-/// A page as the semantic data take it: under its path without the slash in front.
-LUXDocument semanticDocument(const PreparedPage& page);
+/// A page as the semantic data take it: under its path without the slash in front. It stands in
+/// what is given.
+LUXDocumentView semanticDocument(const PreparedPage& page);
 
 /// Whether there is a language of this tag or name ("de", "German").
 bool isLanguage(std::string_view language);

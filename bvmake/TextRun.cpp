@@ -16,6 +16,8 @@ constexpr UChar32 byteOrderMark = 0xFEFF;
 
 bool isASCIIBlank(unsigned char byte) { return byte == ' ' || (byte >= 0x09 && byte <= 0x0D); }
 
+bool isVisibleASCII(char character) { return character > ' ' && character < 0x7F; }
+
 }  // namespace
 
 void TextRun::append(std::string_view text) {
@@ -40,10 +42,14 @@ void TextRun::append(std::string_view text) {
         continue;
       }
     } else {
-      while (end < text.size() && static_cast<unsigned char>(text[end]) < 0x80 &&
-             !isASCIIBlank(static_cast<unsigned char>(text[end]))) {
+      // As much as may be taken over as it stands: words with one blank between them.
+      while (end < text.size() &&
+             (isVisibleASCII(text[end]) ||
+              (text[end] == ' ' && end + 1 < text.size() && isVisibleASCII(text[end + 1])))) {
         ++end;
       }
+      // A control character, which belongs to the words.
+      end += end == at ? 1 : 0;
     }
     if (_blankPending) {
       _text += ' ';

@@ -358,6 +358,13 @@ class Segmenter {
     size_t ending = std::string_view::npos;
     CharacterClass last = CharacterClass::letter;
     while (at < _text.size()) {
+      // Most of most words.
+      if (const auto byte = static_cast<unsigned char>(_text[at]);
+          byte < 0x80 && isWordClass(asciiClasses[byte])) {
+        last = asciiClasses[byte];
+        ++at;
+        continue;
+      }
       const Character character = characterAt(_text, at);
       if (isWordClass(character.kind)) {
         last = character.kind;

@@ -285,12 +285,11 @@ struct LUXIndexWriter::Implementation {
     std::vector<uint32_t> stemOfSurface;
     // Where the numbers of each kind begin; and end.
     std::array<uint32_t, LUXTokenKindCount + 1> starts{};
-    platform::Data tokenBytes;
 
     uint32_t startOf(LUXTokenKind kind) const { return starts[static_cast<size_t>(kind)]; }
   };
 
-  void writeTokens(TokenData& data) const {
+  platform::Data tokenSection(const TokenData& data) const {
     LUXTokenSectionWriter writer;
     const auto addAll = [&](LUXTokenKind kind, const auto& texts, const Ranking& ranking) {
       for (const uint32_t number : ranking.order) {
@@ -317,7 +316,7 @@ struct LUXIndexWriter::Implementation {
     addAll(LUXTokenKind::form, forms, data.forms);
     addAll(LUXTokenKind::phrase, data.phraseNames, data.phrases);
     addAll(LUXTokenKind::title, data.titleNames, data.titles);
-    data.tokenBytes = writer.finish();
+    return writer.finish();
   }
 
   void findTokens(const LUXPhraseFinder& finder, TokenData& data) const {
@@ -346,7 +345,7 @@ struct LUXIndexWriter::Implementation {
     }
   }
 
-  LUXTokenSections pageSections(const LUXPhraseFinder& finder, const TokenData& data) {
+  LUXTokenSections pageSections(LUXPhraseFinder& finder, const TokenData& data) {
     const std::vector<uint32_t> formOfSurface = formsOfSurfaces();
     // Each piece's pages are one part, so that they can be put in order.
     std::vector<std::unique_ptr<LUXTokenSections>> parts((pages.size() + pagesAtOnce - 1) /
@@ -369,6 +368,9 @@ struct LUXIndexWriter::Implementation {
                            data.titles.rank[data.titleOfPage[number]]);
         }
         part->endPage();
+        // What is written takes the place of what it was made from.
+        std::vector<LUXWordSequence::Word>().swap(pages[number].sequence.words);
+        finder.forgetPage(number);
       }
       parts[from / pagesAtOnce] = std::move(part);
     });
@@ -391,20 +393,25 @@ struct LUXIndexWriter::Implementation {
                                       std::min<size_t>(at - titleLength, LUXTokenCount::farDown)));
       }
     };
-    const uint32_t formStart = data.startOf(LUXTokenKind::form);
     for (size_t at = 0; at < page.sequence.words.size(); ++at) {
-      const uint32_t surface = page.sequence.words[at].number();
-      add(formStart + data.forms.rank[surfaces[surface].form], at);
-      if (data.stemOfSurface[surface] != none) {
-        add(data.stemOfSurface[surface], at);
+      const uint32_t stem = data.stemOfSurface[page.sequence.words[at].number()];
+      if (stem != none) {
+        add(stem, at);
       }
     }
+    sections.endKind();
     const uint32_t bigramStart = data.startOf(LUXTokenKind::bigram);
     data.bigrams.forEachOfPage(number, page.sequence, data.stemOfSurface,
                                [&](uint32_t bigram, size_t at) { add(bigramStart + bigram, at); });
+    sections.endKind();
+    const uint32_t formStart = data.startOf(LUXTokenKind::form);
+    for (size_t at = 0; at < page.sequence.words.size(); ++at) {
+      add(formStart + data.forms.rank[surfaces[page.sequence.words[at].number()].form], at);
+    }
     for (const Whole& whole : page.wholes) {
       add(formStart + data.forms.rank[whole.form], whole.place);
     }
+    sections.endKind();
   }
 
   platform::Data attributes(const LUXPhraseFinder& finder) const {
@@ -443,19 +450,25 @@ struct LUXIndexWriter::Implementation {
   platform::Data finish() {
     std::sort(pages.begin(), pages.end(),
               [](const Page& a, const Page& b) { return a.key < b.key; });
-    LUXPhraseFinder finder;
-    finder.find(sequences(), formsOfSurfaces(), edgeForms(), threadCount);
-    TokenData data;
-    findTokens(finder, data);
-    writeTokens(data);
-    LUXTokenSections sections = pageSections(finder, data);
+    platform::Data attributeBytes;
+    platform::Data tokenBytes;
+    std::optional<LUXTokenSections> sections;
+    {
+      LUXPhraseFinder finder;
+      finder.find(sequences(), formsOfSurfaces(), edgeForms(), threadCount);
+      attributeBytes = attributes(finder);
+      TokenData data;
+      findTokens(finder, data);
+      tokenBytes = tokenSection(data);
+      sections.emplace(pageSections(finder, data));
+    }
     return LUXSectionedData(
-               {section(HelpLUXIndex::attributesSectionType, attributes(finder)),
-                section(HelpLUXIndex::countsSectionType, sections.countBytes()),
+               {section(HelpLUXIndex::attributesSectionType, std::move(attributeBytes)),
+                section(HelpLUXIndex::countsSectionType, sections->countBytes()),
                 section(HelpLUXIndex::keysSectionType, keyRecords().finish()),
                 section(HelpLUXIndex::propertiesSectionType, propertyRecords().finish()),
-                section(HelpLUXIndex::tokensSectionType, data.tokenBytes),
-                section(HelpLUXIndex::placesSectionType, sections.placeBytes())})
+                section(HelpLUXIndex::tokensSectionType, std::move(tokenBytes)),
+                section(HelpLUXIndex::placesSectionType, sections->placeBytes())})
         .write();
   }
 };
@@ -468,17 +481,29 @@ LUXIndexWriter::LUXIndexWriter(std::shared_ptr<const HelpTokenizer> tokenizer)
 LUXIndexWriter::~LUXIndexWriter() = default;
 
 void LUXIndexWriter::addDocument(const LUXDocument& document) {
-  if (!_implementation->keys.insert(document.key).second) {
+  addDocument(LUXDocumentView{document.key,
+                              document.title,
+                              document.description,
+                              document.excludedFromSearch,
+                              {document.blocks.begin(), document.blocks.end()}});
+}
+
+void LUXIndexWriter::addDocument(const LUXDocumentView& document) {
+  Page page{std::string(document.key),
+            std::string(document.title),
+            std::optional<std::string>(document.description),
+            document.excludedFromSearch,
+            {},
+            {}};
+  if (!_implementation->keys.insert(page.key).second) {
     throw platform::Exception(platform::invalidArgumentException,
-                              "the page " + document.key + " comes twice");
+                              "the page " + page.key + " comes twice");
   }
-  Page page{
-      document.key, document.title, document.description, document.excludedFromSearch, {}, {}};
   std::vector<LUXWordSequence::Word>& words = _implementation->words;
   words.clear();
   _implementation->addText(document.title, page);
   page.sequence.titleLength = words.size();
-  for (const std::string& block : document.blocks) {
+  for (const std::string_view block : document.blocks) {
     _implementation->addText(block, page);
   }
   page.sequence.words.assign(words.begin(), words.end());

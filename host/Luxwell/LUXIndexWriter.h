@@ -5,6 +5,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "platform/Data.h"
@@ -25,6 +26,15 @@ struct LUXDocument {
   std::vector<std::string> blocks;
 };
 
+/// The same where it stands.
+struct LUXDocumentView {
+  std::string_view key;
+  std::string_view title;
+  std::optional<std::string_view> description;
+  bool excludedFromSearch = false;
+  std::vector<std::string_view> blocks;
+};
+
 /// Collects pages and writes the data that HelpLUXIndex reads, the same bytes for the same pages in
 /// whatever order they are added. Thread-safety: confined to one thread.
 class LUXIndexWriter {
@@ -37,6 +47,7 @@ class LUXIndexWriter {
 
   /// Throws platform::Exception "InvalidArgumentException" for a key that was added before.
   void addDocument(const LUXDocument& document);
+  void addDocument(const LUXDocumentView& document);
 
   /// Takes over the documents of a writer of the same language, which is not used afterwards: so
   /// several threads can fill a writer each, and the bytes are the same as from one. Throws

@@ -14,24 +14,28 @@ constexpr size_t smallestTable = 64;
 
 bool isFull(size_t used, size_t slots) noexcept { return used + 1 > slots / 4 * 3; }
 
-// Eight bytes a step: most words are one or two.
-uint32_t hashOf(std::string_view string) noexcept {
-  constexpr uint64_t factor = 0x9E3779B97F4A7C15ULL;
-  uint64_t hash = string.size() * factor;
-  const char* at = string.data();
-  size_t left = string.size();
-  for (; left >= 8; at += 8, left -= 8) {
-    uint64_t word = 0;
-    std::memcpy(&word, at, 8);
-    hash = (hash ^ word) * factor;
-    hash ^= hash >> 32U;
-  }
+constexpr uint64_t factor = 0x9E3779B97F4A7C15ULL;
+
+// Up to eight bytes, those of the same string always as the same number.
+uint64_t wordOf(const char* bytes, size_t length) noexcept {
   uint64_t word = 0;
-  for (size_t i = 0; i < left; ++i) {
-    word |= static_cast<uint64_t>(static_cast<uint8_t>(at[i])) << (8 * i);
+  if (length >= 4) {
+    // The two may overlap.
+    uint32_t first = 0;
+    uint32_t last = 0;
+    std::memcpy(&first, bytes, 4);
+    std::memcpy(&last, bytes + length - 4, 4);
+    return static_cast<uint64_t>(last) << 32U | first;
   }
-  hash = (hash ^ word) * factor;
-  return static_cast<uint32_t>(hash >> 32U);
+  for (size_t i = 0; i < length; ++i) {
+    word = word << 8U | static_cast<uint8_t>(bytes[i]);
+  }
+  return word;
+}
+
+size_t hashOf(uint64_t bytes, uint32_t length) noexcept {
+  const uint64_t hash = (bytes ^ length) * factor;
+  return static_cast<size_t>(hash ^ hash >> 32U);
 }
 
 uint64_t hashOf(LUXPairNumbering::Pair pair) noexcept {
@@ -51,32 +55,46 @@ std::string_view LUXStringNumbering::operator[](size_t number) const noexcept {
   return std::string_view(_text).substr(from, _ends[number] - from);
 }
 
-size_t LUXStringNumbering::_slotOf(std::string_view string, uint32_t hash) const noexcept {
+LUXStringNumbering::Key LUXStringNumbering::_keyOf(std::string_view string) noexcept {
+  uint64_t bytes = 0;
+  const char* at = string.data();
+  size_t left = string.size();
+  for (; left > 8; at += 8, left -= 8) {
+    bytes = (bytes ^ wordOf(at, 8)) * factor;
+    bytes ^= bytes >> 32U;
+  }
+  bytes ^= wordOf(at, left);
+  // Sizes that do not fit are those of strings that do not, either.
+  return {bytes, static_cast<uint32_t>(string.size())};
+}
+
+size_t LUXStringNumbering::_slotOf(std::string_view string, const Key& key) const noexcept {
   const size_t mask = _slots.size() - 1;
-  size_t slot = hash & mask;
-  while (_slots[slot].number != none &&
-         (_slots[slot].hash != hash || (*this)[_slots[slot].number] != string)) {
+  size_t slot = hashOf(key.bytes, key.length) & mask;
+  while (
+      _slots[slot].number != none &&
+      (_slots[slot].key != key || (string.size() > 8 && (*this)[_slots[slot].number] != string))) {
     slot = (slot + 1) & mask;
   }
   return slot;
 }
 
 uint32_t LUXStringNumbering::find(std::string_view string) const noexcept {
-  return _slots.empty() ? none : _slots[_slotOf(string, hashOf(string))].number;
+  return _slots.empty() ? none : _slots[_slotOf(string, _keyOf(string))].number;
 }
 
 uint32_t LUXStringNumbering::numberOf(std::string_view string) {
   if (isFull(_ends.size(), _slots.size())) {
     _grow();
   }
-  const uint32_t hash = hashOf(string);
-  Slot& slot = _slots[_slotOf(string, hash)];
+  const Key key = _keyOf(string);
+  Slot& slot = _slots[_slotOf(string, key)];
   if (slot.number == none) {
     if (_text.size() + string.size() > std::numeric_limits<uint32_t>::max() ||
         _ends.size() + 2 >= none) {
       throwTooMany();
     }
-    slot = {hash, static_cast<uint32_t>(_ends.size())};
+    slot = {key, static_cast<uint32_t>(_ends.size())};
     _text += string;
     _ends.push_back(static_cast<uint32_t>(_text.size()));
   }
@@ -91,7 +109,7 @@ void LUXStringNumbering::_grow() {
     if (moved.number == none) {
       continue;
     }
-    size_t slot = moved.hash & mask;
+    size_t slot = hashOf(moved.key.bytes, moved.key.length) & mask;
     while (_slots[slot].number != none) {
       slot = (slot + 1) & mask;
     }

@@ -24,13 +24,21 @@ class LUXStringNumbering {
   std::string_view operator[](size_t number) const noexcept;
 
  private:
-  /// The hash stands beside the number, so that looking for a string reads no other string.
+  /// What stands beside the number tells strings of up to eight bytes apart, so that looking for
+  /// one of these, as most words are, reads no string.
+  struct Key {
+    /// The bytes of a string that has up to eight, else their hash.
+    uint64_t bytes = 0;
+    uint32_t length = 0;
+    friend bool operator==(const Key&, const Key&) = default;
+  };
   struct Slot {
-    uint32_t hash = 0;
+    Key key;
     uint32_t number = none;
   };
 
-  size_t _slotOf(std::string_view string, uint32_t hash) const noexcept;
+  static Key _keyOf(std::string_view string) noexcept;
+  size_t _slotOf(std::string_view string, const Key& key) const noexcept;
   void _grow();
 
   std::string _text;

@@ -192,15 +192,19 @@ void LUXPhraseFinder::_findPart(const Pages& pages, uint32_t part, std::vector<G
         pairs[count++] = pair;
       }
     }
-    for (const Pair& pair : pairs.first(count)) {
+    for (Pair& pair : pairs.first(count)) {
       const auto [number, isNew] = numbers.numberOf(pair.first, pair.second);
       if (isNew) {
         groups.emplace_back();
         groups.back().first = pair.first;
         groups.back().second = pair.second;
       }
-      groups[number].count(pair.page, pair.inTitle);
+      __builtin_prefetch(&groups[number], 1);
+      pair.first = number;
       _nextPositions[pair.at] = number << _partBits | part;
+    }
+    for (const Pair& pair : pairs.first(count)) {
+      groups[pair.first].count(pair.page, pair.inTitle);
     }
   });
 }

@@ -56,6 +56,10 @@ class LUXPhraseFinder {
     }
   }
 
+  /// Gives back what is kept of a page, which has no phrases from then on. Different pages may be
+  /// forgotten, and asked for phrases, by different threads at once.
+  void forgetPage(size_t page) { std::vector<Occurrence>().swap(_longer[page]); }
+
  private:
   static constexpr uint32_t none = 0xFFFFFFFF;
 

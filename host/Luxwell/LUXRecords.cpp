@@ -65,5 +65,6 @@ platform::Data LUXRecordsWriter::finish() {
   }
   appendUInt32(out, static_cast<uint32_t>(_bytes.size()));
   out += _bytes;
+  std::string().swap(_bytes);
   return platform::Data::adopt(std::move(out));
 }

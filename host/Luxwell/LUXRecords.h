@@ -39,6 +39,9 @@ class LUXRecordsWriter {
     return _bytes;
   }
 
+  /// As beginRecord() gave it last.
+  std::string& record() noexcept { return _bytes; }
+
   /// Adds the records of another writer, which is empty afterwards.
   void append(LUXRecordsWriter& other);
 

@@ -34,7 +34,7 @@ void LUXTokenSections::append(LUXTokenSections& pages) {
 }
 
 // In order of tokens; in which order a token's occurrences are makes no difference.
-void LUXTokenSections::_sortPage() {
+void LUXTokenSections::_sort() {
   if (_page.size() < fewestForDigits) {
     std::sort(_page.begin(), _page.end());
     return;
@@ -56,13 +56,12 @@ void LUXTokenSections::_sortPage() {
   }
 }
 
-void LUXTokenSections::endPage() {
-  _sortPage();
-  _bytes.resize(std::max(_bytes.size(), _page.size() * 3 * longestVarnumber));
-  _placeBytes.resize(std::max(_placeBytes.size(), _page.size()));
-  char* out = _bytes.data();
-  char* place = _placeBytes.data();
-  uint32_t next = 0;
+void LUXTokenSections::endKind() {
+  _sort();
+  std::string& records = _inPage ? _records.record() : _records.beginRecord();
+  std::string& places = _inPage ? _places.record() : _places.beginRecord();
+  _inPage = true;
+  std::array<char, 3 * longestVarnumber> bytes;
   for (auto at = _page.begin(); at != _page.end();) {
     const uint64_t token = *at >> shift;
     uint32_t titleCount = 0;
@@ -75,17 +74,22 @@ void LUXTokenSections::endPage() {
       wordsBefore = std::min(wordsBefore, static_cast<uint8_t>(*at));
     }
     const bool isPlain = titleCount == 0 && bodyCount == 1;
-    out = writeVarnumber(out, (token - next) << 1U | (isPlain ? 0U : 1U));
+    char* out = writeVarnumber(bytes.data(), (token - _next) << 1U | (isPlain ? 0U : 1U));
     if (!isPlain) {
       out = writeVarnumber(out, titleCount);
       out = writeVarnumber(out, bodyCount);
     }
+    records.append(bytes.data(), out);
     if (token < _firstWithoutPlace) {
-      *place++ = static_cast<char>(wordsBefore);
+      places.push_back(static_cast<char>(wordsBefore));
     }
-    next = static_cast<uint32_t>(token) + 1;
+    _next = static_cast<uint32_t>(token) + 1;
   }
-  _records.beginRecord().append(_bytes.data(), out);
-  _places.beginRecord().append(_placeBytes.data(), place);
   _page.clear();
+}
+
+void LUXTokenSections::endPage() {
+  endKind();
+  _inPage = false;
+  _next = 0;
 }

@@ -25,6 +25,10 @@ class LUXTokenSections {
     _page.push_back(static_cast<uint64_t>(token) << shift | wordsBefore);
   }
 
+  /// Writes what has been added since the last time; what is added from now on to this page has
+  /// greater numbers. Without need, but a large page takes less memory in pieces.
+  void endKind();
+
   /// Writes the page to which has been added; the next one begins.
   void endPage();
 
@@ -40,14 +44,16 @@ class LUXTokenSections {
   static constexpr unsigned shift = 9;
   static constexpr uint64_t title = 0x100;
 
-  void _sortPage();
+  void _sort();
 
   const unsigned _tokenBits;
   const uint32_t _firstWithoutPlace;
+  /// What has been added since the last time.
   std::vector<uint64_t> _page;
   std::vector<uint64_t> _sorted;
-  std::vector<char> _bytes;
-  std::vector<char> _placeBytes;
+  bool _inPage = false;
+  /// The least number that the page's next token may have.
+  uint32_t _next = 0;
   LUXRecordsWriter _records;
   LUXRecordsWriter _places;
 };
