@@ -203,7 +203,7 @@ bool WordSearch::_readOneList(const Step& step, WorkBudget& budget, SearchScratc
 }
 
 // The next slice of the list; the hits so far are in the accumulator. Every page is written, and
-// only kept when it is one of them: no branch that could not be predicted.
+// only kept when it is one of them: no branch that could not be predicted. What is kept is scored.
 size_t WordSearch::_look(SearchScratch& scratch) {
   PostingsCursor at = _cursor;
   size_t left = postingsPerSlice;
@@ -211,11 +211,14 @@ size_t WordSearch::_look(SearchScratch& scratch) {
   Hit* const others = scratch.others.data();
   while (left > 0 && (_isInList = at.next())) {
     --left;
-    const uint32_t document = at.document();
-    const float score = scratch.found.frequency(document);
-    others[kept] = {document, score + _scorer.score(_idf, _factor * static_cast<float>(at.weight()),
-                                                    _view.documentLength(document))};
-    kept += score > 0 ? 1 : 0;
+    others[kept] = {at.document(), static_cast<float>(at.weight())};
+    kept += scratch.found.frequency(at.document()) > 0 ? 1 : 0;
+  }
+  for (size_t i = _keptAt; i < kept; ++i) {
+    const uint32_t document = others[i].document;
+    others[i].score =
+        scratch.found.frequency(document) +
+        _scorer.score(_idf, _factor * others[i].score, _view.documentLength(document));
   }
   _cursor = at;
   _keptAt = kept;

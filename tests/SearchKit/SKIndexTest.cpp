@@ -305,7 +305,7 @@ SKIndexRef indexOfVersion(int version) {
   const std::string path = std::string(ZEB_SOURCE_DIR) + "/tests/SearchKit/indexes/version-" +
                            std::to_string(version) + ".skindex";
   const auto data = platform::systemFileManager()->contentsAtPath(path);
-  const SKIndexRef index = data ? SKIndexOpenWithData(*data) : nullptr;
+  SKIndexRef index = data ? SKIndexOpenWithData(*data) : nullptr;
   EXPECT_TRUE(SKIndexVerifyChecksums(index));
   return index;
 }
