@@ -66,13 +66,13 @@ class Session {
   ExitCode operator()(const IndexCommand& command);
   ExitCode operator()(const ScanCommand& command) {
     // What lies elsewhere is not the daemon's.
-    if (auto daemon = command.root == "/" ? _connectToDaemon() : nullptr) {
+    if (auto daemon = command.root == "/" ? _startDaemon() : nullptr) {
       return scanWithDaemon(command, std::move(daemon), _waiting, _console);
     }
     return scan(command, _catalogue, _installation, _waiting, _console, _verbosity);
   }
   ExitCode operator()(const AddCommand& command) {
-    if (auto daemon = _connectToDaemon()) {
+    if (auto daemon = _startDaemon()) {
       return addBooksWithDaemon(command, std::move(daemon), _waiting, _console);
     }
     return addBooks(command, _catalogue, _installation, _waiting, _console);
@@ -97,6 +97,7 @@ class Session {
   std::unique_ptr<DaemonClient> _connectToDaemon() const {
     return _usesDaemon ? DaemonClient::connect() : nullptr;
   }
+  std::unique_ptr<DaemonClient> _startDaemon() const;
   std::unique_ptr<DaemonClient> _daemon() const;
   bool _knowsBooks(const std::vector<CatalogueEntry>& entries,
                    const std::vector<std::string>& bookIDs);
@@ -178,9 +179,22 @@ std::optional<bool> Session::_show(const std::string& asked, const std::optional
   return !answer->pages.empty();
 }
 
-/// The daemon, if it is to be asked and there is one.
-std::unique_ptr<DaemonClient> Session::_daemon() const {
+/// The daemon, if it is to be asked and can be had: one that is installed but does not start is
+/// none.
+std::unique_ptr<DaemonClient> Session::_startDaemon() const {
   auto daemon = _connectToDaemon();
+  if (daemon != nullptr) {
+    if (daemon->start()) {
+      _console.note("the help daemon cannot be started; 'zeb doctor' says more");
+      return nullptr;
+    }
+  }
+  return daemon;
+}
+
+/// The daemon, with books.
+std::unique_ptr<DaemonClient> Session::_daemon() const {
+  auto daemon = _startDaemon();
   if (daemon != nullptr && _catalogue.entries().empty()) {
     // It has just begun, and looks for books anyway.
     _console.progress("looking for books");
@@ -368,7 +382,7 @@ ExitCode Session::operator()(const IndexCommand& command) {
   if (!_hasIdentifierForEach(command.folders, command.bookIDs)) {
     return ExitCode::usage;
   }
-  if (auto daemon = _connectToDaemon()) {
+  if (auto daemon = _startDaemon()) {
     return indexWithDaemon(command, std::move(daemon), _waiting, _console);
   }
   bool succeeded = true;
@@ -391,7 +405,7 @@ ExitCode Session::operator()(const IndexCommand& command) {
 
 ExitCode Session::operator()(RemoveCommand command) {
   ExitCode code = ExitCode::success;
-  if (const auto daemon = _connectToDaemon()) {
+  if (const auto daemon = _startDaemon()) {
     code = removeRemoteBooksWithDaemon(command, _catalogue, *daemon, _waiting, _console);
   }
   const ExitCode rest = command.names.empty()

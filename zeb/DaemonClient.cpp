@@ -298,6 +298,19 @@ bool DaemonClient::isBusy() const {
   return now && (now->isScanning || now->guardCount > 0);
 }
 
+std::optional<std::string> DaemonClient::start() {
+  try {
+    uint32_t how = 0;
+    _implementation->bus->callMethod("StartServiceByName")
+        .onInterface(busName)
+        .withArguments(zebd::ZEBBusName, uint32_t{0})
+        .storeResultsTo(how);
+    return std::nullopt;
+  } catch (const sdbus::Error& error) {
+    return error.getMessage();
+  }
+}
+
 bool DaemonClient::isRunning() const {
   bool isThere = false;
   try {

@@ -51,6 +51,8 @@ class DaemonClient : public SearchProvider {
   std::optional<DaemonStatus> status() const;
   /// Whether books are being looked for, indexed or downloaded, or models built.
   bool isBusy() const;
+  /// Has the bus start the daemon where none runs. Returns why it cannot; absent when one is there.
+  std::optional<std::string> start();
   /// Whether there is a daemon now; asking does not start one.
   bool isRunning() const;
   /// Grows with every change of a book's index, and when daemons come and go.

@@ -140,10 +140,11 @@ std::optional<DaemonOptions> parseDaemonOptions(const std::vector<std::string>& 
                                                 int& exitCode) {
   DaemonOptions options;
   CLI::App app{"Serves searches in the help books of this computer on the session bus.", "zebd"};
-  app.add_option("--idle", options.idleDelay, "Leave after so many seconds without work")
-      ->check(CLI::Range(0.1, 1e9))
-      ->capture_default_str();
-  app.add_option("--cache-dir", options.cacheFolder, "Folder for indexes and the list of books");
+  app.add_option("--idle", options.idleDelay, "Leave after this long without work (60)")
+      ->check(CLI::Range(0.1, 1e9).description(""))
+      ->option_text("SECONDS");
+  app.add_option("--cache-dir", options.cacheFolder, "Folder for indexes and the list of books")
+      ->option_text("DIR");
   app.add_flag("-v,--verbose", options.verbosity, "Log more; may be repeated");
   app.set_version_flag("--version", std::string("zebd ") + ZEB_VERSION);
   try {

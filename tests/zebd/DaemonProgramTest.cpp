@@ -96,6 +96,22 @@ TEST_F(DaemonProgramTest, DoctorAsksTheDaemonAndFindsNothingWrongWithWhatItHasMa
   EXPECT_THAT(contents(output), AllOf(HasSubstr("\"books\": 2"), HasSubstr("\"running\"")));
 }
 
+TEST_F(DaemonProgramTest, CommandLineDoesWithoutADaemonThatTheBusCannotStart) {
+  folder.write("broken/org.zeb.zebd.service",
+               "[D-BUS Service]\nName=org.zeb.zebd\nExec=" + folder.path("no daemon") + "\n");
+  const tests::PrivateBus other("<servicedir>" + folder.path("broken") + "</servicedir>");
+  const Variable address("DBUS_SESSION_BUS_ADDRESS", other.address());
+  const std::string output = folder.path("zeb output");
+  tests::ChildProcess scan(ZEB_PROGRAM, {"scan"}, output);
+  EXPECT_EQ(scan.wait(), 0) << contents(output);
+  EXPECT_THAT(contents(output), HasSubstr("the help daemon cannot be started"));
+  tests::ChildProcess search(ZEB_PROGRAM, {"search", "spring"}, output);
+  EXPECT_EQ(search.wait(), 0) << contents(output);
+  tests::ChildProcess doctor(ZEB_PROGRAM, {"doctor", "--json"}, output);
+  EXPECT_EQ(doctor.wait(), 1);
+  EXPECT_THAT(contents(output), HasSubstr("\"finding\": \"daemon\""));
+}
+
 TEST_F(DaemonProgramTest, CommandLineDoesWithoutTheDaemonWhereItIsToldTo) {
   const Variable address("DBUS_SESSION_BUS_ADDRESS", bus.address());
   const std::string output = folder.path("zeb output");
