@@ -20,6 +20,18 @@ ByteRange nextRange(uint64_t begin, uint32_t length, size_t sectionLength) noexc
 std::string_view firstTerm(const IndexView& view, uint32_t block) noexcept {
   const std::span<const uint8_t> dictionary = view.section(Section::dictionary);
   const size_t at = view.blockOffset(block, format::blockDictionaryAt);
+  if (view.hasBlocksOfFields()) {
+    DictionaryBlock fields;
+    size_t shared = 0;
+    size_t added = 0;
+    if (!fields.read(dictionary, at, view.entriesInBlock(block))) {
+      return {};
+    }
+    const uint8_t* text = fields.texts();
+    return fields.readHead(0, text, shared, added)
+               ? std::string_view(reinterpret_cast<const char*>(text), added)
+               : std::string_view();
+  }
   if (at + 2 > dictionary.size() || dictionary.size() - at - 2 < dictionary[at + 1]) {
     return {};
   }
@@ -83,7 +95,14 @@ bool DictionaryCursor::_enterBlock(uint32_t block) noexcept {
   _end = dictionary.data() + dictionary.size();
   _block = block;
   _entry = 0;
-  _entriesInBlock = std::min<uint32_t>(_termsPerBlock, _view->termCount() - block * _termsPerBlock);
+  _entriesInBlock = _view->entriesInBlock(block);
+  if (_view->hasBlocksOfFields()) {
+    if (!_fields.read(dictionary, begin, _entriesInBlock)) {
+      return _fail();
+    }
+    _at = _fields.texts();
+    _longPositions = _fields.longPositions();
+  }
   _termLength = 0;
   const uint64_t postings = _view->blockOffset(block, format::blockPostingsAt);
   const uint64_t positions = _view->blockOffset(block, format::blockPositionsAt);
@@ -93,29 +112,43 @@ bool DictionaryCursor::_enterBlock(uint32_t block) noexcept {
 }
 
 bool DictionaryCursor::_readEntry() noexcept {
-  if (_end - _at < 2) {
-    return _fail();
-  }
-  const size_t shared = _at[0];
-  const size_t added = _at[1];
-  _at += 2;
-  if (shared > _termLength || shared + added > format::maximumTermBytes ||
-      static_cast<size_t>(_end - _at) < added) {
-    return _fail();
-  }
-  std::memcpy(_term + shared, _at, added);
-  _at += added;
-  _termLength = shared + added;
-  uint32_t postingsLength;
-  uint32_t positionsLength;
-  if (!format::readNumber(_at, _end, postingsLength) ||
-      !format::readNumber(_at, _end, positionsLength)) {
-    return _fail();
+  size_t shared = 0;
+  size_t added = 0;
+  uint32_t postingsLength = 0;
+  uint32_t positionsLength = 0;
+  if (_view->hasBlocksOfFields()) {
+    if (!_fields.readHead(_entry, _at, shared, added) || !_readText(shared, added) ||
+        !_fields.readPositionsLength(_entry, _longPositions, positionsLength)) {
+      return _fail();
+    }
+    postingsLength = _fields.postingsLength(_entry);
+  } else {
+    if (_end - _at < 2) {
+      return _fail();
+    }
+    shared = _at[0];
+    added = _at[1];
+    _at += 2;
+    if (!_readText(shared, added) || !format::readNumber(_at, _end, postingsLength) ||
+        !format::readNumber(_at, _end, positionsLength)) {
+      return _fail();
+    }
   }
   _postings = nextRange(_postings.end, postingsLength, _view->section(Section::postings).size());
   _positions =
       nextRange(_positions.end, positionsLength, _view->section(Section::positions).size());
   _isValid = true;
+  return true;
+}
+
+bool DictionaryCursor::_readText(size_t shared, size_t added) noexcept {
+  if (shared > _termLength || shared + added > format::maximumTermBytes ||
+      static_cast<size_t>(_end - _at) < added) {
+    return false;
+  }
+  std::memcpy(_term + shared, _at, added);
+  _at += added;
+  _termLength = shared + added;
   return true;
 }
 

@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <string_view>
 
+#include "SearchKit/DictionaryBlock.h"
 #include "SearchKit/IndexFormat.h"
 
 namespace searchkit {
@@ -46,6 +47,7 @@ class DictionaryCursor {
   uint32_t _blockForTerm(std::string_view term) const noexcept;
   bool _enterBlock(uint32_t block) noexcept;
   bool _readEntry() noexcept;
+  bool _readText(size_t shared, size_t added) noexcept;
   bool _fail() noexcept {
     _isValid = false;
     return false;
@@ -54,6 +56,9 @@ class DictionaryCursor {
   const IndexView* _view;
   const uint8_t* _at = nullptr;
   const uint8_t* _end = nullptr;
+  // Of the current block, but for the first two versions.
+  DictionaryBlock _fields;
+  const uint8_t* _longPositions = nullptr;
   uint32_t _block = 0;
   uint32_t _entry = 0;
   uint32_t _termsPerBlock = 0;

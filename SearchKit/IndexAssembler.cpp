@@ -111,16 +111,64 @@ void IndexAssembler::addTerm(std::string_view term, std::span<const Posting> pos
   const auto shared = static_cast<size_t>(
       std::mismatch(term.begin(), term.end(), _previousTerm.begin(), _previousTerm.end()).first -
       term.begin());
-  std::vector<uint8_t>& dictionary = _section(Section::dictionary);
-  dictionary.push_back(static_cast<uint8_t>(shared));
-  dictionary.push_back(static_cast<uint8_t>(term.size() - shared));
-  append(dictionary, term.substr(shared));
-  appendNumber(dictionary, checkedLength(lists.size() - listBegin));
-  appendNumber(dictionary, checkedLength(positions.size() - positionsBegin));
+  const size_t added = term.size() - shared;
+  const auto shownShared = static_cast<uint32_t>(std::min<size_t>(shared, format::headMask));
+  const auto shownAdded = static_cast<uint32_t>(std::min<size_t>(added, format::headMask));
+  _heads[_entryCount] = static_cast<uint8_t>(shownAdded << format::headBits | shownShared);
+  if (shownShared == format::headMask) {
+    _texts.push_back(static_cast<uint8_t>(shared));
+  }
+  if (shownAdded == format::headMask) {
+    _texts.push_back(static_cast<uint8_t>(added));
+  }
+  append(_texts, term.substr(shared));
+  _postingsLengths[_entryCount] = checkedLength(lists.size() - listBegin);
+  _positionsLengths[_entryCount] = checkedLength(positions.size() - positionsBegin);
+  if (++_entryCount == format::termsPerBlock) {
+    _endBlock();
+  }
   _previousTerm = term;
 }
 
+// What was gathered of the block's entries, field by field.
+void IndexAssembler::_endBlock() {
+  if (_entryCount == 0) {
+    return;
+  }
+  std::vector<uint8_t>& dictionary = _section(Section::dictionary);
+  const std::span<const uint32_t> postings(_postingsLengths, _entryCount);
+  const std::span<const uint32_t> positions(_positionsLengths, _entryCount);
+  const uint32_t longest = *std::max_element(postings.begin(), postings.end());
+  const uint32_t power = longest <= UINT8_MAX ? 0 : longest <= UINT16_MAX ? 1 : 2;
+  std::vector<uint8_t> longPositions;
+  for (const uint32_t length : positions) {
+    if (length >= format::longPositionsFollow) {
+      appendNumber(longPositions, length);
+    }
+  }
+  if (longPositions.empty()) {
+    append(dictionary, static_cast<uint8_t>(power));
+  } else {
+    append(dictionary, static_cast<uint8_t>(power | format::hasLongPositions));
+    appendNumber(dictionary, static_cast<uint32_t>(longPositions.size()));
+  }
+  dictionary.insert(dictionary.end(), _heads, _heads + _entryCount);
+  for (const uint32_t length : postings) {
+    uint8_t bytes[sizeof length];
+    format::store(bytes, length);
+    dictionary.insert(dictionary.end(), bytes, bytes + (size_t{1} << power));
+  }
+  for (const uint32_t length : positions) {
+    append(dictionary, static_cast<uint8_t>(std::min(length, format::longPositionsFollow)));
+  }
+  dictionary.insert(dictionary.end(), longPositions.begin(), longPositions.end());
+  dictionary.insert(dictionary.end(), _texts.begin(), _texts.end());
+  _texts.clear();
+  _entryCount = 0;
+}
+
 platform::Data IndexAssembler::finish() {
+  _endBlock();
   _section(Section::mergedLists) = _mergedLists.finish();
   std::vector<Section> there;
   std::copy_if(std::begin(order), std::end(order), std::back_inserter(there),

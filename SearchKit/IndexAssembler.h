@@ -57,12 +57,19 @@ class IndexAssembler {
   }
   uint32_t _offset(format::Section id);
   void _beginBlock(std::string_view term);
+  void _endBlock();
 
   uint32_t _minimumTermLength;
   uint32_t _documentCount = 0;
   uint32_t _termCount = 0;
   uint64_t _wordCount = 0;
   std::string _previousTerm;
+  // Of the current block of the dictionary.
+  uint32_t _entryCount = 0;
+  uint8_t _heads[format::termsPerBlock] = {};
+  uint32_t _postingsLengths[format::termsPerBlock] = {};
+  uint32_t _positionsLengths[format::termsPerBlock] = {};
+  std::vector<uint8_t> _texts;
   MergedListsBuilder _mergedLists;
   BitWriter _positions;
   std::vector<uint8_t> _sections[format::lastKnownSection + 1];

@@ -8,6 +8,7 @@
 #include <string_view>
 #include <utility>
 
+#include "SearchKit/DictionaryBlock.h"
 #include "SearchKit/IndexFormat.h"
 #include "SearchKit/IndexReader.h"
 #include "SearchKit/PackedPositions.h"
@@ -124,8 +125,7 @@ class Check {
       }
       uint32_t postingsLength = 0;
       uint32_t positionsLength = 0;
-      if (!_readTerm(beginsBlock, number, term) || !_dictionary.number(postingsLength) ||
-          !_dictionary.number(positionsLength)) {
+      if (!_readEntry(number, term, postingsLength, positionsLength)) {
         _problems.add("term {}: its entry in the dictionary is broken", number + 1);
         return false;
       }
@@ -149,12 +149,47 @@ class Check {
     }
   }
 
-  bool _readTerm(bool beginsBlock, uint32_t number, std::string& term) {
-    if (_dictionary.left() < 2) {
+  bool _readEntry(uint32_t number, std::string& term, uint32_t& postingsLength,
+                  uint32_t& positionsLength) {
+    const uint32_t entry = number % _view.termsPerBlock();
+    size_t shared = 0;
+    size_t added = 0;
+    if (!_view.hasBlocksOfFields()) {
+      if (_dictionary.left() < 2) {
+        return false;
+      }
+      shared = *_dictionary.at++;
+      added = *_dictionary.at++;
+      return _readText(number, shared, added, term) && _dictionary.number(postingsLength) &&
+             _dictionary.number(positionsLength);
+    }
+    if (entry == 0) {
+      if (!_fields.read(_view.section(Section::dictionary), _dictionary.offset(),
+                        _view.entriesInBlock(number / _view.termsPerBlock()))) {
+        return false;
+      }
+      _dictionary.at = _fields.texts();
+      _longPositions = _fields.longPositions();
+    }
+    if (!_fields.readHead(entry, _dictionary.at, shared, added) ||
+        !_isShortestHead(_fields.head(entry), shared, added) ||
+        !_readText(number, shared, added, term) ||
+        !_fields.readPositionsLength(entry, _longPositions, positionsLength)) {
       return false;
     }
-    const size_t shared = *_dictionary.at++;
-    const size_t length = *_dictionary.at++;
+    postingsLength = _fields.postingsLength(entry);
+    // The last of the longer lengths ends where the texts begin.
+    return entry + 1 < _fields.count() || _longPositions == _fields.texts();
+  }
+
+  // Numbers that fit the head are in it.
+  static bool _isShortestHead(uint8_t head, size_t shared, size_t added) {
+    return ((head & format::headMask) != format::headMask || shared >= format::headMask) &&
+           (head >> format::headBits != format::headMask || added >= format::headMask);
+  }
+
+  bool _readText(uint32_t number, size_t shared, size_t length, std::string& term) {
+    const bool beginsBlock = number % _view.termsPerBlock() == 0;
     if (length > _dictionary.left() || shared > (beginsBlock ? 0 : term.size()) ||
         shared + length == 0 || shared + length > format::maximumTermBytes) {
       return false;
@@ -343,6 +378,9 @@ class Check {
   Bytes _positions;
   // By document, how many positions its terms have.
   std::vector<uint64_t> _words;
+  // Of the current block of the dictionary.
+  DictionaryBlock _fields;
+  const uint8_t* _longPositions = nullptr;
   bool _wordsAreKnown = true;
 };
 

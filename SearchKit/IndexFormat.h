@@ -15,9 +15,11 @@ static_assert(std::endian::native == std::endian::little,
 
 inline constexpr char magic[8] = {'\x89', 'S', 'K', 'I', 'X', '\r', '\n', '\x1a'};
 /// Raised when earlier readers cannot read what is written; they refuse it.
-inline constexpr uint16_t version = 2;
-/// In the first version positions were whole bytes, and postings had one bit for the weight; all
-/// else was as now. It is still read.
+inline constexpr uint16_t version = 3;
+/// In the second version the entries of the dictionary followed one another; all else was as now.
+/// In the first one positions also were whole bytes, and postings had one bit for the weight. Both
+/// are still read.
+inline constexpr uint16_t secondVersion = 2;
 inline constexpr uint16_t firstVersion = 1;
 /// Raised when something is added that earlier readers of the version may skip.
 inline constexpr uint16_t revision = 0;
@@ -88,6 +90,18 @@ inline constexpr size_t blockPositionsAt = 8;
 /// What this writer puts into a block; a reader takes the number from the header.
 inline constexpr uint32_t termsPerBlock = 16;
 inline constexpr uint32_t maximumTermsPerBlock = 4096;
+
+// The first byte of a block of the dictionary: the power of two that is the width of the lengths of
+// postings, and whether there are lengths of positions that need more than a byte.
+inline constexpr uint32_t postingsWidthMask = 3;
+inline constexpr uint32_t hasLongPositions = 4;
+inline constexpr uint32_t knownBlockFlags = postingsWidthMask | hasLongPositions;
+/// In the place of a length of positions: it is among the longer ones.
+inline constexpr uint32_t longPositionsFollow = 0xFF;
+/// Of the byte that says how many bytes a term shares with the one before it and how many it adds:
+/// each half is such a number, or this, and then the number is before the term's bytes.
+inline constexpr uint32_t headBits = 4;
+inline constexpr uint32_t headMask = 15;
 
 /// Longer terms are cut, at a character; so every length in the dictionary is one byte.
 inline constexpr size_t maximumTermBytes = 255;

@@ -13,8 +13,8 @@ std::optional<IndexView> IndexView::make(std::span<const uint8_t> bytes) {
   if (bytes.size() < format::headerLength ||
       !std::equal(std::begin(format::magic), std::end(format::magic),
                   reinterpret_cast<const char*>(header)) ||
-      (load<uint16_t>(header + format::versionAt) != format::version &&
-       load<uint16_t>(header + format::versionAt) != format::firstVersion) ||
+      load<uint16_t>(header + format::versionAt) < format::firstVersion ||
+      load<uint16_t>(header + format::versionAt) > format::version ||
       load<uint32_t>(header + format::tokenizerRulesAt) != searchkit::tokenizerRules) {
     return std::nullopt;
   }
@@ -27,7 +27,9 @@ std::optional<IndexView> IndexView::make(std::span<const uint8_t> bytes) {
     return std::nullopt;
   }
   IndexView view;
-  view._hasPackedPositions = load<uint16_t>(header + format::versionAt) == format::version;
+  const auto version = load<uint16_t>(header + format::versionAt);
+  view._hasPackedPositions = version >= format::secondVersion;
+  view._hasBlocksOfFields = version == format::version;
   view._documentCount = load<uint32_t>(header + format::documentCountAt);
   view._termCount = load<uint32_t>(header + format::termCountAt);
   view._wordCount = load<uint64_t>(header + format::wordCountAt);
@@ -45,6 +47,7 @@ std::optional<IndexView> IndexView::make(std::span<const uint8_t> bytes) {
     return std::nullopt;
   }
   view._mergedCount = view._measuredMergedCount();
+  view._scorer = Scorer(view._documentCount, view._wordCount);
   return view;
 }
 

@@ -45,6 +45,9 @@ class PostingsCursor {
     return true;
   }
 
+  /// Whether the current list says that it has more documents.
+  bool isInList() const noexcept { return _left > 0; }
+
   /// How many documents the current list says it has.
   uint32_t listDocumentCount() const noexcept { return std::min(_listCount, _documentCount); }
 

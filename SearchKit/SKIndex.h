@@ -7,6 +7,7 @@
 #include <string_view>
 
 #include "SearchKit/IndexFormat.h"
+#include "SearchKit/Scoring.h"
 #include "SearchKit/SearchKit.h"
 #include "platform/Data.h"
 
@@ -24,6 +25,7 @@ class IndexView {
   uint32_t documentCount() const noexcept { return _documentCount; }
   uint32_t termCount() const noexcept { return _termCount; }
   uint64_t wordCount() const noexcept { return _wordCount; }
+  const Scorer& scorer() const noexcept { return _scorer; }
   uint32_t tokenizerRules() const noexcept { return _tokenizerRules; }
   uint32_t minimumTermLength() const noexcept { return _minimumTermLength; }
   uint32_t termsPerBlock() const noexcept { return _termsPerBlock; }
@@ -32,7 +34,14 @@ class IndexView {
     return _hasPackedPositions ? format::weightBits : format::weightBitsOfFirstVersion;
   }
   bool hasPackedPositions() const noexcept { return _hasPackedPositions; }
+  /// Whether blocks of the dictionary are laid out field by field (DictionaryBlock.h).
+  bool hasBlocksOfFields() const noexcept { return _hasBlocksOfFields; }
   uint32_t blockCount() const noexcept { return _blockCount; }
+  /// How many terms a block has; `block` is below the count.
+  uint32_t entriesInBlock(uint32_t block) const noexcept {
+    const uint32_t before = block * _termsPerBlock;
+    return _termCount - before < _termsPerBlock ? _termCount - before : _termsPerBlock;
+  }
 
   std::span<const uint8_t> section(format::Section id) const noexcept {
     return _sections[static_cast<uint32_t>(id)];
@@ -97,6 +106,8 @@ class IndexView {
   uint32_t _blockCount = 0;
   uint32_t _mergedCount = 0;
   bool _hasPackedPositions = false;
+  bool _hasBlocksOfFields = false;
+  Scorer _scorer;
   std::span<const uint8_t> _sections[format::lastKnownSection + 1];
 };
 

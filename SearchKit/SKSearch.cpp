@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <memory>
 #include <optional>
 #include <utility>
 
@@ -20,10 +21,17 @@ class SKSearch {
   bool findMatches(size_t maximumCount, SKDocumentID* ids, float* scores, double maximumTime,
                    size_t& foundCount) {
     foundCount = 0;
+    if (_isDirect) {
+      foundCount = _words->deliver(maximumCount, ids, scores);
+      return _words->mayHaveMore();
+    }
     if (!_isEvaluated) {
       _isEvaluated = _compiled.isWords ? _evaluateWords(maximumTime) : _evaluate(maximumTime);
       if (!_isEvaluated) {
         return true;
+      }
+      if (_isDirect) {
+        return findMatches(maximumCount, ids, scores, maximumTime, foundCount);
       }
     }
     if (_hits == nullptr) {
@@ -51,6 +59,10 @@ class SKSearch {
       if (!_words->prepare()) {
         return true;
       }
+      if (_words->isDirect()) {
+        _isDirect = true;
+        return true;
+      }
       _scratch.take(_index->view().documentCount());
       _scratch.setIsClean(false);
     }
@@ -76,7 +88,8 @@ class SKSearch {
   bool _evaluate(double maximumTime) {
     if (!_evaluation) {
       const searchkit::IndexView& view = _index->view();
-      _evaluation.emplace(view, searchkit::SearchPlan::make(view, _compiled.root));
+      _evaluation = std::make_unique<searchkit::Evaluation>(
+          view, searchkit::SearchPlan::make(view, _compiled.root));
     }
     const auto environment = platform::Environment::current();
     searchkit::WorkBudget budget(*environment->clock, maximumTime);
@@ -93,8 +106,10 @@ class SKSearch {
   // One of the two does the work.
   std::optional<searchkit::WordSearch> _words;
   searchkit::ScratchLease _scratch;
-  std::optional<searchkit::Evaluation> _evaluation;
+  std::unique_ptr<searchkit::Evaluation> _evaluation;
   bool _isEvaluated = false;
+  // The words write their hits for the caller themselves.
+  bool _isDirect = false;
   // Of the scratch or the evaluation, once evaluated; null when there are none.
   const searchkit::HitList* _hits = nullptr;
   size_t _delivered = 0;

@@ -40,6 +40,7 @@ inline constexpr float lengthInfluence = 0.5F;
 /// Scores pages of one index. Thread-safety: immutable.
 class Scorer {
  public:
+  Scorer() = default;
   Scorer(uint32_t documentCount, uint64_t wordCount) noexcept
       : _documentCount(static_cast<double>(std::max<uint32_t>(documentCount, 1))) {
     // The counts come from outside: whatever they are, the average is a number of at least one.
@@ -50,7 +51,8 @@ class Scorer {
   /// The weight of a term that `documentCount` pages have (more than there are counts as all).
   float inverseDocumentFrequency(uint64_t documentCount) const noexcept {
     const double n = std::clamp(static_cast<double>(documentCount), 1.0, _documentCount);
-    return static_cast<float>(std::log1p((_documentCount - n + 0.5) / (n + 0.5)));
+    // The sum under the logarithm is this quotient, which is above one whatever n is.
+    return static_cast<float>(std::log((_documentCount + 1) / (n + 0.5)));
   }
 
   /// `frequency` is in units of 1 / exactFactor and above zero.
@@ -62,8 +64,8 @@ class Scorer {
   }
 
  private:
-  double _documentCount;
-  float _lengthFactor;
+  double _documentCount = 1;
+  float _lengthFactor = 0;
 };
 
 }  // namespace searchkit

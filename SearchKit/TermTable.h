@@ -41,15 +41,18 @@ class ByteStream {
  public:
   void append(Arena& arena, const uint8_t* bytes, size_t length) {
     while (length > _left) {
-      const size_t step = _left;
-      std::memcpy(_at, bytes, step);
-      bytes += step;
-      length -= step;
+      if (const size_t step = _left; step > 0) {
+        std::memcpy(_at, bytes, step);
+        bytes += step;
+        length -= step;
+      }
       _beginPiece(arena);
     }
-    std::memcpy(_at, bytes, length);
-    _at += length;
-    _left -= static_cast<uint32_t>(length);
+    if (length > 0) {
+      std::memcpy(_at, bytes, length);
+      _at += length;
+      _left -= static_cast<uint32_t>(length);
+    }
   }
 
   /// The same for the first `length` of the sixteen bytes of two numbers.

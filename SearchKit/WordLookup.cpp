@@ -10,7 +10,85 @@ namespace {
 
 using format::Section;
 
-// Reads the entries of one block, keeping track of how each compares with the term sought.
+// Looks for the first term of a block that is not below the one sought. Terms are not put together:
+// it is enough to know how many bytes each shares with the one sought.
+class BlockSearch {
+ public:
+  BlockSearch(const IndexView& view, uint32_t block) noexcept
+      : _postings(view.blockOffset(block, format::blockPostingsAt)) {
+    if (!_fields.read(view.section(Section::dictionary),
+                      view.blockOffset(block, format::blockDictionaryAt),
+                      view.entriesInBlock(block))) {
+      _fields = DictionaryBlock();
+    }
+  }
+
+  // False when all are below, and where the bytes are broken.
+  bool find(std::string_view sought) noexcept {
+    const uint8_t* text = _fields.texts();
+    size_t common = 0;
+    for (_entry = 0; _entry < _fields.count(); ++_entry) {
+      size_t shared = 0;
+      size_t added = 0;
+      if (!_fields.readHead(_entry, text, shared, added)) {
+        return false;
+      }
+      // With more bytes shared with the former term than that shared with the one sought, this one
+      // compares as that did; with fewer, it is the first that is above.
+      if (shared < common) {
+        return true;
+      }
+      if (shared == common) {
+        const size_t limit = std::min(added, sought.size() - common);
+        size_t same = 0;
+        while (same < limit && text[same] == static_cast<uint8_t>(sought[common + same])) {
+          ++same;
+        }
+        common += same;
+        if (common == sought.size() ||
+            (same < added && text[same] > static_cast<uint8_t>(sought[common]))) {
+          _startsWith = common == sought.size();
+          _isExact = _startsWith && same == added;
+          return true;
+        }
+      }
+      text += added;
+    }
+    return false;
+  }
+
+  // Of the term found.
+  bool startsWith() const noexcept { return _startsWith; }
+  bool isExact() const noexcept { return _isExact; }
+  uint64_t postingsBegin() const noexcept { return _postings + _fields.postingsBefore(_entry); }
+  uint64_t postingsEnd() const noexcept { return postingsBegin() + _fields.postingsLength(_entry); }
+
+  // Where the postings of the terms end that begin like the one found, as far as they are in the
+  // block. `length` is that of the beginning, and less than an entry's head has room for.
+  uint64_t prefixEnd(size_t length, bool& isWholeRest) const noexcept {
+    uint32_t entry = _entry + 1;
+    while (entry < _fields.count() && (_fields.head(entry) & format::headMask) >= length) {
+      ++entry;
+    }
+    isWholeRest = entry == _fields.count();
+    return _postings + _fields.postingsBefore(entry);
+  }
+  // The same where all terms from the first on begin so.
+  uint64_t prefixEndFromStart(size_t length) noexcept {
+    _entry = 0;
+    bool isWholeRest = false;
+    return _fields.count() > 0 ? prefixEnd(length, isWholeRest) : _postings;
+  }
+
+ private:
+  DictionaryBlock _fields;
+  uint64_t _postings;
+  uint32_t _entry = 0;
+  bool _startsWith = false;
+  bool _isExact = false;
+};
+
+// The same in the first two versions: reads the entries of one block one by one.
 class BlockScan {
  public:
   BlockScan(const IndexView& view, uint32_t block) noexcept {
@@ -19,8 +97,7 @@ class BlockScan {
         std::min<size_t>(view.blockOffset(block, format::blockDictionaryAt), dictionary.size());
     _at = dictionary.data() + begin;
     _end = dictionary.data() + dictionary.size();
-    _left =
-        std::min<uint32_t>(view.termsPerBlock(), view.termCount() - block * view.termsPerBlock());
+    _left = view.entriesInBlock(block);
     _postings = view.blockOffset(block, format::blockPostingsAt);
   }
 
@@ -84,18 +161,28 @@ class BlockScan {
   uint32_t _length = 0;
 };
 
-// The first block of `low` up to `high` whose key is above `key`, or `high`. Without a branch on
-// what is compared: no processor could predict it.
-uint32_t firstBlockAbove(const IndexView& view, uint64_t key, uint32_t low,
-                         uint32_t high) noexcept {
-  uint32_t count = high - low;
+// How many of the keys, which ascend, are not above this one. The processor guesses on and has the
+// next keys on their way; arithmetic in place of the branch took somewhat longer.
+uint32_t countUpTo(const uint8_t* keys, uint32_t count, uint64_t key) noexcept {
+  uint32_t low = 0;
   while (count > 0) {
     const uint32_t half = count / 2;
-    const bool isAbove = view.blockKey(low + half) > key;
-    low = isAbove ? low : low + half + 1;
-    count = isAbove ? half : count - half - 1;
+    if (format::load<uint64_t>(keys + size_t{low + half} * sizeof key) <= key) {
+      low += half + 1;
+      count -= half + 1;
+    } else {
+      count = half;
+    }
   }
   return low;
+}
+
+// The first block of `low` up to `high` whose key is above `key`, or `high`.
+uint32_t firstBlockAbove(const IndexView& view, uint64_t key, uint32_t low,
+                         uint32_t high) noexcept {
+  static_assert(format::blockKeyLength == sizeof key);
+  const uint8_t* const keys = view.section(Section::blockKeys).data();
+  return low + countUpTo(keys + size_t{low} * format::blockKeyLength, high - low, key);
 }
 
 WordPostings findByCursor(const IndexView& view, const QueryWord& word) noexcept {
@@ -114,16 +201,17 @@ WordPostings findByCursor(const IndexView& view, const QueryWord& word) noexcept
 }
 
 bool findMerged(const IndexView& view, uint64_t key, WordPostings& found) noexcept {
-  uint32_t low = 0;
-  for (uint32_t count = view.mergedCount(); count > 0;) {
-    const uint32_t half = count / 2;
-    const bool isBelow = view.mergedKey(low + half) < key;
-    low = isBelow ? low + half + 1 : low;
-    count = isBelow ? count - half - 1 : half;
-  }
-  if (low == view.mergedCount() || view.mergedKey(low) != key) {
+  static_assert(format::mergedKeyLength == sizeof key);
+  if (view.mergedCount() == 0) {
     return false;
   }
+  const uint32_t above =
+      countUpTo(view.section(Section::mergedLists).data() + format::mergedHeaderLength,
+                view.mergedCount(), key);
+  if (above == 0 || view.mergedKey(above - 1) != key) {
+    return false;
+  }
+  const uint32_t low = above - 1;
   const uint64_t limit = view.section(Section::mergedLists).size();
   found.kind = WordPostings::Kind::merged;
   found.isOneList = true;
@@ -138,20 +226,71 @@ bool findMerged(const IndexView& view, uint64_t key, WordPostings& found) noexce
   return true;
 }
 
-}  // namespace
+// Any term, in any version: by putting terms together and comparing them.
+bool needsCursor(const IndexView& view, const QueryWord& word, uint32_t blockAbove) noexcept {
+  // Terms of eight bytes and more may have their key in common with the first terms of blocks.
+  return word.term.size() >= format::headMask ||
+         (word.term.size() >= sizeof(uint64_t) && blockAbove > 0 &&
+          view.blockKey(blockAbove - 1) == word.firstKey);
+}
 
-WordPostings findWord(const IndexView& view, const QueryWord& word) noexcept {
+WordPostings findInFields(const IndexView& view, const QueryWord& word) noexcept {
   WordPostings found;
-  if (word.mergedKey != 0 && findMerged(view, word.mergedKey, found)) {
-    return found;
-  }
   const uint32_t blockCount = view.blockCount();
   uint32_t block = firstBlockAbove(view, word.firstKey, 0, blockCount);
-  // Terms of eight bytes and more may have their key in common with the first terms of blocks.
-  if (word.term.size() >= sizeof(uint64_t)) {
-    if (block > 0 && view.blockKey(block - 1) == word.firstKey) {
-      return findByCursor(view, word);
+  if (needsCursor(view, word, block)) {
+    return findByCursor(view, word);
+  }
+  // A shorter one can only be the very term that has its key.
+  block -= block > 0 ? 1 : 0;
+  if (blockCount == 0) {
+    return found;
+  }
+  BlockSearch search(view, block);
+  if (!search.find(word.term)) {
+    // The first term of the next block is the first that is not below.
+    if (!word.isPrefix || ++block >= blockCount || view.blockKey(block) > word.lastKey) {
+      return found;
     }
+    search = BlockSearch(view, block);
+    if (!search.find(word.term)) {
+      return found;
+    }
+  }
+  if (!search.startsWith() || (!word.isPrefix && !search.isExact())) {
+    return found;
+  }
+  found.beginsWithExactTerm = search.isExact();
+  found.range.begin = search.postingsBegin();
+  if (!word.isPrefix) {
+    found.range.end = search.postingsEnd();
+    found.isOneList = true;
+  } else {
+    bool isWholeRest = false;
+    found.range.end = search.prefixEnd(word.term.size(), isWholeRest);
+    found.isOneList = found.range.end == search.postingsEnd();
+    if (isWholeRest && block + 1 < blockCount && view.blockKey(block + 1) <= word.lastKey) {
+      if (word.term.size() >= sizeof(uint64_t)) {
+        return findByCursor(view, word);
+      }
+      // The blocks between begin with the prefix; the last of them may end with other terms.
+      found.isOneList = false;
+      const uint32_t last = firstBlockAbove(view, word.lastKey, block + 1, blockCount) - 1;
+      found.range.end = BlockSearch(view, last).prefixEndFromStart(word.term.size());
+    }
+  }
+  const uint64_t limit = view.section(Section::postings).size();
+  found.range = {std::min(found.range.begin, limit), std::min(found.range.end, limit)};
+  found.kind = WordPostings::Kind::lists;
+  return found;
+}
+
+WordPostings findInEntries(const IndexView& view, const QueryWord& word) noexcept {
+  WordPostings found;
+  const uint32_t blockCount = view.blockCount();
+  uint32_t block = firstBlockAbove(view, word.firstKey, 0, blockCount);
+  if (needsCursor(view, word, block)) {
+    return findByCursor(view, word);
   }
   // A shorter one can only be the very term that has its key.
   block -= block > 0 ? 1 : 0;
@@ -201,6 +340,16 @@ WordPostings findWord(const IndexView& view, const QueryWord& word) noexcept {
     found.range.end = std::min(scan.postingsEnd(), limit);
   }
   return found;
+}
+
+}  // namespace
+
+WordPostings findWord(const IndexView& view, const QueryWord& word) noexcept {
+  WordPostings found;
+  if (word.mergedKey != 0 && findMerged(view, word.mergedKey, found)) {
+    return found;
+  }
+  return view.hasBlocksOfFields() ? findInFields(view, word) : findInEntries(view, word);
 }
 
 }  // namespace searchkit

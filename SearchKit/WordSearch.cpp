@@ -14,7 +14,7 @@ constexpr uint64_t densest = 16;
 }  // namespace
 
 WordSearch::WordSearch(const IndexView& view, const CompiledQuery& query) noexcept
-    : _view(view), _query(query), _scorer(view.documentCount(), view.wordCount()) {}
+    : _view(view), _query(query), _scorer(view.scorer()) {}
 
 bool WordSearch::prepare() {
   if (_view.documentCount() == 0) {
@@ -53,6 +53,30 @@ bool WordSearch::prepare() {
   return _stepCount > 0;
 }
 
+bool WordSearch::isDirect() const noexcept {
+  return _stepCount == 1 && _moreSteps.empty() && _inlineSteps[0].postings.isOneList &&
+         _work < WorkBudget::unitsPerLook / 2;
+}
+
+size_t WordSearch::deliver(size_t maximumCount, SKDocumentID* ids, float* scores) {
+  if (!_hasBegun) {
+    _hasBegun = true;
+    _openList(_inlineSteps[0]);
+  }
+  PostingsCursor at = _cursor;
+  size_t count = 0;
+  while (count < maximumCount && at.next()) {
+    ids[count] = at.document();
+    if (scores != nullptr) {
+      scores[count] = _scorer.score(_idf, _factor * static_cast<float>(at.weight()),
+                                    _view.documentLength(at.document()));
+    }
+    ++count;
+  }
+  _cursor = at;
+  return count;
+}
+
 bool WordSearch::run(WorkBudget& budget, SearchScratch& scratch) {
   const Step* const steps = _moreSteps.empty() ? _inlineSteps : _moreSteps.data();
   for (; _step < _stepCount; ++_step) {
@@ -75,6 +99,23 @@ bool WordSearch::run(WorkBudget& budget, SearchScratch& scratch) {
   return true;
 }
 
+void WordSearch::_openLists(const Step& step) noexcept {
+  const bool isMerged = step.postings.kind == WordPostings::Kind::merged;
+  _cursor = PostingsCursor(
+      _view, _view.section(isMerged ? format::Section::mergedLists : format::Section::postings),
+      step.postings.range, isMerged ? format::mergedFrequencyLimit - 1 : format::maximumWeight);
+}
+
+// The only list of a step: what every posting's score depends on is known beforehand.
+void WordSearch::_openList(const Step& step) noexcept {
+  _openLists(step);
+  _isInList = _cursor.beginList();
+  const bool isMerged = step.postings.kind == WordPostings::Kind::merged;
+  _factor = !isMerged && step.postings.beginsWithExactTerm ? exactFactor : 1;
+  _idf = _scorer.inverseDocumentFrequency(isMerged ? step.postings.documentSum
+                                                   : _cursor.listDocumentCount());
+}
+
 void WordSearch::_begin(const Step& step, SearchScratch& scratch) {
   _hasBegun = true;
   _isInList = false;
@@ -82,10 +123,7 @@ void WordSearch::_begin(const Step& step, SearchScratch& scratch) {
   _documentSum = 0;
   _readAt = 0;
   _keptAt = 0;
-  const bool isMerged = step.postings.kind == WordPostings::Kind::merged;
-  _cursor = PostingsCursor(
-      _view, _view.section(isMerged ? format::Section::mergedLists : format::Section::postings),
-      step.postings.range, isMerged ? format::mergedFrequencyLimit - 1 : format::maximumWeight);
+  _openLists(step);
   if (step.action == Action::push) {
     scratch.hits.clear();
   } else if (step.action == Action::unite) {
@@ -118,11 +156,7 @@ bool WordSearch::_read(const Step& step, WorkBudget& budget, SearchScratch& scra
 
 bool WordSearch::_readOneList(const Step& step, WorkBudget& budget, SearchScratch& scratch) {
   if (!_isInList) {
-    _isInList = _cursor.beginList();
-    const bool isMerged = step.postings.kind == WordPostings::Kind::merged;
-    _factor = !isMerged && step.postings.beginsWithExactTerm ? exactFactor : 1;
-    _idf = _scorer.inverseDocumentFrequency(isMerged ? step.postings.documentSum
-                                                     : _cursor.listDocumentCount());
+    _openList(step);
     if (step.action == Action::push) {
       scratch.hits.reserve(_cursor.listDocumentCount());
     }
@@ -169,7 +203,7 @@ bool WordSearch::_readOneList(const Step& step, WorkBudget& budget, SearchScratc
 }
 
 // The next slice of the list; the hits so far are in the accumulator. Every page is written, and
-// only kept when it is one of them: no branch that could not be predicted.
+// only kept when it is one of them: no branch that could not be predicted. What is kept is scored.
 size_t WordSearch::_look(SearchScratch& scratch) {
   PostingsCursor at = _cursor;
   size_t left = postingsPerSlice;
@@ -177,11 +211,14 @@ size_t WordSearch::_look(SearchScratch& scratch) {
   Hit* const others = scratch.others.data();
   while (left > 0 && (_isInList = at.next())) {
     --left;
-    const uint32_t document = at.document();
-    const float score = scratch.found.frequency(document);
-    others[kept] = {document, score + _scorer.score(_idf, _factor * static_cast<float>(at.weight()),
-                                                    _view.documentLength(document))};
-    kept += score > 0 ? 1 : 0;
+    others[kept] = {at.document(), static_cast<float>(at.weight())};
+    kept += scratch.found.frequency(at.document()) > 0 ? 1 : 0;
+  }
+  for (size_t i = _keptAt; i < kept; ++i) {
+    const uint32_t document = others[i].document;
+    others[i].score =
+        scratch.found.frequency(document) +
+        _scorer.score(_idf, _factor * others[i].score, _view.documentLength(document));
   }
   _cursor = at;
   _keptAt = kept;

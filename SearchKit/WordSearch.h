@@ -35,6 +35,15 @@ class WordSearch {
   /// An upper bound of the work that there is, once prepare() has been called.
   uint64_t work() const noexcept { return _work; }
 
+  /// Whether all there is to do is to read one short list, once prepare() has been called. Then
+  /// deliver() does it, instead of run().
+  bool isDirect() const noexcept;
+
+  /// Writes up to `maximumCount` further hits; returns how many. `scores` may be null.
+  size_t deliver(size_t maximumCount, SKDocumentID* ids, float* scores);
+  /// Whether deliver() may have more.
+  bool mayHaveMore() const noexcept { return !_hasBegun || _cursor.isInList(); }
+
   /// Goes on until the end (true) or until time runs out (false). The hits are then in the
   /// scratch, which must be the same at each call.
   bool run(WorkBudget& budget, SearchScratch& scratch);
@@ -47,6 +56,8 @@ class WordSearch {
     Action action = Action::push;
   };
 
+  void _openLists(const Step& step) noexcept;
+  void _openList(const Step& step) noexcept;
   void _begin(const Step& step, SearchScratch& scratch);
   bool _read(const Step& step, WorkBudget& budget, SearchScratch& scratch);
   bool _readOneList(const Step& step, WorkBudget& budget, SearchScratch& scratch);
@@ -66,7 +77,7 @@ class WordSearch {
 
   const IndexView& _view;
   const CompiledQuery& _query;
-  Scorer _scorer;
+  const Scorer& _scorer;
   uint64_t _work = 0;
 
   // The first few words have room here, so that most searches allocate nothing.

@@ -2,6 +2,8 @@
 
 #include <utility>
 
+#include "host/Luxwell/LUXTextOrder.h"
+
 namespace bvmake {
 
 void AnchorTable::addPage(std::string_view path, const std::vector<std::string>& anchors) {
@@ -11,19 +13,25 @@ void AnchorTable::addPage(std::string_view path, const std::vector<std::string>&
   const auto page = static_cast<uint32_t>(_paths.size());
   _paths.emplace_back(path);
   for (const std::string& anchor : anchors) {
-    _pages[anchor].push_back(page);
+    const uint32_t name = _names.numberOf(anchor);
+    if (name == _pages.size()) {
+      _pages.emplace_back();
+    }
+    _pages[name].push_back(page);
   }
 }
 
 platform::Value AnchorTable::value() const {
   platform::Value::Dictionary table;
-  for (const auto& entry : _pages) {
+  // In the dictionary's order each is added at its end.
+  for (const uint32_t name :
+       LUXOrderOfTexts(_names.size(), [this](uint32_t number) { return _names[number]; })) {
     platform::Value::Array paths;
-    paths.reserve(entry.second.size());
-    for (const uint32_t page : entry.second) {
+    paths.reserve(_pages[name].size());
+    for (const uint32_t page : _pages[name]) {
       paths.push_back(_paths[page]);
     }
-    table.emplace(entry.first, std::move(paths));
+    table.emplace_hint(table.end(), _names[name], std::move(paths));
   }
   return table;
 }

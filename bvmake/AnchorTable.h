@@ -5,9 +5,9 @@
 #include <cstdint>
 #include <string>
 #include <string_view>
-#include <unordered_map>
 #include <vector>
 
+#include "host/Luxwell/LUXNumbering.h"
 #include "platform/Value.h"
 
 namespace bvmake {
@@ -19,7 +19,7 @@ class AnchorTable {
   void addPage(std::string_view path, const std::vector<std::string>& anchors);
 
   /// Distinct names.
-  size_t count() const noexcept { return _pages.size(); }
+  size_t count() const noexcept { return _names.size(); }
 
   /// A dictionary from name to array of paths, in the order in which the pages were added. Equal
   /// paths are one shared string, so that the archive holds each once.
@@ -27,7 +27,9 @@ class AnchorTable {
 
  private:
   std::vector<platform::Value> _paths;
-  std::unordered_map<std::string, std::vector<uint32_t>> _pages;
+  LUXStringNumbering _names;
+  /// By the numbers of the names.
+  std::vector<std::vector<uint32_t>> _pages;
 };
 
 }  // namespace bvmake

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <string>
+#include <vector>
 
 TEST(LUXStringNumbering, StringsAreNumberedInTheOrderInWhichTheyCome) {
   LUXStringNumbering numbering;
@@ -43,4 +44,25 @@ TEST(LUXPairNumbering, PairsAreNumberedInTheOrderInWhichTheyCome) {
   EXPECT_EQ(numbering.size(), 30000U);
   EXPECT_EQ(numbering[0].second, 2U);
   EXPECT_EQ(numbering.numberOf({2, 1}), 1U);
+}
+
+TEST(LUXStringNumbering, StringsOfAllLengthsThatAreNearlyAlikeAreToldApart) {
+  LUXStringNumbering numbering;
+  std::vector<std::string> strings;
+  for (size_t length = 0; length < 40; ++length) {
+    for (size_t changed = 0; changed <= length; ++changed) {
+      std::string string(length, 'a');
+      if (changed < length) {
+        string[changed] = '\0';
+      }
+      strings.push_back(string);
+    }
+  }
+  for (uint32_t number = 0; number < strings.size(); ++number) {
+    EXPECT_EQ(numbering.numberOf(strings[number]), number);
+  }
+  for (uint32_t number = 0; number < strings.size(); ++number) {
+    EXPECT_EQ(numbering.find(strings[number]), number);
+    EXPECT_EQ(numbering[number], strings[number]);
+  }
 }

@@ -154,16 +154,29 @@ TEST_F(IndexCheck, blocksAreLookedAt) {
 }
 
 TEST_F(IndexCheck, termsAreLookedAt) {
-  // The first entry: nothing shared, length, the term.
-  EXPECT_THAT(problemsAfter([&] { section(Section::dictionary)[0] = 3; }),
-              Contains("term 1: its entry in the dictionary is broken"));
-  EXPECT_THAT(problemsAfter([&] { section(Section::dictionary)[2] = 'z'; }),
+  // The first block: flags, heads, lengths of postings and of positions, then texts.
+  const auto block = [this] { return section(Section::dictionary).data(); };
+  constexpr size_t heads = 1;
+  constexpr size_t lengths = heads + format::termsPerBlock;
+  constexpr size_t texts = lengths + 2 * size_t{format::termsPerBlock};
+  const auto isBroken = Contains("term 1: its entry in the dictionary is broken");
+  ASSERT_EQ(block()[0], 0);
+  EXPECT_THAT(problemsAfter([&] { block()[0] = 3; }), isBroken);
+  EXPECT_THAT(problemsAfter([&] { block()[0] = 8; }), isBroken);
+  EXPECT_THAT(problemsAfter([&] { block()[0] = format::hasLongPositions; }), Not(IsEmpty()));
+  // Something shared with no term before it, no bytes at all, and a number that fits the head.
+  EXPECT_THAT(problemsAfter([&] { block()[heads] = 0x13; }), isBroken);
+  EXPECT_THAT(problemsAfter([&] { block()[heads] = 0; }), isBroken);
+  EXPECT_THAT(problemsAfter([&] {
+                block()[heads] = 0xF0;
+                block()[texts] = 1;
+              }),
+              isBroken);
+  EXPECT_THAT(problemsAfter([&] { block()[texts] = 'z'; }),
               Contains(HasSubstr("is not above the term before")));
-  EXPECT_THAT(problemsAfter([&] { section(Section::dictionary)[2] = 0xFF; }),
-              Contains("term 1: it is not UTF-8"));
-  const size_t length = section(Section::dictionary)[1];
-  EXPECT_THAT(problemsAfter([&] { section(Section::dictionary)[2 + length] = 0x7F; }),
-              Not(IsEmpty()));
+  EXPECT_THAT(problemsAfter([&] { block()[texts] = 0xFF; }), Contains("term 1: it is not UTF-8"));
+  EXPECT_THAT(problemsAfter([&] { ++block()[lengths]; }), Not(IsEmpty()));
+  EXPECT_THAT(problemsAfter([&] { ++block()[lengths + format::termsPerBlock]; }), Not(IsEmpty()));
 }
 
 TEST_F(IndexCheck, postingsAndPositionsAreLookedAt) {

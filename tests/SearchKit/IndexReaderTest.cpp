@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "SearchKit/IndexFormat.h"
 #include "tests/SearchKit/Indexes.h"
 
 namespace searchkit {
@@ -125,7 +126,7 @@ TEST(TermIterator, findsEveryTermOfManyBlocks) {
 TEST(IndexReader, summaryTellsWhatTheHeaderSays) {
   const SKIndexRef index = threePages();
   const IndexSummary summary = indexSummary(*index);
-  EXPECT_EQ(summary.formatVersion, 2);
+  EXPECT_EQ(summary.formatVersion, format::version);
   EXPECT_EQ(summary.documentCount, 3U);
   EXPECT_EQ(summary.termCount, 5U);
   EXPECT_EQ(summary.wordCount, 7U);

@@ -305,7 +305,7 @@ SKIndexRef indexOfVersion(int version) {
   const std::string path = std::string(ZEB_SOURCE_DIR) + "/tests/SearchKit/indexes/version-" +
                            std::to_string(version) + ".skindex";
   const auto data = platform::systemFileManager()->contentsAtPath(path);
-  const SKIndexRef index = data ? SKIndexOpenWithData(*data) : nullptr;
+  SKIndexRef index = data ? SKIndexOpenWithData(*data) : nullptr;
   EXPECT_TRUE(SKIndexVerifyChecksums(index));
   return index;
 }
@@ -339,6 +339,25 @@ TEST(SKIndex, opensIndexesOfTheSecondVersion) {
             "/words/24.html ");
   // With a merged list: all pages of words, and one with "worked".
   EXPECT_EQ(testing::scores(index, "wo*").size(), 17U);
+}
+
+TEST(SKIndex, opensIndexesOfTheThirdVersion) {
+  const SKIndexRef index = indexOfVersion(3);
+  ASSERT_NE(index, nullptr);
+  EXPECT_EQ(indexSummary(*index).formatVersion, 3U);
+  EXPECT_THAT(indexProblems(*index), ::testing::IsEmpty());
+  EXPECT_EQ(found(index, "print* queue* "), "/printing.html ");
+  EXPECT_EQ(found(index, "\"the cafe\" | 印刷"), "/cafe.html /japanese.html ");
+  EXPECT_EQ(found(index, "\"the print queue\""), "/printing.html ");
+  EXPECT_EQ(found(index, "*et* -printer"), "/cafe.html ");
+  // Terms with more in common, and longer, than an entry's head has room for.
+  EXPECT_EQ(found(index, "incomprehensibilities*"), "/words/100.html ");
+  EXPECT_EQ(found(index, "incomprehensibility"), "/words/101.html ");
+  // Postings and positions of more than 255 bytes.
+  EXPECT_EQ(testing::scores(index, "many").size(), 300U);
+  EXPECT_EQ(testing::scores(index, "\"many many\"").size(), 300U);
+  // With a merged list.
+  EXPECT_EQ(testing::scores(index, "wo*").size(), 300U);
 }
 
 }  // namespace

@@ -4,8 +4,10 @@
 
 #include <algorithm>
 #include <cstring>
+#include <initializer_list>
 #include <random>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "SearchKit/IndexFormat.h"
@@ -150,6 +152,14 @@ Terms byLibrary(std::string_view text) {
   return all;
 }
 
+std::string joined(std::initializer_list<std::string_view> parts) {
+  std::string text;
+  for (const std::string_view part : parts) {
+    text += part;
+  }
+  return text;
+}
+
 TEST(Tokenizer, characterByCharacterAgreesWithTheLibrary) {
   for (uint32_t character = 0x80; character < 0x10000; ++character) {
     if (character >= 0xD800 && character < 0xE000) {
@@ -164,7 +174,7 @@ TEST(Tokenizer, characterByCharacterAgreesWithTheLibrary) {
     }
     text += static_cast<char>(0x80 | (character & 0x3F));
     const std::string alone = text.substr(1);
-    text += "b " + alone + " 東" + alone + "京 " + alone + alone;
+    text += joined({"b ", alone, " 東", alone, "京 ", alone, alone});
     ASSERT_EQ(terms(text), byLibrary(text)) << std::hex << character;
   }
 }
@@ -177,10 +187,10 @@ TEST(Tokenizer, takesWordsOfAnyLengthAnywhere) {
       const std::string lower(length, 'w');
       const std::string gap(before, '.');
       EXPECT_EQ(terms(gap + word), Terms{lower});
-      EXPECT_EQ(terms(gap + word + "-" + word), (Terms{lower, lower}));
-      EXPECT_EQ(terms(gap + word + "’s"), (Terms{lower, "s"}));
-      EXPECT_EQ(terms(gap + word + "é x"), (Terms{lower + "e", "x"}));
-      EXPECT_EQ(terms("a " + gap + word + "東"), (Terms{"a", lower, "東"}));
+      EXPECT_EQ(terms(joined({gap, word, "-", word})), (Terms{lower, lower}));
+      EXPECT_EQ(terms(joined({gap, word, "’s"})), (Terms{lower, "s"}));
+      EXPECT_EQ(terms(joined({gap, word, "é x"})), (Terms{lower + "e", "x"}));
+      EXPECT_EQ(terms(joined({"a ", gap, word, "東"})), (Terms{"a", lower, "東"}));
     }
   }
 }
