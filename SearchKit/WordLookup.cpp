@@ -16,6 +16,9 @@ class BlockSearch {
  public:
   BlockSearch(const IndexView& view, uint32_t block) noexcept
       : _postings(view.blockOffset(block, format::blockPostingsAt)) {
+    // The postings are on their way while the block is searched.
+    const std::span<const uint8_t> postings = view.section(Section::postings);
+    __builtin_prefetch(postings.data() + std::min<uint64_t>(_postings, postings.size()));
     if (!_fields.read(view.section(Section::dictionary),
                       view.blockOffset(block, format::blockDictionaryAt),
                       view.entriesInBlock(block))) {
