@@ -40,16 +40,16 @@ std::string_view firstTerm(const IndexView& view, uint32_t block) noexcept {
 
 }  // namespace
 
-// The last block whose first term is not above `term`, or the first block. Blocks are told apart
-// by their keys; only where several keys are equal are the terms themselves compared.
-uint32_t DictionaryCursor::_blockForTerm(std::string_view term) const noexcept {
+// Blocks are told apart by their keys; only where several keys are equal are the terms themselves
+// compared.
+uint32_t blockForTerm(const IndexView& view, std::string_view term) noexcept {
   const uint64_t key = format::blockKey(term);
   uint32_t low = 0;
-  uint32_t high = _view->blockCount();
+  uint32_t high = view.blockCount();
   while (low < high) {
     const uint32_t middle = low + (high - low) / 2;
-    const uint64_t blockKey = _view->blockKey(middle);
-    if (blockKey < key || (blockKey == key && firstTerm(*_view, middle) <= term)) {
+    const uint64_t blockKey = view.blockKey(middle);
+    if (blockKey < key || (blockKey == key && firstTerm(view, middle) <= term)) {
       low = middle + 1;
     } else {
       high = middle;
@@ -60,7 +60,7 @@ uint32_t DictionaryCursor::_blockForTerm(std::string_view term) const noexcept {
 
 bool DictionaryCursor::seek(std::string_view term) noexcept {
   _termsPerBlock = _view->termsPerBlock();
-  if (_view->blockCount() == 0 || !_enterBlock(_blockForTerm(term))) {
+  if (_view->blockCount() == 0 || !_enterBlock(blockForTerm(*_view, term))) {
     return _fail();
   }
   while (this->term() < term) {

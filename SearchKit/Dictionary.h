@@ -44,7 +44,6 @@ class DictionaryCursor {
   ByteRange positions() const noexcept { return _positions; }
 
  private:
-  uint32_t _blockForTerm(std::string_view term) const noexcept;
   bool _enterBlock(uint32_t block) noexcept;
   bool _readEntry() noexcept;
   bool _readText(size_t shared, size_t added) noexcept;
@@ -69,6 +68,9 @@ class DictionaryCursor {
   ByteRange _positions;
   char _term[format::maximumTermBytes + 1] = {};
 };
+
+/// The last block whose first term is not above `term`, or the first block.
+uint32_t blockForTerm(const IndexView& view, std::string_view term) noexcept;
 
 /// The postings of all terms that begin with `prefix`: they follow one another.
 struct PrefixRange {

@@ -16,6 +16,9 @@ class BlockSearch {
  public:
   BlockSearch(const IndexView& view, uint32_t block) noexcept
       : _postings(view.blockOffset(block, format::blockPostingsAt)) {
+    // The postings are on their way while the block is searched.
+    const std::span<const uint8_t> postings = view.section(Section::postings);
+    __builtin_prefetch(postings.data() + std::min<uint64_t>(_postings, postings.size()));
     if (!_fields.read(view.section(Section::dictionary),
                       view.blockOffset(block, format::blockDictionaryAt),
                       view.entriesInBlock(block))) {
@@ -185,16 +188,18 @@ uint32_t firstBlockAbove(const IndexView& view, uint64_t key, uint32_t low,
   return low + countUpTo(keys + size_t{low} * format::blockKeyLength, high - low, key);
 }
 
+// Any term, in any version: by putting terms together and comparing them.
 WordPostings findByCursor(const IndexView& view, const QueryWord& word) noexcept {
   WordPostings found;
-  const PrefixRange range = findPrefix(view, word.term);
-  found.range = range.postings;
-  found.beginsWithExactTerm = range.beginsWithExactTerm;
-  if (!word.isPrefix) {
+  if (word.isPrefix) {
+    const PrefixRange range = findPrefix(view, word.term);
+    found.range = range.postings;
+    found.beginsWithExactTerm = range.beginsWithExactTerm;
+  } else {
     DictionaryCursor cursor(view);
-    found.range =
-        cursor.seek(word.term) && cursor.term() == word.term ? cursor.postings() : ByteRange{};
     found.isOneList = true;
+    found.beginsWithExactTerm = cursor.seek(word.term) && cursor.term() == word.term;
+    found.range = found.beginsWithExactTerm ? cursor.postings() : ByteRange{};
   }
   found.kind = found.range.length() > 0 ? WordPostings::Kind::lists : WordPostings::Kind::none;
   return found;
@@ -226,25 +231,28 @@ bool findMerged(const IndexView& view, uint64_t key, WordPostings& found) noexce
   return true;
 }
 
-// Any term, in any version: by putting terms together and comparing them.
-bool needsCursor(const IndexView& view, const QueryWord& word, uint32_t blockAbove) noexcept {
-  // Terms of eight bytes and more may have their key in common with the first terms of blocks.
-  return word.term.size() >= format::headMask ||
-         (word.term.size() >= sizeof(uint64_t) && blockAbove > 0 &&
-          view.blockKey(blockAbove - 1) == word.firstKey);
+// Terms of eight bytes and more may have their key in common with the first terms of blocks, of
+// which there may be several.
+bool hasKeyOfBlock(const IndexView& view, const QueryWord& word, uint32_t blockAbove) noexcept {
+  return word.term.size() >= sizeof(uint64_t) && blockAbove > 0 &&
+         view.blockKey(blockAbove - 1) == word.firstKey;
 }
 
 WordPostings findInFields(const IndexView& view, const QueryWord& word) noexcept {
   WordPostings found;
   const uint32_t blockCount = view.blockCount();
-  uint32_t block = firstBlockAbove(view, word.firstKey, 0, blockCount);
-  if (needsCursor(view, word, block)) {
-    return findByCursor(view, word);
-  }
-  // A shorter one can only be the very term that has its key.
-  block -= block > 0 ? 1 : 0;
   if (blockCount == 0) {
     return found;
+  }
+  if (word.isPrefix && word.term.size() >= format::headMask) {
+    return findByCursor(view, word);
+  }
+  uint32_t block = firstBlockAbove(view, word.firstKey, 0, blockCount);
+  if (hasKeyOfBlock(view, word, block)) {
+    block = blockForTerm(view, word.term);
+  } else {
+    // A shorter one can only be the very term that has its key.
+    block -= block > 0 ? 1 : 0;
   }
   BlockSearch search(view, block);
   if (!search.find(word.term)) {
@@ -289,7 +297,7 @@ WordPostings findInEntries(const IndexView& view, const QueryWord& word) noexcep
   WordPostings found;
   const uint32_t blockCount = view.blockCount();
   uint32_t block = firstBlockAbove(view, word.firstKey, 0, blockCount);
-  if (needsCursor(view, word, block)) {
+  if (hasKeyOfBlock(view, word, block)) {
     return findByCursor(view, word);
   }
   // A shorter one can only be the very term that has its key.

@@ -1,6 +1,10 @@
 #include "SearchKit/WordSearch.h"
 
 #include <algorithm>
+#include <new>
+#include <span>
+#include <type_traits>
+#include <utility>
 
 #include "SearchKit/SKIndex.h"
 
@@ -11,12 +15,29 @@ constexpr size_t postingsPerSlice = 1024;
 constexpr uint64_t fewestPagesAPosting = 4;
 constexpr uint64_t densest = 16;
 
+// Stable, and for a few steps without the memory that the library's algorithm takes.
+template <typename Step, typename Length>
+void sortByLength(std::span<Step> steps, const Length& length) {
+  constexpr size_t few = 8;
+  if (steps.size() > few) {
+    std::stable_sort(steps.begin(), steps.end(),
+                     [&](const Step& a, const Step& b) { return length(a) < length(b); });
+    return;
+  }
+  for (size_t i = 1; i < steps.size(); ++i) {
+    for (size_t at = i; at > 0 && length(steps[at]) < length(steps[at - 1]); --at) {
+      std::swap(steps[at], steps[at - 1]);
+    }
+  }
+}
+
 }  // namespace
 
 WordSearch::WordSearch(const IndexView& view, const CompiledQuery& query) noexcept
     : _view(view), _query(query), _scorer(view.scorer()) {}
 
 bool WordSearch::prepare() {
+  static_assert(std::is_trivially_destructible_v<Step>);
   if (_view.documentCount() == 0) {
     return false;
   }
@@ -28,8 +49,8 @@ bool WordSearch::prepare() {
   }
   size_t required = 0;
   for (size_t i = 0; i < _query.words.size(); ++i) {
-    Step& step = steps[_stepCount];
-    step.postings = findWord(_view, _query.words[i]);
+    // Made in its place: a copy would wait for what has only just been written.
+    const Step& step = *new (&steps[_stepCount]) Step{findWord(_view, _query.words[i])};
     if (step.postings.kind == WordPostings::Kind::none) {
       if (i < _query.requiredCount) {
         return false;
@@ -40,10 +61,8 @@ bool WordSearch::prepare() {
     required += i < _query.requiredCount ? 1 : 0;
     _work += step.postings.range.length();
   }
-  const auto isShorter = [](const Step& a, const Step& b) {
-    return a.postings.range.length() < b.postings.range.length();
-  };
-  std::stable_sort(steps, steps + (isAny ? _stepCount : required), isShorter);
+  sortByLength(std::span(steps, isAny ? _stepCount : required),
+               [](const Step& step) { return step.postings.range.length(); });
   for (size_t i = 0; i < _stepCount; ++i) {
     steps[i].action = i == 0         ? Action::push
                       : isAny        ? Action::unite

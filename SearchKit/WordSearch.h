@@ -82,7 +82,11 @@ class WordSearch {
 
   // The first few words have room here, so that most searches allocate nothing.
   static constexpr size_t inlineStepCount = 4;
-  Step _inlineSteps[inlineStepCount];
+  // Only those that the query has words for are ever made: to clear them all would take longer than
+  // to look a word up.
+  union {
+    Step _inlineSteps[inlineStepCount];
+  };
   std::vector<Step> _moreSteps;
   size_t _stepCount = 0;
 

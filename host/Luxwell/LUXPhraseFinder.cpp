@@ -46,7 +46,7 @@ class SeenTwice {
   void note(uint64_t hash) noexcept {
     uint64_t& word = _words[_place(hash)];
     const uint64_t seen = uint64_t{1} << _shift(hash);
-    word |= (word & seen) != 0 ? seen << 1U : seen;
+    word |= (word & seen) << 1U | seen;
   }
 
   bool test(uint64_t hash) const noexcept {
