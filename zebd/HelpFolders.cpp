@@ -12,6 +12,7 @@
 #include <string_view>
 #include <system_error>
 
+#include "bvmake/PageReader.h"
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "platform/Environment.h"
@@ -62,19 +63,13 @@ std::optional<std::string> realPath(const std::string& path) {
   return real.string();
 }
 
-bool isPageName(std::string_view name) {
-  static constexpr std::string_view extensions[] = {"html", "htm", "xhtml", "xht", "page"};
-  const std::string extension = platform::lowercaseString(platform::pathExtension(name));
-  return std::find(std::begin(extensions), std::end(extensions), extension) != std::end(extensions);
-}
-
 /// Whether there is a page in the folder or a few levels below.
 bool hasPages(const std::string& folder) {
   std::error_code error;
   std::filesystem::recursive_directory_iterator walk(folder, error);
   for (size_t count = 0; !error && walk != std::filesystem::recursive_directory_iterator();
        walk.increment(error)) {
-    if (isPageName(walk->path().filename().string())) {
+    if (bvmake::pageKindOfFileName(walk->path().filename().string())) {
       return true;
     }
     if (++count > 1000) {

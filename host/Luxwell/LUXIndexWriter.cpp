@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <cstdint>
+#include <functional>
 #include <string_view>
 #include <unordered_set>
 #include <utility>
@@ -320,12 +321,17 @@ struct LUXIndexWriter::Implementation {
   }
 
   void findTokens(const LUXPhraseFinder& finder, TokenData& data) const {
-    data.stems = rankingOf(stems);
-    data.forms = rankingOf(forms);
-    data.phraseNames = phraseNames(finder);
-    data.phrases = rankingOf(data.phraseNames);
-    data.titleNames = titleNames(data.titleOfPage);
-    data.titles = rankingOf(data.titleNames);
+    const std::array<std::function<void()>, 4> rankings = {
+        [&] {
+          data.phraseNames = phraseNames(finder);
+          data.phrases = rankingOf(data.phraseNames);
+        },
+        [&] { data.stems = rankingOf(stems); }, [&] { data.forms = rankingOf(forms); },
+        [&] {
+          data.titleNames = titleNames(data.titleOfPage);
+          data.titles = rankingOf(data.titleNames);
+        }};
+    LUXInParallel(rankings.size(), 1, threadCount, [&](size_t i, size_t) { rankings[i](); });
     data.stemOfSurface.reserve(surfaces.size());
     for (const Surface& surface : surfaces) {
       data.stemOfSurface.push_back(surface.stem == none ? none : data.stems.rank[surface.stem]);

@@ -133,6 +133,22 @@ TEST_F(CommandLineTest, BooksTakesNothingButJSON) {
   expectUsageError({"books", "a"}, "a");
 }
 
+TEST_F(CommandLineTest, StatusTakesNothingButJSON) {
+  EXPECT_TRUE(parsed<zeb::StatusCommand>({"status", "--json"}).json);
+  expectUsageError({"status", "a"}, "a");
+}
+
+TEST_F(CommandLineTest, WatchTakesWordsBooksAndAnEnd) {
+  const auto command =
+      parsed<zeb::WatchCommand>({"watch", "a", "-b", "--book", "c", "--once", "--json"});
+  EXPECT_THAT(command.words, ElementsAre("a", "-b"));
+  EXPECT_THAT(command.books, ElementsAre("c"));
+  EXPECT_TRUE(command.once);
+  EXPECT_TRUE(command.json);
+  EXPECT_FALSE(parsed<zeb::WatchCommand>({"watch", "a"}).once);
+  EXPECT_EQ(parse({"watch"}), std::nullopt);
+}
+
 TEST_F(CommandLineTest, IndexTakesFoldersAndIdentifiers) {
   const auto command =
       parsed<zeb::IndexCommand>({"index", "one", "two", "--book-id", "a", "--book-id", "b"});

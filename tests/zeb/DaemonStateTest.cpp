@@ -4,6 +4,7 @@
 #include <sdbus-c++/sdbus-c++.h>
 
 #include <cstdint>
+#include <cstdlib>
 #include <map>
 #include <memory>
 #include <string>
@@ -39,7 +40,11 @@ class PretendedDaemon {
 };
 
 TEST(DaemonStateTest, WithoutABusThereIsNone) {
-  EXPECT_EQ(zeb::stateOfDaemon("unix:path=/nowhere/at/all").kind, Kind::noBus);
+  ::setenv("DBUS_SESSION_BUS_ADDRESS", "unix:path=/nowhere/at/all", 1);
+  const zeb::DaemonState state = zeb::stateOfDaemon();
+  ::unsetenv("DBUS_SESSION_BUS_ADDRESS");
+  EXPECT_EQ(state.kind, Kind::noBus);
+  EXPECT_NE(state.reason, "");
 }
 
 TEST(DaemonStateTest, BusThatKnowsNoDaemonHasNone) {

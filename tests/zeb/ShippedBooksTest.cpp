@@ -221,8 +221,8 @@ std::set<std::string> optionsIn(const std::string& text) {
 TEST(Manual, ReferenceNamesEveryOptionAndNoOther) {
   const tests::World world;
   std::string help = world.zeb({"--help"}).out;
-  for (const char* command :
-       {"search", "anchor", "books", "index", "scan", "add", "remove", "publish", "doctor"}) {
+  for (const char* command : {"search", "anchor", "books", "index", "scan", "add", "remove",
+                              "publish", "doctor", "status", "watch"}) {
     help += world.zeb({command, "--help"}).out;
   }
   std::set<std::string> offered = optionsIn(help);

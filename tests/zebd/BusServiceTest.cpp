@@ -4,11 +4,14 @@
 #include <sdbus-c++/sdbus-c++.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <atomic>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
 #include <map>
+#include <regex>
+#include <set>
 #include <string>
 #include <thread>
 #include <vector>
@@ -45,6 +48,7 @@ class Client {
           }
           _last = results.empty() ? Dictionary() : results.back();
           ++_batches;
+          _largestBatch = std::max(_largestBatch, results.size());
         });
     _proxy->uponSignal("Ended")
         .onInterface(zebd::ZEBBusInterface)
@@ -52,6 +56,12 @@ class Client {
           const platform::MutexLock lock(_mutex);
           EXPECT_GE(waited, 0);
           _endings[handle] = how;
+        });
+    _proxy->uponSignal("BookChanged")
+        .onInterface(zebd::ZEBBusInterface)
+        .call([this](const std::string& book, bool isIndexed) {
+          const platform::MutexLock lock(_mutex);
+          _changedBooks.emplace(book, isIndexed);
         });
     _proxy->finishRegistration();
     _connection->enterEventLoopAsync();
@@ -128,6 +138,15 @@ class Client {
     const platform::MutexLock lock(_mutex);
     return _batches;
   }
+  size_t largestBatch() const {
+    const platform::MutexLock lock(_mutex);
+    return _largestBatch;
+  }
+  /// Book and whether it was indexed.
+  std::set<std::pair<std::string, bool>> changedBooks() const {
+    const platform::MutexLock lock(_mutex);
+    return _changedBooks;
+  }
 
  private:
   std::unique_ptr<sdbus::IConnection> _connection;
@@ -137,6 +156,8 @@ class Client {
   std::map<uint64_t, std::string> _endings GUARDED_BY(_mutex);
   Dictionary _last GUARDED_BY(_mutex);
   size_t _batches GUARDED_BY(_mutex) = 0;
+  size_t _largestBatch GUARDED_BY(_mutex) = 0;
+  std::set<std::pair<std::string, bool>> _changedBooks GUARDED_BY(_mutex);
 };
 
 class BusServiceTest : public testing::Test, protected tests::HostWorld {
@@ -335,6 +356,107 @@ TEST_F(BusServiceTest, NameCanBeGivenBackAndTakenAgain) {
   EXPECT_THAT(gdbus({"org.zeb.Help1.Status"}), HasSubstr("Error"));
   EXPECT_TRUE(bus->requestName());
   EXPECT_THAT(gdbus({"org.zeb.Help1.Status"}), HasSubstr("'books'"));
+}
+
+TEST_F(BusServiceTest, ManyResultsComeInBatches) {
+  for (int i = 0; i < 250; ++i) {
+    writePage("share/help/en/garden/page" + std::to_string(i) + ".html", "Bed " + std::to_string(i),
+              "Here grow tulips.");
+  }
+  EXPECT_THAT(gdbus({"org.zeb.Help1.Scan", "@as []", "{'force': <true>}"}), HasSubstr("garden"));
+  EXPECT_TRUE(waitUntilQuiet(service->owner()));
+  Client client(privateBus.address());
+  const uint64_t handle = client.startSearch("+tulips", {{"limit", uint32_t{1000}}});
+  EXPECT_TRUE(client.waitForEnd(handle));
+  EXPECT_EQ(client.titles(handle).size(), 250U);
+  EXPECT_LE(client.largestBatch(), 100U);
+  EXPECT_GE(client.batchCount(), 3U);
+}
+
+TEST_F(BusServiceTest, ClientWithTooManyUnansweredRequestsIsRefusedMore) {
+  // Nothing is answered before the main loop runs.
+  const auto connection = sdbus::createSessionBusConnectionWithAddress(privateBus.address());
+  const auto proxy = sdbus::createProxy(*connection, zebd::ZEBBusName, zebd::ZEBBusPath);
+  proxy->finishRegistration();
+  connection->enterEventLoopAsync();
+  std::atomic<int> answered{0};
+  std::atomic<int> refused{0};
+  for (int i = 0; i < zebd::BusService::maximumRequestCount + 6; ++i) {
+    proxy->callMethodAsync("Status")
+        .onInterface(zebd::ZEBBusInterface)
+        .uponReplyInvoke([&](const sdbus::Error* error, const Dictionary& /*status*/) {
+          const bool isRefused =
+              error != nullptr && error->getName() == "org.zeb.Help1.Error.Refused";
+          ++(isRefused ? refused : answered);
+        });
+  }
+  while (refused < 6) {
+    std::this_thread::yield();
+  }
+  EXPECT_EQ(answered, 0);
+  EXPECT_TRUE(runUntil([&] { return answered == zebd::BusService::maximumRequestCount; }));
+  EXPECT_EQ(refused, 6);
+  EXPECT_THAT(gdbus({"org.zeb.Help1.Status"}), HasSubstr("'books'"));
+  connection->leaveEventLoop();
+}
+
+TEST_F(BusServiceTest, ClientThatReadsNothingHoldsUpNobody) {
+  const auto deaf = sdbus::createSessionBusConnectionWithAddress(privateBus.address());
+  const auto proxy = sdbus::createProxy(*deaf, zebd::ZEBBusName, zebd::ZEBBusPath);
+  proxy->finishRegistration();
+  Client client(privateBus.address());
+  for (int i = 0; i < 40; ++i) {
+    auto call = proxy->createMethodCall(zebd::ZEBBusInterface, "StartSearch");
+    call << std::string("in") << Dictionary();
+    proxy->callMethod(call, [](sdbus::MethodReply& /*reply*/, const sdbus::Error* /*error*/) {});
+    const uint64_t handle = client.startSearch("spring");
+    ASSERT_TRUE(client.waitForEnd(handle));
+    ASSERT_EQ(client.ending(handle), "complete");
+  }
+  EXPECT_TRUE(runUntil([this] { return service->searches().count() == 0; }));
+}
+
+TEST_F(BusServiceTest, ChangesOfBooksAreToldToEverybody) {
+  Client client(privateBus.address());
+  EXPECT_THAT(gdbus({"org.zeb.Help1.Scan", "@as []", "{'force': <true>}"}), HasSubstr("garden"));
+  EXPECT_TRUE(runUntil([&] { return client.changedBooks().contains({"garden", true}); }));
+  std::filesystem::remove_all(folder.path("share/help/en/garden"));
+  EXPECT_THAT(gdbus({"org.zeb.Help1.Rescan"}), HasSubstr("uint32 1, "));
+  EXPECT_TRUE(runUntil([&] { return client.changedBooks().contains({"", false}); }));
+}
+
+/// What the service tells programs of itself is what docs/bus.md tells people.
+TEST_F(BusServiceTest, IntrospectionIsAsDocumented) {
+  const auto membersIn = [](const std::string& text) {
+    std::set<std::string> members;
+    std::string member;
+    const std::regex tag("<(method|signal|arg) ([^>]*?)/?>");
+    const std::regex attribute("(type|name|direction)=\"([^\"]*)\"");
+    for (std::sregex_iterator found(text.begin(), text.end(), tag), end; found != end; ++found) {
+      std::map<std::string, std::string> attributes;
+      const std::string inside = (*found)[2];
+      for (std::sregex_iterator one(inside.begin(), inside.end(), attribute); one != end; ++one) {
+        attributes[(*one)[1]] = (*one)[2];
+      }
+      if ((*found)[1] == "arg") {
+        member +=
+            " " + attributes["direction"] + " " + attributes["name"] + " " + attributes["type"];
+      } else {
+        members.insert(member);
+        member = attributes["name"] + ":";
+      }
+    }
+    members.insert(member);
+    members.erase("");
+    return members;
+  };
+  std::ifstream page(ZEB_SOURCE_DIR "/docs/bus.md");
+  const std::string documented{std::istreambuf_iterator<char>(page), {}};
+  std::string told = gdbus({"org.freedesktop.DBus.Introspectable.Introspect"});
+  told = told.substr(told.find("<interface name=\"org.zeb.Help1\""));
+  told = told.substr(0, told.find("</interface>"));
+  EXPECT_EQ(membersIn(told), membersIn(documented));
+  EXPECT_EQ(membersIn(told).size(), 16U);
 }
 
 TEST_F(BusServiceTest, EndOfTheBusIsTold) {

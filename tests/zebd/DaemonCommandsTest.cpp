@@ -178,11 +178,9 @@ TEST_F(DaemonCommandsTest, StatusTellsOfBooksAndTheDaemonAndStartsNone) {
   EXPECT_FALSE(isThere());
   EXPECT_THAT(zeb({"status"}, false), HasSubstr("there is none; commands do the work"));
   EXPECT_THAT(zeb({"scan"}), StartsWith("0\n"));
-  EXPECT_TRUE(waitUntilIdle());
   EXPECT_THAT(zeb({"status"}), AllOf(StartsWith("0\n"), HasSubstr("books   2, 2 indexed"),
                                      HasSubstr("garden   en  made on this computer  Roses"),
-                                     HasSubstr("process " + std::to_string(daemonProcess())),
-                                     HasSubstr("now     nothing")));
+                                     HasSubstr("process " + std::to_string(daemonProcess()))));
   EXPECT_THAT(zeb({"status", "--json"}),
               AllOf(HasSubstr("\"origin\": \"generated\""),
                     HasSubstr("\"process\": " + std::to_string(daemonProcess()))));

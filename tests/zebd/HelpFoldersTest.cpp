@@ -62,6 +62,16 @@ TEST_F(HelpFoldersTest, ComputerWithoutHelpHasNoFolders) {
   EXPECT_THAT(manuals(), IsEmpty());
 }
 
+TEST_F(HelpFoldersTest, EveryKindOfPageMakesAFolderOneOfHelp) {
+  page("help/C/caterer/index.docbook");
+  page("help/C/editor/start.page");
+  page("help/C/player/START.HTM");
+  page("help/C/viewer/notes.docbook");
+  EXPECT_EQ(applications(), (Lines{"caterer C help/C/caterer", "editor C help/C/editor",
+                                   "player C help/C/player"}));
+  EXPECT_EQ(reason("help/C/viewer"), zebd::noPagesReason) << "only a part of a document";
+}
+
 TEST_F(HelpFoldersTest, TakesTheBestLanguageOfEachApplication) {
   page("help/C/editor/index.page");
   page("help/pt/editor/index.page");
