@@ -175,6 +175,7 @@ bool measureLoad(int clientCount, double seconds) {
     return false;
   }
   std::vector<std::unique_ptr<Client>> clients;
+  clients.reserve(static_cast<size_t>(clientCount));
   for (int i = 0; i < clientCount; ++i) {
     clients.push_back(
         std::make_unique<Client>(world.bus.address(), static_cast<uint32_t>(i + 100)));
@@ -189,6 +190,7 @@ bool measureLoad(int clientCount, double seconds) {
   const auto end = start + std::chrono::duration_cast<SteadyClock::duration>(
                                std::chrono::duration<double>(seconds));
   std::vector<std::thread> threads;
+  threads.reserve(clients.size());
   for (const auto& client : clients) {
     threads.emplace_back([&client, end] { client->searchUntil(end); });
   }

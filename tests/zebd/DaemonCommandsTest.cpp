@@ -210,8 +210,8 @@ TEST_F(DaemonCommandsTest, WatchPrintsPagesAsTheyAreFoundAndAsBooksComeAndGo) {
     return contents(output).find(text) != std::string::npos;
   };
   EXPECT_TRUE(waitFor([&] { return says("+ Roses"); }));
-  page("orchard", "Apples", "Apple trees flower in spring.");
-  EXPECT_TRUE(waitFor([&] { return says("+ Apples"); })) << contents(output);
+  page("orchard", "Pears", "Pear trees flower in spring.");
+  EXPECT_TRUE(waitFor([&] { return says("+ Pears"); })) << contents(output);
   fs::remove_all(folder.path("share/help/en/garden"));
   EXPECT_TRUE(waitFor([&] { return says("- Roses"); })) << contents(output);
   EXPECT_TRUE(watcher.isRunning());
@@ -227,8 +227,8 @@ TEST_F(DaemonCommandsTest, WatchOutlivesTheDaemon) {
   };
   EXPECT_TRUE(waitFor([&] { return says("+ Roses"); }));
   ASSERT_EQ(::kill(daemonProcess(), SIGKILL), 0);
-  page("orchard", "Apples", "Apple trees flower in spring.");
-  EXPECT_TRUE(waitFor([&] { return says("+ Apples"); })) << contents(output);
+  page("orchard", "Pears", "Pear trees flower in spring.");
+  EXPECT_TRUE(waitFor([&] { return says("+ Pears"); })) << contents(output);
 }
 
 }  // namespace

@@ -10,7 +10,6 @@ namespace {
 
 using testing::AllOf;
 using testing::HasSubstr;
-using testing::IsEmpty;
 using testing::StartsWith;
 using tests::contents;
 using tests::NginxServer;
