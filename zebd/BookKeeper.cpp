@@ -26,6 +26,18 @@ constexpr platform::Seconds lockPace{1};
 /// The news of a changed book goes over the bus and back.
 constexpr platform::Seconds newsLimit{5};
 
+/// Keeps the host from leaving until books are registered.
+class Registration : public SearchReceiver {
+ public:
+  explicit Registration(Owner& owner) : _owner(owner) { _owner.disableShutdown(); }
+
+  void foundResults(const ZEBResultBatch& /*batch*/) override {}
+  void searchEnded(bool /*finished*/) override { _owner.enableShutdown(); }
+
+ private:
+  Owner& _owner;
+};
+
 }  // namespace
 
 struct BookKeeper::Found {
@@ -275,26 +287,11 @@ void BookKeeper::_finishScanWhenDone() {
     }
   }
   _host.owner().enableShutdown();
-  if (!_waiting.empty()) {
+  // One of them may have begun the next scan.
+  if (!_isScanning && !_waiting.empty()) {
     _startScan();
   }
 }
-
-namespace {
-
-/// Keeps the host from leaving until books are registered.
-class Registration : public SearchReceiver {
- public:
-  explicit Registration(Owner& owner) : _owner(owner) { _owner.disableShutdown(); }
-
-  void foundResults(const ZEBResultBatch& /*batch*/) override {}
-  void searchEnded(bool /*finished*/) override { _owner.enableShutdown(); }
-
- private:
-  Owner& _owner;
-};
-
-}  // namespace
 
 void BookKeeper::_registerNow(const std::vector<std::string>& bookIDs) {
   if (bookIDs.empty()) {

@@ -2,6 +2,7 @@
 #include <gmock/gmock.h>
 
 #include <algorithm>
+#include <regex>
 #include <sstream>
 
 #include "tests/support/NginxServer.h"
@@ -170,6 +171,26 @@ TEST_F(DaemonCommandsTest, BookOnThisComputerIsNotRemovedAsARemoteOne) {
   EXPECT_THAT(gdbus({"org.zeb.Help1.RemoveRemote", "garden"}),
               HasSubstr("org.zeb.Help1.Error.UnknownBook"));
   EXPECT_THAT(zeb({"search", "spring"}), StartsWith("0\n"));
+}
+
+TEST_F(DaemonCommandsTest, TerminalShowsWhatAPipeGetsWithTheDaemonAndWithoutIt) {
+  ASSERT_THAT(zeb({"scan"}), StartsWith("0\n"));
+  const std::string expected = zeb({"search", "spring"});
+  EXPECT_THAT(expected, HasSubstr("Roses"));
+  for (const bool hasBus : {true, false}) {
+    const tests::Variable address("DBUS_SESSION_BUS_ADDRESS",
+                                  hasBus ? bus.address() : "unix:path=" + folder.path("none"));
+    const std::string output = folder.path("shown");
+    tests::ChildProcess terminal("/usr/bin/script",
+                                 {"-qec", ZEB_PROGRAM " search spring", "/dev/null"}, output);
+    const int code = terminal.wait();
+    const std::string shown = contents(output);
+    EXPECT_THAT(shown, HasSubstr("\033[1m")) << "colours are for terminals";
+    // Colours, progress that is wiped away, and the returns of a terminal's lines.
+    const std::regex ofTerminals("\033\\[[0-9;]*[A-Za-z]|\r|[^\n]*\033\\[K");
+    EXPECT_EQ(std::to_string(code) + "\n" + std::regex_replace(shown, ofTerminals, ""), expected);
+    fs::remove(output);
+  }
 }
 
 TEST_F(DaemonCommandsTest, StatusTellsOfBooksAndTheDaemonAndStartsNone) {

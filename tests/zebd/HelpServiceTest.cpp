@@ -295,6 +295,25 @@ TEST_F(HelpServiceTest, ScansThatAreAskedForDuringAScanAreOneMore) {
   EXPECT_TRUE(runUntil([&] { return ends == 5; }));
 }
 
+TEST_F(HelpServiceTest, ScanThatIsAskedForAtTheEndOfAnotherRunsAfterThoseThatWait) {
+  start();
+  std::vector<int> ends;
+  zebd::ScanRequest ofItsOwn;
+  ofItsOwn.folderBooksEvenIfUnchanged = true;
+  ofItsOwn.allBooksEvenIfUnchanged = true;
+  service->scan([&](const zebd::BookChanges&) {
+    ends.push_back(1);
+    service->scan([&](const zebd::BookChanges&) { ends.push_back(3); });
+  });
+  service->scan(ofItsOwn, [&](const zebd::BookChanges& changes) {
+    EXPECT_EQ(changes.changed, 2U);
+    ends.push_back(2);
+  });
+  EXPECT_TRUE(runUntil([&] { return ends.size() == 3; }));
+  EXPECT_THAT(ends, ElementsAre(1, 2, 3));
+  EXPECT_FALSE(service->status().isScanning);
+}
+
 TEST_F(HelpServiceTest, SearchesOfSeveralClientsRunInTheOrderOfTheirRequests) {
   start();
   const uint64_t first = begin("a", "spring");
