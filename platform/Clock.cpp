@@ -1,6 +1,7 @@
 #include "platform/Clock.h"
 
 #include <algorithm>
+#include <set>
 #include <thread>
 #include <utility>
 
@@ -32,6 +33,45 @@ class SystemClock final : public Clock {
   }
 
   void addListener(std::weak_ptr<ClockListener> /*listener*/) override {}
+};
+
+/// The identifiers of threads that slept and have ended, until another thread sleeps that has got
+/// one of them: what was counted for the former is not the latter's. Thread-safety: internally
+/// synchronised.
+class EndedThreads {
+ public:
+  static EndedThreads& shared() {
+    // Threads end after everything else.
+    static auto* const threads = new EndedThreads;  // NOLINT(cppcoreguidelines-owning-memory)
+    return *threads;
+  }
+
+  bool contains(std::thread::id thread) const {
+    const std::lock_guard lock(_mutex);
+    return _threads.contains(thread);
+  }
+  void add(std::thread::id thread) {
+    const std::lock_guard lock(_mutex);
+    _threads.insert(thread);
+  }
+  void remove(std::thread::id thread) {
+    const std::lock_guard lock(_mutex);
+    _threads.erase(thread);
+  }
+
+ private:
+  mutable std::mutex _mutex;
+  std::set<std::thread::id> _threads;
+};
+
+/// Lives as long as its thread.
+struct LifeOfThread {
+  LifeOfThread() { EndedThreads::shared().remove(std::this_thread::get_id()); }
+  ~LifeOfThread() { EndedThreads::shared().add(std::this_thread::get_id()); }
+  LifeOfThread(const LifeOfThread&) = delete;
+  LifeOfThread& operator=(const LifeOfThread&) = delete;
+
+  bool hasSlept = false;
 };
 
 }  // namespace
@@ -84,7 +124,9 @@ void SimulatedClock::timedWaitBegins() {
 
 void SimulatedClock::_beginSleep() {
   ++_sleepers;
-  ++_sleepsBegun[std::this_thread::get_id()];
+  thread_local LifeOfThread life;
+  size_t& count = _sleepsBegun[std::this_thread::get_id()];
+  count = std::exchange(life.hasSlept, true) ? count + 1 : 1;
   _sleepersChanged.notify_all();
 }
 
@@ -126,7 +168,9 @@ void SimulatedClock::waitForSleepers(size_t count) {
 
 void SimulatedClock::waitForSleepOf(std::thread::id thread, size_t count) {
   std::unique_lock lock(_mutex);
-  _sleepersChanged.wait(lock, [&] { return _sleepsBegun[thread] >= count; });
+  _sleepersChanged.wait(lock, [&] {
+    return _sleepsBegun[thread] >= count && !EndedThreads::shared().contains(thread);
+  });
 }
 
 }  // namespace platform

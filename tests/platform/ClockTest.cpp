@@ -5,6 +5,8 @@
 #include <atomic>
 #include <thread>
 
+#include "tests/platform/OtherThreads.h"
+
 namespace platform {
 namespace {
 
@@ -85,6 +87,43 @@ TEST(SimulatedClock, tellsWhenAThreadHasGoneToSleepWhateverOthersDo) {
   EXPECT_EQ(clock.elapsed(), Seconds(100));
   clock.advance(Seconds(900));
   other.join();
+}
+
+TEST(SimulatedClock, sleepsOfAThreadThatHasEndedAreNotThoseOfTheNextOneOfItsName) {
+  SimulatedClock clock;
+  std::thread former([&] { clock.sleep(Seconds(1)); });
+  const std::thread::id name = former.get_id();
+  clock.waitForSleepOf(name, 1);
+  clock.advance(Seconds(1));
+  former.join();
+  std::atomic<bool> maySleep{false};
+  std::atomic<bool> goesToSleep{false};
+  std::thread latter([&] {
+    maySleep.wait(false);
+    goesToSleep = true;
+    clock.sleep(Seconds(1));
+  });
+  if (latter.get_id() != name) {
+    // Nothing says that names are used again, but they are.
+    maySleep = true;
+    maySleep.notify_all();
+    clock.waitForSleepOf(latter.get_id(), 1);
+    clock.advance(Seconds(1));
+    latter.join();
+    GTEST_SKIP() << "the system has found another name";
+  }
+  bool wasAsleep = false;
+  std::thread observer([&] {
+    clock.waitForSleepOf(name, 1);
+    wasAsleep = goesToSleep;
+  });
+  tests::OtherThreads().waitUntilBlocked(std::chrono::seconds(5));
+  maySleep = true;
+  maySleep.notify_all();
+  observer.join();
+  EXPECT_TRUE(wasAsleep);
+  clock.advance(Seconds(1));
+  latter.join();
 }
 
 }  // namespace
