@@ -9,6 +9,7 @@
 #include <mutex>
 #include <string_view>
 #include <thread>
+#include <utility>
 
 #include "platform/Applications.h"
 #include "platform/DistributedNotificationCenter.h"
@@ -171,9 +172,12 @@ EnvironmentOverride::EnvironmentOverride(Environment environment)
 }
 
 EnvironmentOverride::~EnvironmentOverride() {
+  // Not destroyed with the lock held: threads of its parts may ask for the current one to their
+  // end.
+  std::shared_ptr<const Environment> replaced;
   Current& holder = currentHolder();
   const std::lock_guard lock(holder.mutex);
-  holder.environment = std::move(_former);
+  replaced = std::exchange(holder.environment, std::move(_former));
 }
 
 }  // namespace platform

@@ -4,6 +4,8 @@
 
 #include <cstdlib>
 #include <map>
+#include <thread>
+#include <utility>
 
 #include "platform/DistributedNotificationCenter.h"
 #include "platform/Processes.h"
@@ -164,6 +166,21 @@ TEST(EnvironmentOverride, replacesTheEnvironmentForItsLifetime) {
     EXPECT_EQ(Environment::current()->clock, replacement.clock);
   }
   EXPECT_EQ(Environment::current(), before);
+}
+
+TEST(EnvironmentOverride, whatGoesWithAnEnvironmentMayAskForTheOneThatFollows) {
+  const auto before = Environment::current();
+  std::shared_ptr<const Environment> atTheEnd;
+  {
+    // As a thread of a part does that is waited for.
+    std::shared_ptr<void> part(nullptr, [&](const void* /*nothing*/) {
+      std::thread([&] { atTheEnd = Environment::current(); }).join();
+    });
+    Environment replacement = Environment::system();
+    replacement.standardOutput = [part = std::move(part)](const std::string&) {};
+    const EnvironmentOverride override(std::move(replacement));
+  }
+  EXPECT_EQ(atTheEnd, before);
 }
 
 }  // namespace
