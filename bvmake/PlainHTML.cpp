@@ -66,7 +66,7 @@ const xmlChar* parserText(const char* text) noexcept {
   return reinterpret_cast<const xmlChar*>(text);
 }
 
-/// Whether an element ends where another begins, which is one libxml2 is asked only once.
+/// Whether an element ends where another begins. libxml2 is asked once for each pair.
 bool endsBefore(const HTMLElement& open, const HTMLElement& next) {
   if (&open == &next) {
     return (open.traits & elementtraits::endsBeforeItself) != 0;

@@ -32,8 +32,9 @@ TEST(PlainHTML, takesWhatProgramsWrite) {
         "<div class=\"x\"\n id=\"y\"><section><h1>a</h1></section></div>",
         "<p>a<br>b<br/>c<img src=\"d\" alt='e > f'></p><hr />", "<ul><li>a<li>b</ul>",
         "<p>a<p>b<div>c</div>", "<dl><dt>a<dd>b<dt>c</dl>",
-        "<table><tr><td>a<td nowrap>b</td><tr><th>c</th></tr></table>", "<a name=x>a</a><a id='z'/>",
-        "a &lt; b &nbsp;&copy; &#x41;&#66; & c", "<!-- <p> - -- --><span hidden>a</span>",
+        "<table><tr><td>a<td nowrap>b</td><tr><th>c</th></tr></table>",
+        "<a name=x>a</a><a id='z'/>", "a &lt; b &nbsp;&copy; &#x41;&#66; & c",
+        "<!-- <p> - -- --><span hidden>a</span>",
         "<script>if (a < b) { x('<p>'); }</script><style>a > b {}</style>", "<script/>a",
         "<unknown-element>a</unknown-element>",
         "<p role='navigation'>a</p><p style='display: none'>b</p><details open>c</details>"}) {
