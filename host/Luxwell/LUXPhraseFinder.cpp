@@ -301,16 +301,18 @@ void LUXPhraseFinder::find(const Pages& pages, const std::vector<uint32_t>& word
   _countLongerPhrases(parts);
   _longer.resize(pages.size());
   LUXInParallel(pages.size(), pagesAtOnce, threadCount, [&](size_t from, size_t to) {
+    std::vector<Occurrence> phrases;
     for (size_t page = from; page < to; ++page) {
+      phrases.clear();
       for (const Part& part : parts) {
         for (size_t at = page == 0 ? 0 : part.ends[page - 1]; at < part.ends[page]; ++at) {
           const uint32_t phrase = part.groups[part.occurrences[at] >> 1U].phrase;
           if (phrase != none) {
-            _longer[page].push_back(phrase << 1U | (part.occurrences[at] & 1U));
+            phrases.push_back(phrase << 1U | (part.occurrences[at] & 1U));
           }
         }
       }
-      _longer[page].shrink_to_fit();
+      _longer[page].assign(phrases.begin(), phrases.end());
     }
   });
 }
