@@ -12,15 +12,22 @@
 
 namespace bvmake {
 
+struct HTMLAttribute {
+  /// In any case.
+  std::string_view name;
+  /// Empty where it has none.
+  std::string_view value;
+};
+
 /// Takes the start tags, end tags and text of one HTML page, in order, and decides what of it is
 /// searched. Keeps a few words for each open element, so that nesting costs neither stack nor time.
 /// Thread-safety: confined to one thread.
 class HTMLPageBuilder {
  public:
-  /// Name and value, value null where the attribute has none, …, null: as the parser has them.
-  using Attributes = const char* const*;
+  using Attributes = const std::vector<HTMLAttribute>&;
 
-  void startElement(std::string_view name, Attributes attributes);
+  /// Of the attributes those are enough that isAttributeRead() names.
+  void startElement(ElementTraits traits, Attributes attributes);
   void endElement();
   void characters(std::string_view text);
 
