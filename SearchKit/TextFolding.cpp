@@ -1,138 +1,20 @@
 #include "SearchKit/TextFolding.h"
 
 #include <unicode/uchar.h>
-#include <unicode/unorm2.h>
 #include <unicode/uscript.h>
-#include <unicode/ustring.h>
 #include <unicode/utf16.h>
-#include <unicode/utf8.h>
+
+#include <algorithm>
+#include <cstdint>
+
+#include "platform/TextForms.h"
 
 namespace searchkit {
 namespace {
 
-constexpr UChar zeroWidthSpace = 0x200B;
-constexpr UChar replacementCharacter = 0xFFFD;
-// Canonical combining class of the voicing marks of kana.
-constexpr uint8_t kanaVoicing = 8;
-
-void appendUTF16(std::string_view text, std::u16string& out) {
-  const auto length = static_cast<int64_t>(text.size());
-  const auto* bytes = reinterpret_cast<const uint8_t*>(text.data());
-  for (int64_t at = 0; at < length;) {
-    UChar32 character;
-    U8_NEXT(bytes, at, length, character);
-    if (character < 0) {
-      out.push_back(replacementCharacter);
-    } else if (character == zeroWidthSpace) {
-      out.push_back(u' ');
-    } else if (character <= 0xFFFF) {
-      out.push_back(static_cast<char16_t>(character));
-    } else {
-      out.push_back(U16_LEAD(character));
-      out.push_back(U16_TRAIL(character));
-    }
-  }
-}
-
-const UNormalizer2* normalizer(const UNormalizer2* (*instance)(UErrorCode*)) {
-  UErrorCode status = U_ZERO_ERROR;
-  const UNormalizer2* result = instance(&status);
-  return U_SUCCESS(status) != 0 ? result : nullptr;
-}
-
-// Replaces the text by its normal form; leaves it alone where ICU has none, which only happens
-// when its data are missing.
-void normalize(const UNormalizer2* form, std::u16string& text) {
-  if (form == nullptr || text.empty()) {
-    return;
-  }
-  std::u16string normal(text.size() * 2 + 16, u'\0');
-  for (;;) {
-    UErrorCode status = U_ZERO_ERROR;
-    const int32_t length =
-        unorm2_normalize(form, text.data(), static_cast<int32_t>(text.size()), normal.data(),
-                         static_cast<int32_t>(normal.size()), &status);
-    if (status == U_BUFFER_OVERFLOW_ERROR) {
-      normal.resize(static_cast<size_t>(length));
-      continue;
-    }
-    if (U_SUCCESS(status) != 0) {
-      normal.resize(static_cast<size_t>(length));
-      text.swap(normal);
-    }
-    return;
-  }
-}
+constexpr char16_t zeroWidthSpace = 0x200B;
 
 bool isMark(UChar32 character) noexcept { return (U_GET_GC_MASK(character) & U_GC_M_MASK) != 0; }
-
-bool isDiacritic(UChar32 character) noexcept {
-  if ((U_GET_GC_MASK(character) & (U_GC_MN_MASK | U_GC_ME_MASK)) == 0 ||
-      u_getCombiningClass(character) == kanaVoicing) {
-    return false;
-  }
-  UErrorCode status = U_ZERO_ERROR;
-  switch (uscript_getScript(character, &status)) {
-    case USCRIPT_COMMON:
-    case USCRIPT_INHERITED:
-    case USCRIPT_LATIN:
-    case USCRIPT_GREEK:
-    case USCRIPT_CYRILLIC:
-    case USCRIPT_HEBREW:
-    case USCRIPT_ARABIC:
-    case USCRIPT_SYRIAC:
-      return true;
-    default:
-      return false;
-  }
-}
-
-// The plain letters for a letter that does not decompose; null for all others.
-const char16_t* plainLetters(UChar32 character) noexcept {
-  switch (character) {
-    case 0x00E6:
-      return u"ae";
-    case 0x00F0:
-    case 0x0111:
-      return u"d";
-    case 0x00F8:
-      return u"o";
-    case 0x0127:
-      return u"h";
-    case 0x0131:
-      return u"i";
-    case 0x0142:
-      return u"l";
-    case 0x0153:
-      return u"oe";
-    case 0x0167:
-      return u"t";
-    case 0x0640:
-      return u"";
-    default:
-      return nullptr;
-  }
-}
-
-void dropDiacritics(std::u16string& text) {
-  std::u16string plain;
-  plain.reserve(text.size());
-  const auto length = static_cast<int64_t>(text.size());
-  for (int64_t at = 0; at < length;) {
-    const auto begin = static_cast<size_t>(at);
-    UChar32 character;
-    U16_NEXT(text.data(), at, length, character);
-    if (isDiacritic(character)) {
-      continue;
-    }
-    if (const char16_t* letters = plainLetters(character)) {
-      plain.append(letters);
-    } else {
-      plain.append(text, begin, static_cast<size_t>(at) - begin);
-    }
-  }
-  text.swap(plain);
-}
 
 bool isUnspacedScript(UScriptCode script) noexcept {
   switch (script) {
@@ -159,16 +41,13 @@ bool isSharedKanaLetter(UChar32 character) noexcept {
 }  // namespace
 
 void foldText(std::string_view text, std::u16string& folded) {
-  static const UNormalizer2* const caseFolding = normalizer(unorm2_getNFKCCasefoldInstance);
-  static const UNormalizer2* const decomposition = normalizer(unorm2_getNFDInstance);
-  static const UNormalizer2* const composition = normalizer(unorm2_getNFCInstance);
-  std::u16string work;
-  work.reserve(text.size());
-  appendUTF16(text, work);
-  normalize(caseFolding, work);
-  normalize(decomposition, work);
-  dropDiacritics(work);
-  normalize(composition, work);
+  using platform::NormalForm;
+  std::u16string work = platform::utf16FromUTF8(text);
+  std::replace(work.begin(), work.end(), zeroWidthSpace, u' ');
+  platform::normalize(NormalForm::caseless, work);
+  platform::normalize(NormalForm::decomposed, work);
+  platform::dropDiacritics(work);
+  platform::normalize(NormalForm::composed, work);
   folded.append(work);
 }
 

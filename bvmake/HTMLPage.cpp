@@ -6,9 +6,11 @@
 #include <exception>
 #include <limits>
 #include <memory>
+#include <vector>
 
 #include "bvmake/HTMLPageBuilder.h"
 #include "bvmake/MarkupGuard.h"
+#include "bvmake/PlainHTML.h"
 
 namespace bvmake {
 
@@ -19,6 +21,7 @@ namespace {
 struct Session {
   htmlParserCtxtPtr parser = nullptr;
   HTMLPageBuilder builder;
+  std::vector<HTMLAttribute> attributes;
   uint64_t nestingWork = 0;
   bool tooMuchWork = false;
   std::exception_ptr exception;
@@ -39,13 +42,18 @@ struct Session {
   }
 };
 
-std::string_view view(const xmlChar* text) { return reinterpret_cast<const char*>(text); }
+std::string_view view(const xmlChar* text) {
+  return text == nullptr ? std::string_view() : reinterpret_cast<const char*>(text);
+}
 
 void startElement(void* context, const xmlChar* name, const xmlChar** attributes) {
   auto& session = *static_cast<Session*>(context);
   session.guarded([&] {
-    session.builder.startElement(view(name),
-                                 reinterpret_cast<HTMLPageBuilder::Attributes>(attributes));
+    session.attributes.clear();
+    for (; attributes != nullptr && *attributes != nullptr; attributes += 2) {
+      session.attributes.push_back({view(attributes[0]), view(attributes[1])});
+    }
+    session.builder.startElement(traitsOfElement(view(name)), session.attributes);
   });
 }
 
@@ -82,7 +90,7 @@ struct ParserDeleter {
 
 }  // namespace
 
-std::optional<Page> readHTMLPage(std::string text, platform::Error* error, HTMLThinning thinning) {
+std::optional<Page> readHTMLPage(std::string text, platform::Error* error, HTMLParsing parsing) {
   const auto refuse = [error](std::string description) -> std::optional<Page> {
     if (error != nullptr) {
       *error = platform::formatError(std::move(description));
@@ -92,8 +100,13 @@ std::optional<Page> readHTMLPage(std::string text, platform::Error* error, HTMLT
   if (text.size() > static_cast<size_t>(std::numeric_limits<int>::max())) {
     return refuse("too large");
   }
-  if (std::optional<std::string> problem =
-          thinning == HTMLThinning::on ? tameAndThinHTML(text) : tameMarkup(text, Markup::html)) {
+  if (parsing == HTMLParsing::whereNeeded) {
+    HTMLPageBuilder builder;
+    if (readPlainHTML(text, builder)) {
+      return builder.finish();
+    }
+  }
+  if (std::optional<std::string> problem = tameMarkup(text, Markup::html)) {
     return refuse(std::move(*problem));
   }
   Session session;

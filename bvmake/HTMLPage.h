@@ -9,9 +9,9 @@
 
 namespace bvmake {
 
-/// Whether markup without bearing on the page is left out before the parser sees it. The page is
-/// the same with and without.
-enum class HTMLThinning { on, off };
+/// Which pages libxml2 parses: those that have to be mended, or all. It makes no difference to the
+/// page.
+enum class HTMLParsing { whereNeeded, always };
 
 /// Reads a page from its text (well-formed UTF-8, no NUL). HTML of any quality is taken; what is
 /// refused, with `error` set when given, are the few constructions that would cost the parser time
@@ -23,7 +23,7 @@ enum class HTMLThinning { on, off };
 /// main content, headers, footers and asides. Where a page marks its main content (`main`), only
 /// that is read. Anchors are taken from everywhere.
 std::optional<Page> readHTMLPage(std::string text, platform::Error* error = nullptr,
-                                 HTMLThinning thinning = HTMLThinning::on);
+                                 HTMLParsing parsing = HTMLParsing::whereNeeded);
 
 /// Bound on the work that misnested tags make for the parser: the sum over all of them of the depth
 /// at which they stand.

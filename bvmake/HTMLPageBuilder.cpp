@@ -1,6 +1,7 @@
 #include "bvmake/HTMLPageBuilder.h"
 
 #include <algorithm>
+#include <optional>
 #include <utility>
 
 #include "bvmake/ASCII.h"
@@ -10,14 +11,14 @@ namespace bvmake {
 
 namespace {
 
-/// The attribute's value, "" where it has none; null when there is no such attribute.
-const char* attribute(HTMLPageBuilder::Attributes attributes, std::string_view name) {
-  for (; attributes != nullptr && *attributes != nullptr; attributes += 2) {
-    if (name == attributes[0]) {
-      return attributes[1] == nullptr ? "" : attributes[1];
+std::optional<std::string_view> attribute(HTMLPageBuilder::Attributes attributes,
+                                          std::string_view name) {
+  for (const HTMLAttribute& attribute : attributes) {
+    if (equalsIgnoringCase(attribute.name, name)) {
+      return attribute.value;
     }
   }
-  return nullptr;
+  return std::nullopt;
 }
 
 bool forbidsIndexing(std::string_view robots) {
@@ -39,12 +40,13 @@ const HTMLPageBuilder::Context& HTMLPageBuilder::_context() const {
   return _open.empty() ? outermost : _open.back();
 }
 
-void HTMLPageBuilder::startElement(std::string_view name, Attributes attributes) {
-  ElementTraits traits = traitsOfElement(name);
-  if (const char* role = attribute(attributes, "role")) {
-    traits |= traitsOfRole(role);
+void HTMLPageBuilder::startElement(ElementTraits traits, Attributes attributes) {
+  if (const auto role = attribute(attributes, "role")) {
+    traits |= traitsOfRole(*role);
   }
-  _collectAnchors(traits, attributes);
+  if (!attributes.empty()) {
+    _collectAnchors(traits, attributes);
+  }
 
   Context context = _context();
   context.traits = traits;
@@ -54,7 +56,7 @@ void HTMLPageBuilder::startElement(std::string_view name, Attributes attributes)
   }
   if ((traits & elementtraits::block) != 0) {
     _finishBlock();
-  } else if (name == "br") {
+  } else if ((traits & elementtraits::lineBreak) != 0) {
     characters(" ");
   }
   if ((traits & elementtraits::meta) != 0) {
@@ -146,28 +148,28 @@ bool HTMLPageBuilder::_isHidden(ElementTraits traits, Attributes attributes) con
   if ((traits & elementtraits::skipped) != 0) {
     return true;
   }
-  if ((traits & elementtraits::hiddenUnlessOpen) != 0 && attribute(attributes, "open") == nullptr) {
+  if ((traits & elementtraits::hiddenUnlessOpen) != 0 && !attribute(attributes, "open")) {
     return true;
   }
-  if ((traits & elementtraits::root) != 0) {
+  if ((traits & elementtraits::root) != 0 || attributes.empty()) {
     return false;
   }
-  if (const char* hidden = attribute(attributes, "hidden")) {
-    return !equalsIgnoringCase(hidden, "until-found");
+  if (const auto hidden = attribute(attributes, "hidden")) {
+    return !equalsIgnoringCase(*hidden, "until-found");
   }
-  if (const char* hidden = attribute(attributes, "aria-hidden")) {
-    if (equalsIgnoringCase(trimmed(hidden), "true")) {
+  if (const auto hidden = attribute(attributes, "aria-hidden")) {
+    if (equalsIgnoringCase(trimmed(*hidden), "true")) {
       return true;
     }
   }
-  const char* style = attribute(attributes, "style");
-  return style != nullptr && styleHides(style);
+  const auto style = attribute(attributes, "style");
+  return style && styleHides(*style);
 }
 
 void HTMLPageBuilder::_collectAnchors(ElementTraits traits, Attributes attributes) {
-  const auto add = [this](const char* name) {
-    if (name != nullptr && *name != '\0' && _anchorsSeen.insert(name).second) {
-      _page.anchors.emplace_back(name);
+  const auto add = [this](std::optional<std::string_view> name) {
+    if (name && !name->empty() && _anchorsSeen.numberOf(*name) == _page.anchors.size()) {
+      _page.anchors.emplace_back(*name);
     }
   };
   add(attribute(attributes, "id"));
@@ -177,28 +179,28 @@ void HTMLPageBuilder::_collectAnchors(ElementTraits traits, Attributes attribute
 }
 
 void HTMLPageBuilder::_readMeta(Attributes attributes) {
-  const char* name = attribute(attributes, "name");
-  const char* content = attribute(attributes, "content");
-  if (name == nullptr || content == nullptr) {
+  const auto name = attribute(attributes, "name");
+  const auto content = attribute(attributes, "content");
+  if (!name || !content) {
     return;
   }
-  const std::string_view kind = trimmed(name);
+  const std::string_view kind = trimmed(*name);
   if (equalsIgnoringCase(kind, "description")) {
     if (_page.description.empty()) {
-      _page.description = collapsedText(content);
+      _page.description = collapsedText(*content);
     }
   } else if (equalsIgnoringCase(kind, "keywords")) {
-    addKeywords(content, _page.keywords);
+    addKeywords(*content, _page.keywords);
   } else if (equalsIgnoringCase(kind, "robots")) {
-    _page.excludedFromSearch = _page.excludedFromSearch || forbidsIndexing(content);
+    _page.excludedFromSearch = _page.excludedFromSearch || forbidsIndexing(*content);
   }
 }
 
 void HTMLPageBuilder::_readLanguage(Attributes attributes) {
   for (const char* const name : {"lang", "xml:lang"}) {
-    const char* tag = attribute(attributes, name);
-    if (_page.language.empty() && tag != nullptr) {
-      _page.language = collapsedText(tag);
+    const auto tag = attribute(attributes, name);
+    if (_page.language.empty() && tag) {
+      _page.language = collapsedText(*tag);
     }
   }
 }
@@ -216,6 +218,9 @@ void HTMLPageBuilder::_endLink() {
 
 void HTMLPageBuilder::_finishBlock() {
   _linkStart = std::string::npos;
+  if (_run.empty()) {
+    return;
+  }
   const Context& context = _context();
   std::string text = _run.take();
   if (!hasLetterOrDigit(text)) {

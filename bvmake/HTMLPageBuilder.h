@@ -3,24 +3,31 @@
 
 #include <string>
 #include <string_view>
-#include <unordered_set>
 #include <vector>
 
 #include "bvmake/HTMLElements.h"
 #include "bvmake/Page.h"
 #include "bvmake/TextRun.h"
+#include "host/Luxwell/LUXNumbering.h"
 
 namespace bvmake {
+
+struct HTMLAttribute {
+  /// In any case.
+  std::string_view name;
+  /// Empty where it has none.
+  std::string_view value;
+};
 
 /// Takes the start tags, end tags and text of one HTML page, in order, and decides what of it is
 /// searched. Keeps a few words for each open element, so that nesting costs neither stack nor time.
 /// Thread-safety: confined to one thread.
 class HTMLPageBuilder {
  public:
-  /// Name and value, value null where the attribute has none, …, null: as the parser has them.
-  using Attributes = const char* const*;
+  using Attributes = const std::vector<HTMLAttribute>&;
 
-  void startElement(std::string_view name, Attributes attributes);
+  /// Of the attributes those are enough that isAttributeRead() names.
+  void startElement(ElementTraits traits, Attributes attributes);
   void endElement();
   void characters(std::string_view text);
 
@@ -62,7 +69,7 @@ class HTMLPageBuilder {
   Page _page;
   std::vector<Context> _open;
   std::vector<Block> _blocks;
-  std::unordered_set<std::string> _anchorsSeen;
+  LUXStringNumbering _anchorsSeen;
   TextRun _run;
   TextRun _title;
   bool _inTitle = false;

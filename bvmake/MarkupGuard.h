@@ -13,17 +13,9 @@ namespace bvmake {
 inline constexpr size_t maximumAttributeCount = 256;
 
 /// Walks once over the tags of a page. Returns what is wrong when a tag has too many attributes,
-/// else nothing; then the text is as the parser should have it. In HTML, sections that only the XML
-/// rules know (`<![CDATA[…]]>`) and the conditional marks of word processors (`<![if …]>`) are
-/// overwritten with blanks, the text of the former kept, since the HTML parser would take them for
-/// text.
+/// else nothing. In HTML, sections that only the XML rules know (`<![CDATA[…]]>`) and the
+/// conditional marks of word processors (`<![if …]>`) are overwritten with blanks, the text of the
+/// former kept, since the HTML parser would take them for text.
 std::optional<std::string> tameMarkup(std::string& text, Markup markup);
-
-/// As tameMarkup() for HTML, and leaves out markup that has no bearing on what is read of a page,
-/// which in most pages is the larger part of it and takes the parser longer than their text:
-/// attributes that nobody asks for, comments, the content of scripts and styles, all but one of the
-/// blanks before a tag, and the tags of elements such as `span` around nothing but text. Whatever
-/// is not written by the rules stays as it is, so that the parser mends it as it always does.
-std::optional<std::string> tameAndThinHTML(std::string& text);
 
 }  // namespace bvmake

@@ -5,6 +5,7 @@
 #include <sys/resource.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <chrono>
 #include <condition_variable>
 #include <deque>
@@ -55,7 +56,8 @@ class WorkerPool {
       // Lowering one's own priority needs no rights; where it fails, the work is merely quicker.
       const sched_param parameters{};
       ::pthread_setschedparam(::pthread_self(), SCHED_BATCH, &parameters);
-      ::setpriority(PRIO_PROCESS, static_cast<id_t>(::gettid()), 10);
+      const auto thread = static_cast<id_t>(::gettid());
+      ::setpriority(PRIO_PROCESS, thread, std::max(::getpriority(PRIO_PROCESS, thread), 10));
     }
     std::unique_lock lock(_mutex);
     while (true) {

@@ -22,6 +22,17 @@ void printJSON(const JSON& object, Console& console) {
 
 JSON text(std::string_view bytes) { return platform::stringByRepairingUTF8(bytes); }
 
+void addPage(const FoundPage& page, JSON& object) {
+  object["title"] = text(page.title);
+  object["book"] = text(page.bookID);
+  object["bookTitle"] = text(page.bookTitle);
+  if (page.abstract) {
+    object["abstract"] = text(*page.abstract);
+  }
+  object["url"] = text(page.url);
+  object["relevance"] = page.relevance;
+}
+
 }  // namespace
 
 void printAnswer(const Answer& answer, Console& console) {
@@ -54,14 +65,7 @@ void printAnswerAsJSON(std::string_view query, const Answer& answer, Console& co
   JSON results = JSON::array();
   for (const FoundPage& page : answer.pages) {
     JSON result;
-    result["title"] = text(page.title);
-    result["book"] = text(page.bookID);
-    result["bookTitle"] = text(page.bookTitle);
-    if (page.abstract) {
-      result["abstract"] = text(*page.abstract);
-    }
-    result["url"] = text(page.url);
-    result["relevance"] = page.relevance;
+    addPage(page, result);
     results.push_back(std::move(result));
   }
   JSON object;
@@ -69,6 +73,20 @@ void printAnswerAsJSON(std::string_view query, const Answer& answer, Console& co
   object["count"] = answer.count;
   object["results"] = std::move(results);
   printJSON(object, console);
+}
+
+void printPageChange(PageChange change, const FoundPage& page, Console& console) {
+  console.out() << (change == PageChange::found ? "+ " : "- ")
+                << console.styled(Style::title, singleLine(page.title)) << "  "
+                << console.styled(Style::book, singleLine(page.bookTitle)) << "  "
+                << console.styled(Style::url, singleLine(page.url)) << '\n';
+}
+
+void printPageChangeAsJSON(PageChange change, const FoundPage& page, Console& console) {
+  JSON object;
+  object["change"] = change == PageChange::found ? "found" : "gone";
+  addPage(page, object);
+  console.out() << object.dump() << '\n';
 }
 
 void printSuggestions(const std::vector<Suggestion>& suggestions, Console& console) {

@@ -25,6 +25,15 @@ void printAnswer(const Answer& answer, Console& console);
 /// "abstract" where there is one, "url", "relevance").
 void printAnswerAsJSON(std::string_view query, const Answer& answer, Console& console);
 
+/// A page that is found from now on, or no longer is.
+enum class PageChange { found, gone };
+
+/// One line: "+" or "-", title, book and URL.
+void printPageChange(PageChange change, const FoundPage& page, Console& console);
+
+/// One JSON object on one line: "change" ("found" or "gone") and what a result of a search has.
+void printPageChangeAsJSON(PageChange change, const FoundPage& page, Console& console);
+
 /// One suggestion a line.
 void printSuggestions(const std::vector<Suggestion>& suggestions, Console& console);
 

@@ -5,17 +5,11 @@
 #include <algorithm>
 #include <memory>
 #include <ostream>
-#include <set>
 #include <utility>
 
 #include "host/Zebrine/RNXCatalogue.h"
 #include "host/Zebrine/RNXObjectManager.h"
-#include "host/Zebrine/ZEBConstants.h"
-#include "host/Zebrine/ZEBGeneratedFiles.h"
 #include "host/Zebrine/ZEBHelpBook.h"
-#include "host/Zebrine/ZEBStrings.h"
-#include "platform/Environment.h"
-#include "platform/Files.h"
 #include "platform/RunLoop.h"
 #include "platform/ThreadSafety.h"
 #include "zeb/HelpSearch.h"

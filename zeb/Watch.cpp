@@ -1,18 +1,14 @@
 #include "zeb/Watch.h"
 
-#include <fmt/format.h>
-
 #include <map>
 #include <memory>
-#include <nlohmann/json.hpp>
 #include <ostream>
 #include <set>
-#include <vector>
 
 #include "platform/Environment.h"
-#include "platform/Strings.h"
 #include "zeb/DaemonClient.h"
 #include "zeb/HelpSearch.h"
+#include "zeb/Output.h"
 #include "zebd/Host.h"
 
 namespace zeb {
@@ -25,33 +21,6 @@ using zebd::Host;
 constexpr platform::Seconds calm{0.5};
 /// A daemon that nobody asks for anything leaves, and then there is nobody to tell of changes.
 constexpr platform::Seconds reminder{20};
-
-enum class Change { found, gone };
-
-void tell(Change change, const FoundPage& page, bool json, Console& console) {
-  console.clearProgress();
-  if (json) {
-    nlohmann::ordered_json object;
-    const auto text = [](const std::string& bytes) {
-      return platform::stringByRepairingUTF8(bytes);
-    };
-    object["change"] = change == Change::found ? "found" : "gone";
-    object["title"] = text(page.title);
-    object["book"] = text(page.bookID);
-    object["bookTitle"] = text(page.bookTitle);
-    if (page.abstract) {
-      object["abstract"] = text(*page.abstract);
-    }
-    object["url"] = text(page.url);
-    object["relevance"] = page.relevance;
-    console.out() << object.dump() << '\n';
-  } else {
-    console.out() << (change == Change::found ? "+ " : "- ")
-                  << console.styled(Style::title, singleLine(page.title)) << "  "
-                  << console.styled(Style::book, singleLine(page.bookTitle)) << "  "
-                  << console.styled(Style::url, singleLine(page.url)) << '\n';
-  }
-}
 
 /// What has been told.
 class Watch {
@@ -67,7 +36,7 @@ class Watch {
       for (const FoundPage& page : search->answer(SIZE_MAX).pages) {
         found.insert(page.url);
         if (_told.emplace(page.url, page).second) {
-          tell(Change::found, page, _command.json, _console);
+          _tell(PageChange::found, page);
           _console.out() << std::flush;
         }
       }
@@ -85,7 +54,7 @@ class Watch {
         ++told;
         continue;
       }
-      tell(Change::gone, told->second, _command.json, _console);
+      _tell(PageChange::gone, told->second);
       told = _told.erase(told);
     }
     return true;
@@ -94,6 +63,15 @@ class Watch {
   bool hasFoundAny() const { return !_told.empty(); }
 
  private:
+  void _tell(PageChange change, const FoundPage& page) {
+    _console.clearProgress();
+    if (_command.json) {
+      printPageChangeAsJSON(change, page, _console);
+    } else {
+      printPageChange(change, page, _console);
+    }
+  }
+
   HelpSearch& _search;
   const WatchCommand& _command;
   Console& _console;

@@ -84,9 +84,12 @@ void HelpService::_add(const platform::URL& address,
     return;
   }
   const auto added = std::make_shared<AddedBooks>();
+  // Until the catalogue has been changed: a scan may break off before that.
+  added->problem = "the books of this computer cannot be looked through";
   ScanRequest request;
   request.change = [added, published, address,
                     wanted = std::move(wanted)](const Catalogue& catalogue) {
+    added->problem.reset();
     added->entries = subscribe(*published, address, wanted, catalogue, added->failures);
   };
   scan(std::move(request), [added, done](const BookChanges&) { done(*added); });

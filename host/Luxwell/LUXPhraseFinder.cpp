@@ -3,9 +3,9 @@
 #include <algorithm>
 #include <bit>
 #include <functional>
+#include <limits>
 #include <span>
 
-#include "host/Luxwell/LUXPairTable.h"
 #include "host/Luxwell/LUXParallel.h"
 #include "platform/Exception.h"
 
@@ -16,30 +16,34 @@ constexpr size_t pagesAtOnce = 64;
 // More threads would mostly read the same pages once more each.
 constexpr unsigned mostPartBits = 3;
 
-// How many pairs are looked up together, so that the memory of all is on its way before the first
+// How many groups are looked up together, so that the memory of all is on its way before the first
 // is needed.
-constexpr size_t pairsAtOnce = 64;
+constexpr size_t groupsAtOnce = 64;
 
-struct Pair {
-  uint64_t hash;
-  uint32_t first;
-  uint32_t second;
-  uint32_t page;
-  bool inTitle;
-  size_t at;
-};
+constexpr uint32_t nothing = 0xFFFFFFFF;
 
-uint64_t hashOfPair(uint32_t first, uint32_t second) noexcept {
-  uint64_t hash = (static_cast<uint64_t>(first) << 32U | second) * 0xD6E8FEB86659FD93U;
-  hash ^= hash >> 32U;
-  return hash * 0xD6E8FEB86659FD93U;
+// Of a group, word by word.
+uint64_t hashWith(uint64_t hash, uint32_t word) noexcept {
+  hash = (hash ^ word) * 0xD6E8FEB86659FD93U;
+  return hash ^ hash >> 32U;
+}
+
+// What a hash was made of is spread over its bits once more, as the last word has not been.
+uint64_t finished(uint64_t hash) noexcept { return hash * 0x9E3779B97F4A7C15U; }
+
+uint64_t hashOf(const uint32_t* words, size_t length) noexcept {
+  uint64_t hash = 0;
+  for (size_t i = 0; i < length; ++i) {
+    hash = hashWith(hash, words[i]);
+  }
+  return finished(hash);
 }
 
 // Two bits for each hash: whether it was there, and whether it was there again.
 class SeenTwice {
  public:
-  explicit SeenTwice(size_t pairCount)
-      : _words(std::max<size_t>(64, std::bit_ceil(pairCount * slotsPerPair / slotsPerWord))) {}
+  explicit SeenTwice(size_t count)
+      : _words(std::max<size_t>(64, std::bit_ceil(count * slotsPerGroup / slotsPerWord))) {}
 
   void prefetch(uint64_t hash) const noexcept { __builtin_prefetch(&_words[_place(hash)]); }
 
@@ -54,7 +58,7 @@ class SeenTwice {
   }
 
  private:
-  static constexpr size_t slotsPerPair = 4;
+  static constexpr size_t slotsPerGroup = 4;
   static constexpr size_t slotsPerWord = 32;
 
   size_t _place(uint64_t hash) const noexcept { return (hash >> 5U) & (_words.size() - 1); }
@@ -65,251 +69,316 @@ class SeenTwice {
   std::vector<uint64_t> _words;
 };
 
+// A group at a place of a page.
+struct Place {
+  uint64_t hash;
+  uint32_t at;
+  uint32_t length;
+  uint32_t number;
+};
+
+// Walks over the groups of two words and more of pages whose hash is in one part. What is shared by
+// the threads that do so: a word and, in the lowest bit, whether it may stand at the edge of a
+// group, by its number.
+class Walk {
+ public:
+  Walk(const std::vector<const LUXWordSequence*>& pages, const std::vector<uint32_t>& markedWords,
+       uint32_t part, unsigned partBits)
+      : _pages(pages), _markedWords(markedWords), _part(part), _shift(63U - partBits) {}
+
+  // Calls `prepare(hash)` for each, and soon after `take(page, words, places)` for several.
+  template <typename Prepare, typename Take>
+  void forEach(Prepare prepare, Take take) {
+    std::array<Place, groupsAtOnce> places;
+    for (uint32_t page = 0; page < _pages.size(); ++page) {
+      _readPage(*_pages[page]);
+      size_t count = 0;
+      const auto size = static_cast<uint32_t>(_words.size());
+      for (uint32_t at = 0; at + 1 < size; ++at) {
+        if ((_words[at] & 1U) == 0) {
+          continue;
+        }
+        uint64_t hash = hashWith(0, _words[at] >> 1U);
+        const uint32_t end = std::min<uint32_t>(size, at + LUXPhraseMaximumLength);
+        for (uint32_t last = at + 1; last < end && !_breaksChain(page, last); ++last) {
+          hash = hashWith(hash, _words[last] >> 1U);
+          const uint64_t whole = finished(hash);
+          // The lowest bit of the shift is for one part alone.
+          if ((_words[last] & 1U) == 0 || whole >> 1U >> _shift != _part) {
+            continue;
+          }
+          prepare(whole);
+          places[count] = {whole, at, last - at + 1, nothing};
+          if (++count == places.size()) {
+            take(page, std::span<Place>(places));
+            count = 0;
+          }
+        }
+      }
+      take(page, std::span<Place>(places.data(), count));
+    }
+  }
+
+  uint32_t word(size_t at) const noexcept { return _words[at] >> 1U; }
+
+ private:
+  bool _breaksChain(uint32_t page, size_t at) const noexcept {
+    return _pages[page]->words[at].breaksChain();
+  }
+
+  void _readPage(const LUXWordSequence& page) {
+    _words.resize(page.words.size());
+    std::transform(page.words.begin(), page.words.end(), _words.begin(),
+                   [&](LUXWordSequence::Word word) { return _markedWords[word.number()]; });
+  }
+
+  const std::vector<const LUXWordSequence*>& _pages;
+  const std::vector<uint32_t>& _markedWords;
+  const uint32_t _part;
+  const unsigned _shift;
+  std::vector<uint32_t> _words;
+};
+
 }  // namespace
 
-void LUXPhraseFinder::Group::count(uint32_t page, bool inTitle) noexcept {
-  ++frequency;
-  pageCount += lastPage == page ? 0 : 1;
-  lastPage = page;
-  if (inTitle) {
-    titleCount += lastTitle == page ? 0 : 1;
-    lastTitle = page;
+struct LUXPhraseFinder::Group {
+  std::array<uint32_t, LUXPhraseMaximumLength> words{nothing, nothing, nothing, nothing};
+  uint32_t frequency = 0;
+  uint32_t pageCount = 0;
+  uint32_t lastPage = none;
+  uint32_t titleCount = 0;
+  uint32_t lastTitle = none;
+  uint32_t phrase = none;
+
+  void count(uint32_t page, bool inTitle) noexcept {
+    ++frequency;
+    pageCount += lastPage == page ? 0 : 1;
+    lastPage = page;
+    if (inTitle) {
+      titleCount += lastTitle == page ? 0 : 1;
+      lastTitle = page;
+    }
   }
-}
+
+  size_t length() const noexcept {
+    return static_cast<size_t>(std::find(words.begin() + 1, words.end(), nothing) - words.begin());
+  }
+
+  LUXPhrase asPhrase(size_t totalPageCount) const {
+    LUXPhrase result;
+    std::replace_copy(words.begin(), words.end(), result.words.begin(), nothing, 0U);
+    result.statistics.length = static_cast<uint32_t>(length());
+    result.statistics.frequency = frequency;
+    result.statistics.pageCount = pageCount;
+    result.statistics.totalPageCount = static_cast<uint32_t>(totalPageCount);
+    result.statistics.titleCount = titleCount;
+    return result;
+  }
+};
+
+// An open table of numbers, at most half full, in which one looks on from the slot that the hash
+// names.
+struct LUXPhraseFinder::Part {
+  struct Slot {
+    uint64_t hash = 0;
+    uint32_t number = none;
+  };
+
+  std::vector<Group> groups;
+  std::vector<Slot> slots{std::vector<Slot>(1024)};
+  // Page by page the groups that are there, and where each page's end.
+  std::vector<Occurrence> occurrences;
+  std::vector<size_t> ends;
+
+  size_t slotOf(uint64_t hash) const noexcept { return (hash >> 16U) & (slots.size() - 1); }
+  void prefetch(uint64_t hash) const noexcept { __builtin_prefetch(&slots[slotOf(hash)]); }
+
+  size_t find(uint64_t hash, const uint32_t* words, size_t length) const noexcept {
+    size_t slot = slotOf(hash);
+    while (slots[slot].number != none &&
+           (slots[slot].hash != hash || !isGroup(slots[slot].number, words, length))) {
+      slot = (slot + 1) & (slots.size() - 1);
+    }
+    return slot;
+  }
+
+  bool isGroup(uint32_t number, const uint32_t* words, size_t length) const noexcept {
+    const auto& group = groups[number].words;
+    return std::equal(words, words + length, group.begin()) &&
+           (length == group.size() || group[length] == nothing);
+  }
+
+  uint32_t numberOf(uint64_t hash, const uint32_t* words, size_t length) {
+    if (groups.size() * 2 >= slots.size()) {
+      grow();
+    }
+    Slot& slot = slots[find(hash, words, length)];
+    if (slot.number == none) {
+      slot = {hash, static_cast<uint32_t>(groups.size())};
+      std::copy(words, words + length, groups.emplace_back().words.begin());
+    }
+    return slot.number;
+  }
+
+  void grow() {
+    std::vector<Slot> former(slots.size() * 2);
+    former.swap(slots);
+    for (const Slot& moved : former) {
+      if (moved.number == none) {
+        continue;
+      }
+      size_t slot = slotOf(moved.hash);
+      while (slots[slot].number != none) {
+        slot = (slot + 1) & (slots.size() - 1);
+      }
+      slots[slot] = moved;
+    }
+  }
+
+  void fill(Walk walk, const Pages& pages, size_t wordCount) {
+    SeenTwice seen(wordCount);
+    const auto prefetchSeen = [&](uint64_t hash) { seen.prefetch(hash); };
+    walk.forEach(prefetchSeen, [&](uint32_t, std::span<Place> places) {
+      for (const Place& place : places) {
+        seen.note(place.hash);
+      }
+    });
+    ends.reserve(pages.size());
+    walk.forEach(prefetchSeen, [&](uint32_t page, std::span<Place> places) {
+      size_t count = 0;
+      for (const Place& place : places) {
+        if (seen.test(place.hash)) {
+          prefetch(place.hash);
+          places[count++] = place;
+        }
+      }
+      for (Place& place : places.first(count)) {
+        std::array<uint32_t, LUXPhraseMaximumLength> words;
+        for (uint32_t i = 0; i < place.length; ++i) {
+          words[i] = walk.word(place.at + i);
+        }
+        place.number = numberOf(place.hash, words.data(), place.length);
+      }
+      for (const Place& place : places.first(count)) {
+        const bool inTitle = place.at < pages[page]->titleLength;
+        groups[place.number].count(page, inTitle);
+        occurrences.push_back(place.number << 1U | (inTitle ? 1U : 0U));
+      }
+      ends.resize(page + 1);
+      ends[page] = occurrences.size();
+    });
+  }
+};
 
 void LUXPhraseFinder::find(const Pages& pages, const std::vector<uint32_t>& wordOfNumber,
                            const std::vector<bool>& mayStandAtEdge, size_t threadCount) {
-  _threadCount = threadCount;
-  _partBits = std::min(mostPartBits,
-                       static_cast<unsigned>(std::bit_width(std::max<size_t>(threadCount, 1)) - 1));
-  _partMask = (1U << _partBits) - 1;
-  size_t count = 0;
+  size_t wordCount = 0;
   for (const LUXWordSequence* const page : pages) {
-    _starts.push_back(count);
-    count += page->words.size();
+    wordCount += page->words.size();
   }
-  _starts.push_back(count);
-  if (count >> (31U - mostPartBits) != 0) {
+  if (wordCount >= std::numeric_limits<uint32_t>::max() / 2) {
     throw platform::Exception(platform::invalidArgumentException,
                               "a book too large for semantic data");
   }
+  const unsigned partBits = std::min(
+      mostPartBits, static_cast<unsigned>(std::bit_width(std::max<size_t>(threadCount, 1)) - 1));
+  std::vector<uint32_t> markedWords;
+  markedWords.reserve(wordOfNumber.size());
+  for (const uint32_t word : wordOfNumber) {
+    markedWords.push_back(word == none ? 0 : word << 1U | (mayStandAtEdge[word] ? 1U : 0U));
+  }
+  std::vector<Part> parts(size_t{1} << partBits);
+  // The words, and the groups of each part.
+  LUXInParallel(parts.size() + 1, 1, threadCount, [&](size_t piece, size_t) {
+    if (piece == parts.size()) {
+      _countWords(pages, wordOfNumber, mayStandAtEdge);
+    } else {
+      parts[piece].fill(Walk(pages, markedWords, static_cast<uint32_t>(piece), partBits), pages,
+                        wordCount >> partBits);
+    }
+  });
+  _nameGroups(parts, pages.size());
+  _countLongerPhrases(parts);
   _longer.resize(pages.size());
-  _findSingleWords(pages, wordOfNumber, mayStandAtEdge.size());
-  _keep(pages.size(), mayStandAtEdge);
-  _phraseOfWord.resize(mayStandAtEdge.size(), none);
-  for (uint32_t word = 0; word < _phraseOfWord.size(); ++word) {
-    _phraseOfWord[word] = _group(0, word).phrase;
-  }
-  _settle(pages);
-  _nextPositions.resize(count);
-  for (size_t length = 2; length <= LUXPhraseMaximumLength; ++length) {
-    _findLonger(pages);
-    _keep(pages.size(), mayStandAtEdge);
-    _settle(pages);
-  }
-  std::vector<uint32_t>().swap(_positions);
-  std::vector<uint32_t>().swap(_nextPositions);
-  _countLongerPhrases();
-  std::vector<Groups>().swap(_levels);
-  std::vector<uint32_t>().swap(_groupOfPhrase);
-}
-
-void LUXPhraseFinder::_findSingleWords(const Pages& pages,
-                                       const std::vector<uint32_t>& wordOfNumber,
-                                       size_t wordCount) {
-  _positions.resize(_starts.back());
-  LUXInParallel(pages.size(), pagesAtOnce, _threadCount, [&](size_t from, size_t to) {
+  LUXInParallel(pages.size(), pagesAtOnce, threadCount, [&](size_t from, size_t to) {
+    std::vector<Occurrence> phrases;
     for (size_t page = from; page < to; ++page) {
-      std::transform(
-          pages[page]->words.begin(), pages[page]->words.end(),
-          _positions.begin() + static_cast<std::ptrdiff_t>(_starts[page]),
-          [&](const LUXWordSequence::Word& word) { return wordOfNumber[word.number()]; });
-    }
-  });
-  Groups groups(_partMask + 1);
-  LUXInParallel(groups.size(), 1, _threadCount, [&](size_t part, size_t) {
-    groups[part].resize((wordCount + _partMask) >> _partBits);
-    for (uint32_t page = 0; page < pages.size(); ++page) {
-      const size_t titleEnd = _starts[page] + pages[page]->titleLength;
-      for (size_t at = _starts[page]; at < _starts[page + 1]; ++at) {
-        const uint32_t word = _positions[at];
-        if ((word & _partMask) == part) {
-          Group& group = groups[part][word >> _partBits];
-          group.first = word;
-          group.count(page, at < titleEnd);
+      phrases.clear();
+      for (const Part& part : parts) {
+        for (size_t at = page == 0 ? 0 : part.ends[page - 1]; at < part.ends[page]; ++at) {
+          const uint32_t phrase = part.groups[part.occurrences[at] >> 1U].phrase;
+          if (phrase != none) {
+            phrases.push_back(phrase << 1U | (part.occurrences[at] & 1U));
+          }
         }
       }
+      _longer[page].assign(phrases.begin(), phrases.end());
     }
   });
-  _levels.push_back(std::move(groups));
 }
 
-template <typename Prepare, typename Take>
-void LUXPhraseFinder::_forEachPair(const Pages& pages, uint32_t part, Prepare prepare,
-                                   Take take) const {
-  const bool partsAreWords = _levels.size() == 1;
-  std::array<Pair, pairsAtOnce> batch;
-  size_t waiting = 0;
+void LUXPhraseFinder::_countWords(const Pages& pages, const std::vector<uint32_t>& wordOfNumber,
+                                  const std::vector<bool>& mayStandAtEdge) {
+  std::vector<Group> words(mayStandAtEdge.size());
   for (uint32_t page = 0; page < pages.size(); ++page) {
-    const size_t begin = _starts[page];
-    const size_t titleEnd = begin + pages[page]->titleLength;
-    for (size_t at = begin; at + 1 < _starts[page + 1]; ++at) {
-      const uint32_t first = _positions[at];
-      const uint32_t second = _positions[at + 1];
-      if (first == none || second == none ||
-          (partsAreWords && pages[page]->words[at + 1 - begin].breaksChain())) {
-        continue;
-      }
-      const uint64_t hash = hashOfPair(first, second);
-      if ((hash >> (64U - mostPartBits) & _partMask) != part) {
-        continue;
-      }
-      prepare(hash);
-      batch[waiting] = {hash, first, second, page, at < titleEnd, at};
-      if (++waiting == batch.size()) {
-        take(std::span<Pair>(batch));
-        waiting = 0;
-      }
+    for (size_t at = 0; at < pages[page]->words.size(); ++at) {
+      words[wordOfNumber[pages[page]->words[at].number()]].count(page,
+                                                                 at < pages[page]->titleLength);
     }
   }
-  take(std::span<Pair>(batch.data(), waiting));
-}
-
-void LUXPhraseFinder::_findPart(const Pages& pages, uint32_t part, std::vector<Group>& groups) {
-  SeenTwice seen(_starts.back() >> _partBits);
-  const auto prefetch = [&](uint64_t hash) { seen.prefetch(hash); };
-  _forEachPair(pages, part, prefetch, [&](std::span<Pair> pairs) {
-    for (const Pair& pair : pairs) {
-      seen.note(pair.hash);
-    }
-  });
-  LUXPairTable numbers;
-  _forEachPair(pages, part, prefetch, [&](std::span<Pair> pairs) {
-    size_t count = 0;
-    for (const Pair& pair : pairs) {
-      if (seen.test(pair.hash)) {
-        numbers.prefetch(pair.first, pair.second);
-        pairs[count++] = pair;
-      }
-    }
-    for (Pair& pair : pairs.first(count)) {
-      const auto [number, isNew] = numbers.numberOf(pair.first, pair.second);
-      if (isNew) {
-        groups.emplace_back();
-        groups.back().first = pair.first;
-        groups.back().second = pair.second;
-      }
-      __builtin_prefetch(&groups[number], 1);
-      pair.first = number;
-      _nextPositions[pair.at] = number << _partBits | part;
-    }
-    for (const Pair& pair : pairs.first(count)) {
-      groups[pair.first].count(pair.page, pair.inTitle);
-    }
-  });
-}
-
-void LUXPhraseFinder::_findLonger(const Pages& pages) {
-  std::fill(_nextPositions.begin(), _nextPositions.end(), none);
-  Groups groups(_partMask + 1);
-  LUXInParallel(groups.size(), 1, _threadCount, [&](size_t part, size_t) {
-    _findPart(pages, static_cast<uint32_t>(part), groups[part]);
-  });
-  _levels.push_back(std::move(groups));
-  _positions.swap(_nextPositions);
-}
-
-uint32_t LUXPhraseFinder::_wordOf(size_t level, uint32_t group, size_t i) const {
-  while (level > 0) {
-    const Group& whole = _group(level, group);
-    // The i-th word is in the part without the first word, but for the first.
-    group = i > 0 ? whole.second : whole.first;
-    i = i > 0 ? i - 1 : 0;
-    --level;
-  }
-  return group;
-}
-
-void LUXPhraseFinder::_keep(size_t pageCount, const std::vector<bool>& mayStandAtEdge) {
-  const size_t level = _levels.size() - 1;
-  const uint32_t minimum = level == 0 ? 1 : minimumPageCount;
-  for (uint32_t part = 0; part <= _partMask; ++part) {
-    for (size_t place = 0; place < _levels[level][part].size(); ++place) {
-      Group& group = _levels[level][part][place];
-      const uint32_t number = static_cast<uint32_t>(place) << _partBits | part;
-      if (group.pageCount < minimum || !mayStandAtEdge[_wordOf(level, number, 0)] ||
-          !mayStandAtEdge[_wordOf(level, number, level)]) {
-        continue;
-      }
-      group.phrase = static_cast<uint32_t>(_phrases.size());
-      LUXPhrase phrase;
-      for (size_t i = 0; i <= level; ++i) {
-        phrase.words[i] = _wordOf(level, number, i);
-      }
-      phrase.statistics.length = static_cast<uint32_t>(level + 1);
-      phrase.statistics.frequency = group.frequency;
-      phrase.statistics.pageCount = group.pageCount;
-      phrase.statistics.totalPageCount = static_cast<uint32_t>(pageCount);
-      phrase.statistics.titleCount = group.titleCount;
-      _phrases.push_back(phrase);
-      _groupOfPhrase.push_back(number);
+  _phraseOfWord.resize(words.size(), none);
+  for (uint32_t word = 0; word < words.size(); ++word) {
+    if (words[word].pageCount > 0 && mayStandAtEdge[word]) {
+      words[word].words[0] = word;
+      _phraseOfWord[word] = static_cast<uint32_t>(_phrases.size());
+      _phrases.push_back(words[word].asPhrase(pages.size()));
     }
   }
 }
 
-// Notes where the phrases are that were just found, and forgets the groups that nothing longer can
-// be made of.
-void LUXPhraseFinder::_settle(const Pages& pages) {
-  const size_t level = _levels.size() - 1;
-  LUXInParallel(pages.size(), pagesAtOnce, _threadCount, [&](size_t from, size_t to) {
-    for (size_t page = from; page < to; ++page) {
-      const size_t titleEnd = _starts[page] + pages[page]->titleLength;
-      for (size_t at = _starts[page]; at < _starts[page + 1]; ++at) {
-        if (_positions[at] == none) {
-          continue;
-        }
-        const Group& group = _group(level, _positions[at]);
-        if (level > 0 && group.phrase != none) {
-          _longer[page].push_back(group.phrase << 1U | (at < titleEnd ? 1U : 0U));
-        }
-        if (group.pageCount < minimumPageCount) {
-          _positions[at] = none;
+void LUXPhraseFinder::_nameGroups(std::vector<Part>& parts, size_t pageCount) {
+  for (size_t length = 2; length <= LUXPhraseMaximumLength; ++length) {
+    for (Part& part : parts) {
+      for (Group& group : part.groups) {
+        if (group.pageCount >= minimumPageCount && group.length() == length) {
+          group.phrase = static_cast<uint32_t>(_phrases.size());
+          _phrases.push_back(group.asPhrase(pageCount));
         }
       }
     }
-  });
+  }
 }
 
-void LUXPhraseFinder::_countLongerPhrases() {
-  struct Part {
-    size_t level;
-    uint32_t group;
-  };
-  // Each group has two parts, these two each, and so on.
-  constexpr size_t mostParts = (size_t{1} << LUXPhraseMaximumLength) - 1;
-  for (size_t number = 0; number < _phrases.size(); ++number) {
-    std::array<Part, mostParts> parts;
-    size_t count = 0;
-    std::array<uint32_t, mostParts> seen;
-    size_t seenCount = 0;
-    parts[count++] = {_phrases[number].statistics.length - 1, _groupOfPhrase[number]};
-    for (size_t i = 0; i < count; ++i) {
-      const Part part = parts[i];
-      const Group& group = _group(part.level, part.group);
-      uint32_t* const seenEnd = seen.data() + seenCount;
-      if (i > 0 && group.phrase != none &&
-          std::find(seen.data(), seenEnd, group.phrase) == seenEnd) {
-        seen[seenCount++] = group.phrase;
-      }
-      if (part.level > 0) {
-        parts[count++] = {part.level - 1, group.first};
-        parts[count++] = {part.level - 1, group.second};
+uint32_t LUXPhraseFinder::_phraseOf(const std::vector<Part>& parts, const uint32_t* words,
+                                    size_t length) const {
+  if (length == 1) {
+    return _phraseOfWord[words[0]];
+  }
+  const uint64_t hash = hashOf(words, length);
+  const unsigned partBits = static_cast<unsigned>(std::bit_width(parts.size()) - 1);
+  const Part& part = parts[hash >> 1U >> (63U - partBits)];
+  const uint32_t number = part.slots[part.find(hash, words, length)].number;
+  return number == none ? none : part.groups[number].phrase;
+}
+
+void LUXPhraseFinder::_countLongerPhrases(const std::vector<Part>& parts) {
+  constexpr size_t mostInner = LUXPhraseMaximumLength * (LUXPhraseMaximumLength + 1) / 2;
+  for (const LUXPhrase& phrase : _phrases) {
+    const size_t length = phrase.statistics.length;
+    std::array<uint32_t, mostInner> seen;
+    uint32_t* end = seen.data();
+    for (size_t innerLength = 1; innerLength < length; ++innerLength) {
+      for (size_t at = 0; at + innerLength <= length; ++at) {
+        const uint32_t inner = _phraseOf(parts, phrase.words.data() + at, innerLength);
+        if (inner != none && std::find(seen.data(), end, inner) == end) {
+          *end++ = inner;
+        }
       }
     }
-    for (size_t i = 0; i < seenCount; ++i) {
-      LUXPhraseStatistics& inner = _phrases[seen[i]].statistics;
-      ++inner.longerPhraseCount;
-      inner.longerPhraseFrequency += _phrases[number].statistics.frequency;
+    for (const uint32_t* inner = seen.data(); inner != end; ++inner) {
+      LUXPhraseStatistics& statistics = _phrases[*inner].statistics;
+      ++statistics.longerPhraseCount;
+      statistics.longerPhraseFrequency += phrase.statistics.frequency;
     }
   }
 }

@@ -20,11 +20,13 @@ struct LUXPhrase {
 /// which is a word that must not stand there, in at least two pages; single words in any number of
 /// pages.
 ///
-/// Groups grow a word at a time, and only where both their parts are in two pages. Most pairs of
-/// words are there once, though: a first look over the pages notes in two bits, found by a hash,
-/// whether a pair may be there twice, and only those get a place in a table (the idea is that of
-/// J. Park, M. Chen, P. Yu, "An effective hash-based algorithm for mining association rules",
-/// 1995). So what is found once takes neither time nor memory to speak of.
+/// Most groups are there once, though: a first look over the pages notes in two bits, found by a
+/// hash, whether a group may be there twice, and only those get a place in a table (the idea is
+/// that of J. Park, M. Chen, P. Yu, "An effective hash-based algorithm for mining association
+/// rules", 1995). So what is found once takes neither time nor memory to speak of. Groups of all
+/// lengths are looked for at once: to let them grow a word at a time, and only where both their
+/// parts are there twice, takes more looks over the pages and keeps groups that begin or end in
+/// words such as "of", of which there are more than of all others.
 /// Thread-safety: confined to one thread; once find() has returned, immutable.
 class LUXPhraseFinder {
  public:
@@ -63,54 +65,21 @@ class LUXPhraseFinder {
  private:
   static constexpr uint32_t none = 0xFFFFFFFF;
 
-  /// A group of words that occurs; its parts are the groups that lack its last or first word.
-  struct Group {
-    uint32_t first = none;
-    uint32_t second = none;
-    uint32_t frequency = 0;
-    uint32_t pageCount = 0;
-    uint32_t lastPage = none;
-    uint32_t titleCount = 0;
-    uint32_t lastTitle = none;
-    uint32_t phrase = none;
-
-    void count(uint32_t page, bool inTitle) noexcept;
-  };
-  /// The groups of one length. They are found in parts, each by one thread: the lowest bits of a
-  /// group's number say which part it is in.
-  using Groups = std::vector<std::vector<Group>>;
+  /// A group of words that occurs.
+  struct Group;
+  /// The groups whose hash says that they belong together. Each part is found by one thread.
+  struct Part;
   using Pages = std::vector<const LUXWordSequence*>;
   /// A phrase of two words or more, and in the lowest bit whether it is in the title.
   using Occurrence = uint32_t;
 
-  const Group& _group(size_t level, uint32_t number) const noexcept {
-    return _levels[level][number & _partMask][number >> _partBits];
-  }
-  void _findSingleWords(const Pages& pages, const std::vector<uint32_t>& wordOfNumber,
-                        size_t wordCount);
-  void _findLonger(const Pages& pages);
-  void _findPart(const Pages& pages, uint32_t part, std::vector<Group>& groups);
-  template <typename Prepare, typename Take>
-  void _forEachPair(const Pages& pages, uint32_t part, Prepare prepare, Take take) const;
-  void _keep(size_t pageCount, const std::vector<bool>& mayStandAtEdge);
-  void _settle(const Pages& pages);
-  void _countLongerPhrases();
-  uint32_t _wordOf(size_t level, uint32_t group, size_t i) const;
+  void _countWords(const Pages& pages, const std::vector<uint32_t>& wordOfNumber,
+                   const std::vector<bool>& mayStandAtEdge);
+  void _nameGroups(std::vector<Part>& parts, size_t pageCount);
+  void _countLongerPhrases(const std::vector<Part>& parts);
+  uint32_t _phraseOf(const std::vector<Part>& parts, const uint32_t* words, size_t length) const;
 
-  size_t _threadCount = 1;
-  unsigned _partBits = 0;
-  uint32_t _partMask = 0;
-  /// By length less one.
-  std::vector<Groups> _levels;
-  /// Where each page's words begin in the two below.
-  std::vector<size_t> _starts;
-  /// The group that begins at each word of each page, of the longest length so far, where it is in
-  /// two pages.
-  std::vector<uint32_t> _positions;
-  std::vector<uint32_t> _nextPositions;
   std::vector<LUXPhrase> _phrases;
-  /// Which group a phrase is, by number.
-  std::vector<uint32_t> _groupOfPhrase;
   std::vector<uint32_t> _phraseOfWord;
   std::vector<std::vector<Occurrence>> _longer;
 };

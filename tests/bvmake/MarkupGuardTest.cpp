@@ -79,42 +79,5 @@ TEST(MarkupGuard, markupCutOffAnywhereIsWalkedToTheEnd) {
   }
 }
 
-std::string thinned(std::string text) {
-  EXPECT_FALSE(tameAndThinHTML(text));
-  return text;
-}
-
-TEST(MarkupGuard, onlyAttributesThatSomebodyAsksForStay) {
-  EXPECT_EQ(thinned("<p class=\"a\" id=\"b\" title='c'>d"), "<p id=\"b\">d");
-  EXPECT_EQ(thinned("<p class=a id=b>d"), "<p class=a id=b>d");
-  EXPECT_EQ(thinned("<p style=\"color: red\">a<p style=\"display: none\">b"),
-            "<p>a<p style=\"display: none\">b");
-  EXPECT_EQ(thinned("<p CLASS=\"a\" Hidden>b"), "<p Hidden>b");
-}
-
-TEST(MarkupGuard, commentsScriptsAndAllButOneBlankAreLeftOut) {
-  EXPECT_EQ(thinned("a<!-- b -->c"), "ac");
-  EXPECT_EQ(thinned("a<script src='b'>if (c < d) {}</script>e"), "a<script></script>e");
-  EXPECT_EQ(thinned("<ul>\n    <li>a\n  </ul>"), "<ul>\n<li>a\n</ul>");
-}
-
-TEST(MarkupGuard, marksAroundTextAreLeftOutInTheBody) {
-  EXPECT_EQ(thinned("<body><code><span>a</span> <b>b</b></code>"), "<body>a b");
-  EXPECT_EQ(thinned("<span>a</span>"), "<span>a</span>");
-  EXPECT_EQ(thinned("<body><span id='x'>a</span>"), "<body><span id='x'>a</span>");
-  EXPECT_EQ(thinned("<body><em>a<br>b</em>"), "<body><em>a<br>b</em>");
-  EXPECT_EQ(thinned("<body><em>a</i></em>"), "<body><em>a</i></em>");
-  const std::string text(1000, 'a');
-  EXPECT_EQ(thinned("<body><em>" + text + "</em>"), "<body><em>" + text + "</em>");
-}
-
-TEST(MarkupGuard, attributesThatAreLeftOutAreCountedAllTheSame) {
-  std::string tag = "<p";
-  for (size_t i = 0; i <= maximumAttributeCount; ++i) {
-    tag += " class='a'";
-  }
-  EXPECT_TRUE(tameAndThinHTML(tag).has_value());
-}
-
 }  // namespace
 }  // namespace bvmake

@@ -70,28 +70,10 @@ class DaemonWorld {
     return contents(output);
   }
   std::string status() const { return gdbus({"org.zeb.Help1.Status"}); }
-  bool isThere() const {
-    const std::string output = folder.path("owner");
-    std::filesystem::remove(output);
-    ChildProcess(
-        "/usr/bin/gdbus",
-        {"call", "--address", bus.address(), "--dest", "org.freedesktop.DBus", "--object-path", "/",
-         "--method", "org.freedesktop.DBus.NameHasOwner", "org.zeb.zebd"},
-        output)
-        .wait();
-    return contents(output) == "(true,)\n";
-  }
+  bool isThere() const { return _askBus("NameHasOwner") == "(true,)\n"; }
   /// The daemon that runs; 0 where none does.
   pid_t daemonProcess() const {
-    const std::string output = folder.path("pid");
-    std::filesystem::remove(output);
-    ChildProcess(
-        "/usr/bin/gdbus",
-        {"call", "--address", bus.address(), "--dest", "org.freedesktop.DBus", "--object-path", "/",
-         "--method", "org.freedesktop.DBus.GetConnectionUnixProcessID", "org.zeb.zebd"},
-        output)
-        .wait();
-    const std::string answer = contents(output);
+    const std::string answer = _askBus("GetConnectionUnixProcessID");
     constexpr std::string_view start = "(uint32 ";
     return answer.starts_with(start) ? std::atoi(answer.c_str() + start.size()) : 0;
   }
@@ -155,6 +137,18 @@ class DaemonWorld {
   PrivateBus bus;
 
  private:
+  /// What the bus itself says of the daemon's name.
+  std::string _askBus(const std::string& member) const {
+    const std::string output = folder.path("of the bus");
+    std::filesystem::remove(output);
+    ChildProcess(
+        "/usr/bin/gdbus",
+        {"call", "--address", bus.address(), "--dest", "org.freedesktop.DBus", "--object-path", "/",
+         "--method", "org.freedesktop.DBus." + member, "org.zeb.zebd"},
+        output)
+        .wait();
+    return contents(output);
+  }
   /// The bus reads its service files when it starts, and notices changes late.
   std::string _configuration(const std::string& options) const {
     folder.write("services/org.zeb.zebd.service",

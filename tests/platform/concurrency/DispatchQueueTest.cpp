@@ -41,7 +41,8 @@ TEST(DispatchQueue, aSerialQueueMayRunAtBackgroundPriority) {
     queue->async([&order, i] { order.push_back(i); });
   }
   queue->sync([&] { background = priority(); });
-  EXPECT_GT(background, normal);
+  // More where the whole process was started with more.
+  EXPECT_EQ(background, std::max(normal, 10));
   EXPECT_TRUE(std::is_sorted(order.begin(), order.end()));
   EXPECT_EQ(order.size(), 50U);
 }

@@ -5,6 +5,7 @@
 #include <sys/resource.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <atomic>
 
 #include "platform/DispatchQueue.h"
@@ -67,7 +68,8 @@ TEST(WorkerThreads, backgroundTasksRunAtLowerPriority) {
       ThreadPriority::background);
   done.wait();
   done.wait();
-  EXPECT_GT(background, normal);
+  // More where the whole process was started with more.
+  EXPECT_EQ(background, std::max(normal, 10));
 }
 
 TEST(WorkerThreads, namedThreadKnowsItsName) {
