@@ -111,6 +111,16 @@ TEST(PlainHTML, everyElementInEveryOtherIsReadAsTheParserReadsIt) {
   EXPECT_GT(plain, 8000U);
 }
 
+TEST(PlainHTML, findsCharactersThatTheParserDropsAnywhere) {
+  const std::string page = plainStart + "<p>\t\r\n0123456789</p>\n</body></html>";
+  ASSERT_TRUE(isPlain(page));
+  for (size_t at = 0; at <= page.size(); ++at) {
+    std::string other = page;
+    other.insert(at, 1, at % 2 == 0 ? '\x1F' : '\x0B');
+    EXPECT_FALSE(isPlain(other)) << at;
+  }
+}
+
 TEST(PlainHTML, doesNotFollowPagesThatNestDeep) {
   std::string html = plainStart;
   for (int i = 0; i < 300; ++i) {
