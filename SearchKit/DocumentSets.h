@@ -73,11 +73,8 @@ class Accumulator {
 
   /// `frequency` is above zero.
   void add(uint32_t document, float frequency) noexcept {
-    float& sum = _frequencies[document];
-    if (sum == 0) {
-      _touched.insert(document);
-    }
-    sum += frequency;
+    _frequencies[document] += frequency;
+    _touched.insert(document);
   }
 
   float frequency(uint32_t document) const noexcept { return _frequencies[document]; }

@@ -46,7 +46,6 @@ std::optional<IndexView> IndexView::make(std::span<const uint8_t> bytes) {
       !view._hasSoundTables()) {
     return std::nullopt;
   }
-  view._mergedCount = view._measuredMergedCount();
   view._scorer = Scorer(view._documentCount, view._wordCount);
   return view;
 }
@@ -84,19 +83,6 @@ bool IndexView::_hasSoundTables() const noexcept {
          holds(Section::documentLengths, _documentCount, format::documentLengthLength) &&
          holds(Section::blockKeys, _blockCount, format::blockKeyLength) &&
          holds(Section::blockOffsets, _blockCount, format::blockOffsetLength);
-}
-
-// An index without merged lists, or with a table of them that does not fit, is searched without.
-uint32_t IndexView::_measuredMergedCount() const noexcept {
-  const std::span<const uint8_t> merged = section(Section::mergedLists);
-  if (merged.size() < format::mergedHeaderLength) {
-    return 0;
-  }
-  const auto count = load<uint32_t>(merged.data());
-  return count <= (merged.size() - format::mergedHeaderLength) /
-                      (format::mergedKeyLength + format::mergedEntryLength)
-             ? count
-             : 0;
 }
 
 std::optional<IndexView::Texts> IndexView::documentTexts(uint32_t id) const noexcept {

@@ -65,7 +65,18 @@ class IndexView {
   }
 
   /// How many prefixes have merged lists; their tables can be read without a further check.
-  uint32_t mergedCount() const noexcept { return _mergedCount; }
+  /// Counted anew at each call: to look at them when an index is opened would be to wait for memory
+  /// that most searches do not touch. Without lists, or with a table of them that does not fit,
+  /// there are none.
+  uint32_t mergedCount() const noexcept {
+    const std::span<const uint8_t> merged = section(format::Section::mergedLists);
+    if (merged.size() < format::mergedHeaderLength) {
+      return 0;
+    }
+    const auto count = format::load<uint32_t>(merged.data());
+    const uint64_t length = uint64_t{count} * (format::mergedKeyLength + format::mergedEntryLength);
+    return length <= merged.size() - format::mergedHeaderLength ? count : 0;
+  }
 
   uint64_t mergedKey(uint32_t list) const noexcept {
     return format::load<uint64_t>(section(format::Section::mergedLists).data() +
@@ -77,7 +88,7 @@ class IndexView {
   uint32_t mergedEntry(uint32_t list, size_t field) const noexcept {
     return format::load<uint32_t>(section(format::Section::mergedLists).data() +
                                   format::mergedHeaderLength +
-                                  size_t{_mergedCount} * format::mergedKeyLength +
+                                  size_t{mergedCount()} * format::mergedKeyLength +
                                   size_t{list} * format::mergedEntryLength + field);
   }
 
@@ -95,7 +106,6 @@ class IndexView {
  private:
   bool _readSections(std::span<const uint8_t> bytes, size_t headerEnd, uint32_t count);
   bool _hasSoundTables() const noexcept;
-  uint32_t _measuredMergedCount() const noexcept;
 
   uint32_t _documentCount = 0;
   uint32_t _termCount = 0;
@@ -104,7 +114,6 @@ class IndexView {
   uint32_t _minimumTermLength = 0;
   uint32_t _termsPerBlock = 0;
   uint32_t _blockCount = 0;
-  uint32_t _mergedCount = 0;
   bool _hasPackedPositions = false;
   bool _hasBlocksOfFields = false;
   Scorer _scorer;

@@ -3,12 +3,15 @@
 #include <algorithm>
 #include <cstring>
 
+#include "SearchKit/MergedLists.h"
 #include "SearchKit/SKIndex.h"
 
 namespace searchkit {
 namespace {
 
 using format::Section;
+
+constexpr uint32_t fewestBlocksWithManyLists = 256;
 
 // Looks for the first term of a block that is not below the one sought. Terms are not put together:
 // it is enough to know how many bytes each shares with the one sought.
@@ -207,12 +210,12 @@ WordPostings findByCursor(const IndexView& view, const QueryWord& word) noexcept
 
 bool findMerged(const IndexView& view, uint64_t key, WordPostings& found) noexcept {
   static_assert(format::mergedKeyLength == sizeof key);
-  if (view.mergedCount() == 0) {
+  const uint32_t count = view.mergedCount();
+  if (count == 0) {
     return false;
   }
   const uint32_t above =
-      countUpTo(view.section(Section::mergedLists).data() + format::mergedHeaderLength,
-                view.mergedCount(), key);
+      countUpTo(view.section(Section::mergedLists).data() + format::mergedHeaderLength, count, key);
   if (above == 0 || view.mergedKey(above - 1) != key) {
     return false;
   }
@@ -223,7 +226,7 @@ bool findMerged(const IndexView& view, uint64_t key, WordPostings& found) noexce
   found.range.begin = std::min<uint64_t>(view.mergedEntry(low, format::mergedOffsetAt), limit);
   // A list tells its own length; that of the next one is not needed.
   found.range.end = limit;
-  if (low + 1 < view.mergedCount()) {
+  if (low + 1 < count) {
     found.range.end = std::clamp<uint64_t>(view.mergedEntry(low + 1, format::mergedOffsetAt),
                                            found.range.begin, limit);
   }
@@ -353,11 +356,23 @@ WordPostings findInEntries(const IndexView& view, const QueryWord& word) noexcep
 }  // namespace
 
 WordPostings findWord(const IndexView& view, const QueryWord& word) noexcept {
+  const auto find = [&] {
+    return view.hasBlocksOfFields() ? findInFields(view, word) : findInEntries(view, word);
+  };
   WordPostings found;
-  if (word.mergedKey != 0 && findMerged(view, word.mergedKey, found)) {
-    return found;
+  if (word.mergedKey == 0) {
+    return find();
   }
-  return view.hasBlocksOfFields() ? findInFields(view, word) : findInEntries(view, word);
+  // In a small book hardly any prefix has a list, and whether it may have one is known soon.
+  const bool isSmall = view.blockCount() < fewestBlocksWithManyLists;
+  if (isSmall) {
+    found = find();
+    if (found.range.length() < MergedListsBuilder::fewestPostings) {
+      return found;
+    }
+  }
+  WordPostings merged;
+  return findMerged(view, word.mergedKey, merged) ? merged : isSmall ? found : find();
 }
 
 }  // namespace searchkit

@@ -12,7 +12,7 @@ namespace searchkit {
 namespace {
 
 constexpr size_t postingsPerSlice = 1024;
-constexpr uint64_t fewestPagesAPosting = 4;
+constexpr uint64_t mostPagesAByte = 4;
 constexpr uint64_t densest = 16;
 
 // Stable, and for a few steps without the memory that the library's algorithm takes.
@@ -82,22 +82,26 @@ size_t WordSearch::deliver(size_t maximumCount, SKDocumentID* ids, float* scores
     _hasBegun = true;
     _openList(_inlineSteps[0]);
   }
-  PostingsCursor at = _cursor;
   size_t count = 0;
-  while (count < maximumCount && at.next()) {
-    ids[count] = at.document();
+  _cursor.read(maximumCount, [&](uint32_t document, uint32_t weight) {
+    ids[count] = document;
     if (scores != nullptr) {
-      scores[count] = _scorer.score(_idf, _factor * static_cast<float>(at.weight()),
-                                    _view.documentLength(at.document()));
+      scores[count] =
+          _scorer.score(_idf, _factor * static_cast<float>(weight), _view.documentLength(document));
     }
     ++count;
-  }
-  _cursor = at;
+  });
   return count;
 }
 
+// Whether most hits are about to be left out again: it would be a waste to score them first.
+bool WordSearch::_isNextOneListOfAll() const noexcept {
+  const Step* const next = _steps() + _step + 1;
+  return _step + 1 < _stepCount && next->action == Action::intersect && next->postings.isOneList;
+}
+
 bool WordSearch::run(WorkBudget& budget, SearchScratch& scratch) {
-  const Step* const steps = _moreSteps.empty() ? _inlineSteps : _moreSteps.data();
+  const Step* const steps = _steps();
   for (; _step < _stepCount; ++_step) {
     const Step& step = steps[_step];
     if (!_hasBegun) {
@@ -145,15 +149,18 @@ void WordSearch::_begin(const Step& step, SearchScratch& scratch) {
   _openLists(step);
   if (step.action == Action::push) {
     scratch.hits.clear();
+    _areHitsScored = !step.postings.isOneList || !_isNextOneListOfAll();
   } else if (step.action == Action::unite) {
     scratch.others.clear();
   }
   // With many postings for the number of pages it takes less to write to all places than to look
-  // which are wanted, and to clear them all than to know which were used.
-  _isDense = !step.postings.isOneList &&
-             step.postings.range.length() * fewestPagesAPosting > _view.documentCount();
-  if (!step.postings.isOneList && !_isDense && step.action != Action::push &&
-      step.action != Action::unite) {
+  // which are wanted, and to clear them all than to know which were used. Where all that have any
+  // are wanted, to look at all of them takes longer than to clear them.
+  const bool isFiltered = step.action == Action::intersect || step.action == Action::addScores;
+  _isDense =
+      !step.postings.isOneList &&
+      step.postings.range.length() * (isFiltered ? mostPagesAByte : 1) > _view.documentCount();
+  if (!step.postings.isOneList && !_isDense && isFiltered) {
     for (const Hit& hit : scratch.hits) {
       scratch.filter.insert(hit.document);
     }
@@ -186,17 +193,18 @@ bool WordSearch::_readOneList(const Step& step, WorkBudget& budget, SearchScratc
       for (const Hit& hit : scratch.hits) {
         scratch.found.put(hit.document, hit.score);
       }
-      scratch.others.resize(_cursor.listDocumentCount() + size_t{1});
+      // Of the list's pages only those are kept, and one is written that is not.
+      scratch.others.resize(scratch.hits.size() + 1);
     }
   }
   while (_isInList) {
     size_t count = 0;
     switch (step.action) {
       case Action::push:
-        count = _append(scratch.hits);
+        count = _areHitsScored ? _append<true>(scratch.hits) : _append<false>(scratch.hits);
         break;
       case Action::unite:
-        count = _append(scratch.others);
+        count = _append<true>(scratch.others);
         break;
       case Action::intersect:
         count = _isDense ? _look(scratch) : _compare<false>(scratch.hits);
@@ -218,44 +226,53 @@ bool WordSearch::_readOneList(const Step& step, WorkBudget& budget, SearchScratc
   } else if (step.action == Action::intersect) {
     scratch.hits.resize(_keptAt);
   }
+  if (step.action == Action::push) {
+    _pushedIdf = _idf;
+  } else {
+    _areHitsScored = true;
+  }
   return true;
 }
 
 // The next slice of the list; the hits so far are in the accumulator. Every page is written, and
 // only kept when it is one of them: no branch that could not be predicted. What is kept is scored.
 size_t WordSearch::_look(SearchScratch& scratch) {
-  PostingsCursor at = _cursor;
-  size_t left = postingsPerSlice;
   size_t kept = _keptAt;
   Hit* const others = scratch.others.data();
-  while (left > 0 && (_isInList = at.next())) {
-    --left;
-    others[kept] = {at.document(), static_cast<float>(at.weight())};
-    kept += scratch.found.frequency(at.document()) > 0 ? 1 : 0;
-  }
+  const float* const found = scratch.found.data();
+  const size_t count =
+      _cursor.read(postingsPerSlice, [&kept, others, found](uint32_t document, uint32_t weight) {
+        others[kept] = {document, static_cast<float>(weight)};
+        kept += found[document] > 0 ? 1 : 0;
+      });
   for (size_t i = _keptAt; i < kept; ++i) {
     const uint32_t document = others[i].document;
     others[i].score =
-        scratch.found.frequency(document) +
+        _scored({document, found[document]}) +
         _scorer.score(_idf, _factor * others[i].score, _view.documentLength(document));
   }
-  _cursor = at;
   _keptAt = kept;
-  return postingsPerSlice - left;
+  _isInList = _cursor.isInList();
+  return count;
+}
+
+// A hit's score so far.
+float WordSearch::_scored(const Hit& hit) const noexcept {
+  return _areHitsScored ? hit.score
+                        : _scorer.score(_pushedIdf, hit.score, _view.documentLength(hit.document));
 }
 
 // The next slice of the list, at the end of the hits.
+template <bool scores>
 size_t WordSearch::_append(HitList& hits) {
-  PostingsCursor at = _cursor;
-  size_t left = postingsPerSlice;
-  while (left > 0 && (_isInList = at.next())) {
-    --left;
-    const uint32_t document = at.document();
-    hits.push_back({document, _scorer.score(_idf, _factor * static_cast<float>(at.weight()),
-                                            _view.documentLength(document))});
-  }
-  _cursor = at;
-  return postingsPerSlice - left;
+  const size_t count = _cursor.read(postingsPerSlice, [&](uint32_t document, uint32_t weight) {
+    const float frequency = _factor * static_cast<float>(weight);
+    hits.push_back({document, scores
+                                  ? _scorer.score(_idf, frequency, _view.documentLength(document))
+                                  : frequency});
+  });
+  _isInList = _cursor.isInList();
+  return count;
 }
 
 // The next slice of the list, beside the hits. Those that are to be kept move forward.
@@ -280,7 +297,7 @@ size_t WordSearch::_compare(HitList& hits) {
       const float score = _scorer.score(_idf, _factor * static_cast<float>(at.weight()),
                                         _view.documentLength(document));
       Hit& to = keepsAll ? hits[read] : hits[kept++];
-      to = {document, hits[read].score + score};
+      to = {document, _scored(hits[read]) + score};
       ++read;
     }
   }
@@ -315,35 +332,31 @@ bool WordSearch::_accumulate(SearchScratch& scratch, size_t& units) {
   PostingsCursor at = _cursor;
   size_t left = postingsPerSlice;
   bool hasMore = true;
-  bool isInList = _isInList;
   float factor = _factor;
   uint64_t documentSum = _documentSum;
   float* const frequencies = scratch.found.data();
   while (left > 0) {
-    --left;
-    if (!isInList) {
+    if (!at.isInList()) {
       if (!at.beginList()) {
         hasMore = false;
         break;
       }
+      --left;
       documentSum += at.listDocumentCount();
       factor = _isExactNext ? exactFactor : 1;
       _isExactNext = false;
     }
-    isInList = at.next();
-    if (!isInList) {
-      continue;
-    }
-    const float frequency = factor * static_cast<float>(at.weight());
-    if (gathering == Gathering::dense) {
-      frequencies[at.document()] += frequency;
-    } else if (gathering == Gathering::sparse || scratch.filter.has(at.document())) {
-      scratch.found.add(at.document(), frequency);
-    }
+    left -= at.read(left, [&](uint32_t document, uint32_t weight) {
+      const float frequency = factor * static_cast<float>(weight);
+      if (gathering == Gathering::dense) {
+        frequencies[document] += frequency;
+      } else if (gathering == Gathering::sparse || scratch.filter.has(document)) {
+        scratch.found.add(document, frequency);
+      }
+    });
   }
   units = postingsPerSlice - left;
   _cursor = at;
-  _isInList = isInList;
   _factor = factor;
   _documentSum = documentSum;
   return hasMore;

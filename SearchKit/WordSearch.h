@@ -70,6 +70,9 @@ class WordSearch {
   enum class Gathering : uint8_t { sparse, filtered, dense };
   template <Gathering gathering>
   bool _accumulate(SearchScratch& scratch, size_t& units);
+  bool _isNextOneListOfAll() const noexcept;
+  float _scored(const Hit& hit) const noexcept;
+  template <bool scores>
   size_t _append(HitList& hits);
   size_t _look(SearchScratch& scratch);
   template <bool keepsAll>
@@ -88,6 +91,9 @@ class WordSearch {
     Step _inlineSteps[inlineStepCount];
   };
   std::vector<Step> _moreSteps;
+  const Step* _steps() const noexcept {
+    return _moreSteps.empty() ? _inlineSteps : _moreSteps.data();
+  }
   size_t _stepCount = 0;
 
   // What is going on.
@@ -96,6 +102,9 @@ class WordSearch {
   bool _isInList = false;
   bool _isExactNext = false;
   bool _isDense = false;
+  /// The hits' scores are scores; else still frequencies of the first word.
+  bool _areHitsScored = true;
+  float _pushedIdf = 0;
   float _factor = 1;
   float _idf = 0;
   uint64_t _documentSum = 0;

@@ -6,10 +6,10 @@
 #include <array>
 #include <iterator>
 #include <string>
-#include <unordered_map>
 #include <vector>
 
 #include "bvmake/ASCII.h"
+#include "host/Luxwell/LUXNumbering.h"
 
 namespace bvmake {
 
@@ -164,18 +164,17 @@ constexpr Row rows[] = {
 };
 static_assert(std::size(rows) <= maximumElementCount);
 
-// More than any name that is known.
+// No less than any name that is known.
 constexpr size_t longestName = 20;
 
 class Elements {
  public:
   Elements() {
-    _elements.reserve(std::size(rows));
     for (const Row& row : rows) {
       const htmlElemDesc* const known = htmlTagLookup(reinterpret_cast<const xmlChar*>(row.name));
       const bool isEmpty = known != nullptr && known->empty != 0;
-      _elements.push_back({row.name, row.traits | (isEmpty ? noContent : 0), _elements.size()});
-      _byName.emplace(row.name, &_elements.back());
+      const size_t number = _names.numberOf(row.name);
+      _elements.push_back({row.name, row.traits | (isEmpty ? noContent : 0), number});
     }
   }
 
@@ -188,13 +187,13 @@ class Elements {
     }
     std::transform(name.begin(), name.end(), lower.begin(),
                    [](char character) { return lowercased(character); });
-    const auto found = _byName.find({lower.data(), name.size()});
-    return found == _byName.end() ? nullptr : found->second;
+    const uint32_t number = _names.find({lower.data(), name.size()});
+    return number == LUXStringNumbering::none ? nullptr : &_elements[number];
   }
 
  private:
+  LUXStringNumbering _names;
   std::vector<HTMLElement> _elements;
-  std::unordered_map<std::string_view, const HTMLElement*> _byName;
 };
 
 const Elements& elements() {

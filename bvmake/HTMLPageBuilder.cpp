@@ -44,7 +44,9 @@ void HTMLPageBuilder::startElement(ElementTraits traits, Attributes attributes) 
   if (const auto role = attribute(attributes, "role")) {
     traits |= traitsOfRole(*role);
   }
-  _collectAnchors(traits, attributes);
+  if (!attributes.empty()) {
+    _collectAnchors(traits, attributes);
+  }
 
   Context context = _context();
   context.traits = traits;
@@ -149,7 +151,7 @@ bool HTMLPageBuilder::_isHidden(ElementTraits traits, Attributes attributes) con
   if ((traits & elementtraits::hiddenUnlessOpen) != 0 && !attribute(attributes, "open")) {
     return true;
   }
-  if ((traits & elementtraits::root) != 0) {
+  if ((traits & elementtraits::root) != 0 || attributes.empty()) {
     return false;
   }
   if (const auto hidden = attribute(attributes, "hidden")) {
@@ -166,7 +168,7 @@ bool HTMLPageBuilder::_isHidden(ElementTraits traits, Attributes attributes) con
 
 void HTMLPageBuilder::_collectAnchors(ElementTraits traits, Attributes attributes) {
   const auto add = [this](std::optional<std::string_view> name) {
-    if (name && !name->empty() && _anchorsSeen.emplace(*name).second) {
+    if (name && !name->empty() && _anchorsSeen.numberOf(*name) == _page.anchors.size()) {
       _page.anchors.emplace_back(*name);
     }
   };
@@ -216,6 +218,9 @@ void HTMLPageBuilder::_endLink() {
 
 void HTMLPageBuilder::_finishBlock() {
   _linkStart = std::string::npos;
+  if (_run.empty()) {
+    return;
+  }
   const Context& context = _context();
   std::string text = _run.take();
   if (!hasLetterOrDigit(text)) {

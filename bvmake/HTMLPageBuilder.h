@@ -3,12 +3,12 @@
 
 #include <string>
 #include <string_view>
-#include <unordered_set>
 #include <vector>
 
 #include "bvmake/HTMLElements.h"
 #include "bvmake/Page.h"
 #include "bvmake/TextRun.h"
+#include "host/Luxwell/LUXNumbering.h"
 
 namespace bvmake {
 
@@ -69,7 +69,7 @@ class HTMLPageBuilder {
   Page _page;
   std::vector<Context> _open;
   std::vector<Block> _blocks;
-  std::unordered_set<std::string> _anchorsSeen;
+  LUXStringNumbering _anchorsSeen;
   TextRun _run;
   TextRun _title;
   bool _inTitle = false;

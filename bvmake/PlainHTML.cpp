@@ -196,16 +196,16 @@ class PlainReader {
   }
 
   bool _readMarkup() {
-    if (_startsWith("</")) {
-      return _readEndTag();
+    switch (_at + 1 < _text.size() ? _text[_at + 1] : '\0') {
+      case '/':
+        return _readEndTag();
+      case '!':
+        return _startsWith("<!--") ? _skipComment() : _skipDeclaration();
+      case '?':
+        return _skipDeclaration();
+      default:
+        return _readStartTag();
     }
-    if (_startsWith("<!--")) {
-      return _skipComment();
-    }
-    if (_startsWith("<!") || _startsWith("<?")) {
-      return _skipDeclaration();
-    }
-    return _readStartTag();
   }
 
   bool _skipComment() {
@@ -295,7 +295,7 @@ class PlainReader {
         ++_at;
         return true;
       }
-      if (_startsWith("/>")) {
+      if (_isAt('/') && _startsWith("/>")) {
         _at += 2;
         isEmpty = true;
         return true;

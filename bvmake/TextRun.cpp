@@ -2,8 +2,7 @@
 
 #include <unicode/uchar.h>
 
-#include <utility>
-
+#include "bvmake/ASCII.h"
 #include "bvmake/UTF8.h"
 #include "platform/Strings.h"
 
@@ -72,7 +71,10 @@ void TextRun::truncate(size_t length) {
 
 std::string TextRun::take() {
   _blankPending = false;
-  return std::exchange(_text, {});
+  // What the run has grown to serves the next text, too.
+  std::string text = _text;
+  _text.clear();
+  return text;
 }
 
 std::string collapsedText(std::string_view text) {
@@ -84,6 +86,13 @@ std::string collapsedText(std::string_view text) {
 bool hasLetterOrDigit(std::string_view text) noexcept {
   size_t at = 0;
   while (at < text.size()) {
+    if (isVisibleASCII(text[at])) {
+      if (isLetter(text[at]) || (text[at] >= '0' && text[at] <= '9')) {
+        return true;
+      }
+      ++at;
+      continue;
+    }
     const UChar32 character = nextCharacter(text, at);
     if (character >= 0 && u_isalnum(character) != 0) {
       return true;

@@ -122,18 +122,19 @@ struct Character {
   size_t end = 0;
 };
 
-// The character that begins at `at`, which is inside the text.
-Character characterAt(std::string_view text, size_t at) noexcept {
-  const auto byte = static_cast<unsigned char>(text[at]);
-  if (byte < 0x80) {
-    return {asciiClasses[byte], at + 1};
-  }
+Character wideCharacterAt(std::string_view text, size_t at) noexcept {
   auto end = static_cast<int64_t>(at);
   const auto* const bytes = reinterpret_cast<const uint8_t*>(text.data());
   UChar32 character = 0;
   U8_NEXT(bytes, end, static_cast<int64_t>(text.size()), character);
   return {character < 0 ? CharacterClass::other : classOfWideCharacter(character),
           static_cast<size_t>(end)};
+}
+
+// The character that begins at `at`, which is inside the text.
+inline Character characterAt(std::string_view text, size_t at) noexcept {
+  const auto byte = static_cast<unsigned char>(text[at]);
+  return byte < 0x80 ? Character{asciiClasses[byte], at + 1} : wideCharacterAt(text, at);
 }
 
 CharacterClass classAt(std::string_view text, size_t at) noexcept {
@@ -263,10 +264,18 @@ std::string formOfFolded(std::string_view folded) {
 }
 
 std::string_view withoutPossessive(std::string_view surface) noexcept {
-  for (const std::string_view ending : {"'s", "'S", "\u2019s", "\u2019S"}) {
-    if (surface.size() > ending.size() && surface.ends_with(ending)) {
-      return surface.substr(0, surface.size() - ending.size());
-    }
+  // What the ending ends with tells most words from those that have one.
+  if (surface.size() < 3 || (surface.back() != 's' && surface.back() != 'S')) {
+    return surface;
+  }
+  const std::string_view word = surface.substr(0, surface.size() - 1);
+  if (word.back() == '\'') {
+    return word.substr(0, word.size() - 1);
+  }
+  constexpr std::string_view quotationMark = "\u2019";
+  if (word.back() == quotationMark.back() && word.size() > quotationMark.size() &&
+      word.ends_with(quotationMark)) {
+    return word.substr(0, word.size() - quotationMark.size());
   }
   return surface;
 }

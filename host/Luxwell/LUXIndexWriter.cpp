@@ -32,6 +32,8 @@ constexpr uint32_t none = 0xFFFFFFFF;
 // A piece of work while the data are written.
 constexpr size_t pagesAtOnce = 64;
 
+constexpr size_t wordsAhead = 8;
+
 // A word as it is written.
 struct Surface {
   // None for what leaves nothing when it is folded.
@@ -125,8 +127,8 @@ struct LUXIndexWriter::Implementation {
   std::vector<HelpTokenizer::Segment> segments;
   std::string buffer;
 
-  uint32_t surfaceNumber(std::string_view text) {
-    const uint32_t number = surfaceNames.numberOf(text);
+  uint32_t surfaceNumber(std::string_view text, const LUXStringNumbering::Key& key) {
+    const uint32_t number = surfaceNames.numberOf(text, key);
     if (number == surfaces.size()) {
       Surface surface;
       if (const auto word = tokenizer->wordOfSurface(text)) {
@@ -143,10 +145,23 @@ struct LUXIndexWriter::Implementation {
   void addText(std::string_view text, Page& page) {
     segments.clear();
     tokenizer->segmentsOfText(text, segments, buffer);
+    // The words after the one that is looked up are on their way meanwhile.
+    std::array<LUXStringNumbering::Key, wordsAhead> ahead;
+    const auto prepare = [&](size_t i) {
+      if (i < segments.size()) {
+        ahead[i % wordsAhead] = LUXStringNumbering::keyOf(segments[i].surface);
+        surfaceNames.prefetch(ahead[i % wordsAhead]);
+      }
+    };
+    for (size_t i = 0; i < wordsAhead; ++i) {
+      prepare(i);
+    }
     bool breaks = true;
-    for (const HelpTokenizer::Segment& segment : segments) {
+    for (size_t i = 0; i < segments.size(); ++i) {
+      const HelpTokenizer::Segment& segment = segments[i];
       breaks = breaks || segment.breaksChain;
-      const uint32_t number = surfaceNumber(segment.surface);
+      const uint32_t number = surfaceNumber(segment.surface, ahead[i % wordsAhead]);
+      prepare(i + wordsAhead);
       if (surfaces[number].form == none) {
         continue;
       }

@@ -55,7 +55,7 @@ std::string_view LUXStringNumbering::operator[](size_t number) const noexcept {
   return std::string_view(_text).substr(from, _ends[number] - from);
 }
 
-LUXStringNumbering::Key LUXStringNumbering::_keyOf(std::string_view string) noexcept {
+LUXStringNumbering::Key LUXStringNumbering::keyOf(std::string_view string) noexcept {
   uint64_t bytes = 0;
   const char* at = string.data();
   size_t left = string.size();
@@ -71,30 +71,35 @@ LUXStringNumbering::Key LUXStringNumbering::_keyOf(std::string_view string) noex
 size_t LUXStringNumbering::_slotOf(std::string_view string, const Key& key) const noexcept {
   const size_t mask = _slots.size() - 1;
   size_t slot = hashOf(key.bytes, key.length) & mask;
-  while (
-      _slots[slot].number != none &&
-      (_slots[slot].key != key || (string.size() > 8 && (*this)[_slots[slot].number] != string))) {
+  while (_slots[slot].number != none &&
+         (_slots[slot].bytes != key.bytes || _slots[slot].length != key.length ||
+          (string.size() > 8 && (*this)[_slots[slot].number] != string))) {
     slot = (slot + 1) & mask;
   }
   return slot;
 }
 
-uint32_t LUXStringNumbering::find(std::string_view string) const noexcept {
-  return _slots.empty() ? none : _slots[_slotOf(string, _keyOf(string))].number;
+void LUXStringNumbering::prefetch(const Key& key) const noexcept {
+  if (!_slots.empty()) {
+    __builtin_prefetch(&_slots[hashOf(key.bytes, key.length) & (_slots.size() - 1)]);
+  }
 }
 
-uint32_t LUXStringNumbering::numberOf(std::string_view string) {
+uint32_t LUXStringNumbering::find(std::string_view string) const noexcept {
+  return _slots.empty() ? none : _slots[_slotOf(string, keyOf(string))].number;
+}
+
+uint32_t LUXStringNumbering::numberOf(std::string_view string, const Key& key) {
   if (isFull(_ends.size(), _slots.size())) {
     _grow();
   }
-  const Key key = _keyOf(string);
   Slot& slot = _slots[_slotOf(string, key)];
   if (slot.number == none) {
     if (_text.size() + string.size() > std::numeric_limits<uint32_t>::max() ||
         _ends.size() + 2 >= none) {
       throwTooMany();
     }
-    slot = {key, static_cast<uint32_t>(_ends.size())};
+    slot = {key.bytes, key.length, static_cast<uint32_t>(_ends.size())};
     _text += string;
     _ends.push_back(static_cast<uint32_t>(_text.size()));
   }
@@ -109,7 +114,7 @@ void LUXStringNumbering::_grow() {
     if (moved.number == none) {
       continue;
     }
-    size_t slot = hashOf(moved.key.bytes, moved.key.length) & mask;
+    size_t slot = hashOf(moved.bytes, moved.length) & mask;
     while (_slots[slot].number != none) {
       slot = (slot + 1) & mask;
     }

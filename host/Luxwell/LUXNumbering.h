@@ -13,17 +13,6 @@ class LUXStringNumbering {
  public:
   static constexpr uint32_t none = 0xFFFFFFFF;
 
-  /// The number of a string, which is added when it is new. Throws platform::Exception
-  /// "InvalidArgumentException" when there is no room: 4 GiB of text or as many strings as numbers.
-  uint32_t numberOf(std::string_view string);
-  /// none for a string that was not added.
-  uint32_t find(std::string_view string) const noexcept;
-
-  size_t size() const noexcept { return _ends.size(); }
-  /// Valid until the next string is added.
-  std::string_view operator[](size_t number) const noexcept;
-
- private:
   /// What stands beside the number tells strings of up to eight bytes apart, so that looking for
   /// one of these, as most words are, reads no string.
   struct Key {
@@ -32,12 +21,30 @@ class LUXStringNumbering {
     uint32_t length = 0;
     friend bool operator==(const Key&, const Key&) = default;
   };
+
+  /// The number of a string, which is added when it is new. Throws platform::Exception
+  /// "InvalidArgumentException" when there is no room: 4 GiB of text or as many strings as numbers.
+  uint32_t numberOf(std::string_view string) { return numberOf(string, keyOf(string)); }
+
+  /// The same for whoever has the key, and so can have the memory that is looked at fetched ahead.
+  uint32_t numberOf(std::string_view string, const Key& key);
+  static Key keyOf(std::string_view string) noexcept;
+  void prefetch(const Key& key) const noexcept;
+
+  /// none for a string that was not added.
+  uint32_t find(std::string_view string) const noexcept;
+
+  size_t size() const noexcept { return _ends.size(); }
+  /// Valid until the next string is added.
+  std::string_view operator[](size_t number) const noexcept;
+
+ private:
   struct Slot {
-    Key key;
+    uint64_t bytes = 0;
+    uint32_t length = 0;
     uint32_t number = none;
   };
 
-  static Key _keyOf(std::string_view string) noexcept;
   size_t _slotOf(std::string_view string, const Key& key) const noexcept;
   void _grow();
 

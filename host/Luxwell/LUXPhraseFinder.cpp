@@ -13,8 +13,9 @@ namespace {
 
 constexpr size_t pagesAtOnce = 64;
 
-// More threads would mostly read the same pages once more each.
-constexpr unsigned mostPartBits = 3;
+// A part has about so many words of the book; each part more is one more look over all of them.
+constexpr size_t wordsOfPart = size_t{8} << 20U;
+constexpr unsigned mostPartBits = 6;
 
 // How many groups are looked up together, so that the memory of all is on its way before the first
 // is needed.
@@ -28,7 +29,7 @@ uint64_t hashWith(uint64_t hash, uint32_t word) noexcept {
   return hash ^ hash >> 32U;
 }
 
-// What a hash was made of is spread over its bits once more, as the last word has not been.
+// The last word has not been spread over all bits yet.
 uint64_t finished(uint64_t hash) noexcept { return hash * 0x9E3779B97F4A7C15U; }
 
 uint64_t hashOf(const uint32_t* words, size_t length) noexcept {
@@ -69,77 +70,109 @@ class SeenTwice {
   std::vector<uint64_t> _words;
 };
 
+// An open table of the numbers of groups, at most half full, in which one looks on from the slot
+// that the hash names.
+class GroupTable {
+ public:
+  static constexpr uint32_t none = nothing;
+
+  void prefetch(uint64_t hash) const noexcept { __builtin_prefetch(&_slots[_slotOf(hash)]); }
+
+  // The number of the group of this hash, of which `isGroup(number)` says whether it is the one.
+  template <typename IsGroup>
+  uint32_t find(uint64_t hash, IsGroup isGroup) const {
+    size_t slot = _slotOf(hash);
+    while (_slots[slot].number != none &&
+           (_slots[slot].tag != _tagOf(hash) || !isGroup(_slots[slot].number))) {
+      slot = (slot + 1) & (_slots.size() - 1);
+    }
+    return _slots[slot].number;
+  }
+
+  // Adds the number that comes next, which is not there. `hashOfNumber` has the hash of each.
+  template <typename HashOfNumber>
+  void add(uint64_t hash, HashOfNumber hashOfNumber) {
+    if (size_t{2} * _count >= _slots.size()) {
+      const size_t size = _slots.size() * 2;
+      _slots = {};
+      _slots.resize(size);
+      for (uint32_t number = 0; number < _count; ++number) {
+        _put(hashOfNumber(number), number);
+      }
+    }
+    _put(hash, _count++);
+  }
+
+ private:
+  struct Slot {
+    uint32_t tag = 0;
+    uint32_t number = none;
+  };
+
+  size_t _slotOf(uint64_t hash) const noexcept { return (hash >> 16U) & (_slots.size() - 1); }
+  static uint32_t _tagOf(uint64_t hash) noexcept { return static_cast<uint32_t>(hash); }
+
+  void _put(uint64_t hash, uint32_t number) noexcept {
+    size_t slot = _slotOf(hash);
+    while (_slots[slot].number != none) {
+      slot = (slot + 1) & (_slots.size() - 1);
+    }
+    _slots[slot] = {_tagOf(hash), number};
+  }
+
+  std::vector<Slot> _slots{std::vector<Slot>(1024)};
+  uint32_t _count = 0;
+};
+
 // A group at a place of a page.
 struct Place {
   uint64_t hash;
   uint32_t at;
   uint32_t length;
-  uint32_t number;
-};
-
-// Walks over the groups of two words and more of pages whose hash is in one part. What is shared by
-// the threads that do so: a word and, in the lowest bit, whether it may stand at the edge of a
-// group, by its number.
-class Walk {
- public:
-  Walk(const std::vector<const LUXWordSequence*>& pages, const std::vector<uint32_t>& markedWords,
-       uint32_t part, unsigned partBits)
-      : _pages(pages), _markedWords(markedWords), _part(part), _shift(63U - partBits) {}
-
-  // Calls `prepare(hash)` for each, and soon after `take(page, words, places)` for several.
-  template <typename Prepare, typename Take>
-  void forEach(Prepare prepare, Take take) {
-    std::array<Place, groupsAtOnce> places;
-    for (uint32_t page = 0; page < _pages.size(); ++page) {
-      _readPage(*_pages[page]);
-      size_t count = 0;
-      const auto size = static_cast<uint32_t>(_words.size());
-      for (uint32_t at = 0; at + 1 < size; ++at) {
-        if ((_words[at] & 1U) == 0) {
-          continue;
-        }
-        uint64_t hash = hashWith(0, _words[at] >> 1U);
-        const uint32_t end = std::min<uint32_t>(size, at + LUXPhraseMaximumLength);
-        for (uint32_t last = at + 1; last < end && !_breaksChain(page, last); ++last) {
-          hash = hashWith(hash, _words[last] >> 1U);
-          const uint64_t whole = finished(hash);
-          // The lowest bit of the shift is for one part alone.
-          if ((_words[last] & 1U) == 0 || whole >> 1U >> _shift != _part) {
-            continue;
-          }
-          prepare(whole);
-          places[count] = {whole, at, last - at + 1, nothing};
-          if (++count == places.size()) {
-            take(page, std::span<Place>(places));
-            count = 0;
-          }
-        }
-      }
-      take(page, std::span<Place>(places.data(), count));
-    }
-  }
-
-  uint32_t word(size_t at) const noexcept { return _words[at] >> 1U; }
-
- private:
-  bool _breaksChain(uint32_t page, size_t at) const noexcept {
-    return _pages[page]->words[at].breaksChain();
-  }
-
-  void _readPage(const LUXWordSequence& page) {
-    _words.resize(page.words.size());
-    std::transform(page.words.begin(), page.words.end(), _words.begin(),
-                   [&](LUXWordSequence::Word word) { return _markedWords[word.number()]; });
-  }
-
-  const std::vector<const LUXWordSequence*>& _pages;
-  const std::vector<uint32_t>& _markedWords;
-  const uint32_t _part;
-  const unsigned _shift;
-  std::vector<uint32_t> _words;
 };
 
 }  // namespace
+
+struct LUXPhraseFinder::Book {
+  const Pages& pages;
+  const std::vector<uint32_t>& wordOfNumber;
+  size_t threadCount;
+  // A word and, in the lowest bit, whether it may stand at the edge of a group, by its number.
+  std::vector<uint32_t> markedWords;
+  // Where each page's words begin in all of them.
+  std::vector<uint32_t> starts;
+  // Of each word of the book, whether a pair begins there that may stand for itself but is not in
+  // two pages. Known when pairs were found.
+  std::vector<uint8_t> isRarePair;
+
+  Book(const Pages& itsPages, const std::vector<uint32_t>& words,
+       const std::vector<bool>& mayStandAtEdge, size_t threads)
+      : pages(itsPages), wordOfNumber(words), threadCount(std::max<size_t>(threads, 1)) {
+    markedWords.reserve(words.size());
+    for (const uint32_t word : words) {
+      markedWords.push_back(word == none ? 0 : word << 1U | (mayStandAtEdge[word] ? 1U : 0U));
+    }
+    size_t count = 0;
+    for (const LUXWordSequence* const page : pages) {
+      starts.push_back(static_cast<uint32_t>(count));
+      count += page->words.size();
+    }
+    if (count >= std::numeric_limits<uint32_t>::max() / 2) {
+      throw platform::Exception(platform::invalidArgumentException,
+                                "a book too large for semantic data");
+    }
+    starts.push_back(static_cast<uint32_t>(count));
+    isRarePair.resize(count);
+  }
+
+  // Different places may be set by different threads.
+  void setRarePair(uint32_t page, uint32_t at) noexcept { isRarePair[starts[page] + at] = 1; }
+
+  unsigned partBits() const {
+    const size_t parts = std::max(threadCount, (starts.back() + wordsOfPart - 1) / wordsOfPart);
+    return std::min(mostPartBits, static_cast<unsigned>(std::bit_width(parts - 1)));
+  }
+};
 
 struct LUXPhraseFinder::Group {
   std::array<uint32_t, LUXPhraseMaximumLength> words{nothing, nothing, nothing, nothing};
@@ -148,6 +181,7 @@ struct LUXPhraseFinder::Group {
   uint32_t lastPage = none;
   uint32_t titleCount = 0;
   uint32_t lastTitle = none;
+  // Its number among those of its part that are phrases.
   uint32_t phrase = none;
 
   void count(uint32_t page, bool inTitle) noexcept {
@@ -158,6 +192,11 @@ struct LUXPhraseFinder::Group {
       titleCount += lastTitle == page ? 0 : 1;
       lastTitle = page;
     }
+  }
+
+  bool isOf(const uint32_t* others, size_t length) const noexcept {
+    return std::equal(others, others + length, words.begin()) &&
+           (length == words.size() || words[length] == nothing);
   }
 
   size_t length() const noexcept {
@@ -176,152 +215,171 @@ struct LUXPhraseFinder::Group {
   }
 };
 
-// An open table of numbers, at most half full, in which one looks on from the slot that the hash
-// names.
 struct LUXPhraseFinder::Part {
-  struct Slot {
-    uint64_t hash = 0;
-    uint32_t number = none;
-  };
-
-  std::vector<Group> groups;
-  std::vector<Slot> slots{std::vector<Slot>(1024)};
-  // Page by page the groups that are there, and where each page's end.
+  uint32_t number = 0;
+  unsigned bits = 0;
+  size_t shortest = 0;
+  size_t longest = 0;
+  // What is found: phrases, where they are page by page, and where each page's places end.
+  std::vector<LUXPhrase> phrases;
   std::vector<Occurrence> occurrences;
-  std::vector<size_t> ends;
+  std::vector<uint32_t> ends;
 
-  size_t slotOf(uint64_t hash) const noexcept { return (hash >> 16U) & (slots.size() - 1); }
-  void prefetch(uint64_t hash) const noexcept { __builtin_prefetch(&slots[slotOf(hash)]); }
-
-  size_t find(uint64_t hash, const uint32_t* words, size_t length) const noexcept {
-    size_t slot = slotOf(hash);
-    while (slots[slot].number != none &&
-           (slots[slot].hash != hash || !isGroup(slots[slot].number, words, length))) {
-      slot = (slot + 1) & (slots.size() - 1);
-    }
-    return slot;
-  }
-
-  bool isGroup(uint32_t number, const uint32_t* words, size_t length) const noexcept {
-    const auto& group = groups[number].words;
-    return std::equal(words, words + length, group.begin()) &&
-           (length == group.size() || group[length] == nothing);
-  }
-
-  uint32_t numberOf(uint64_t hash, const uint32_t* words, size_t length) {
-    if (groups.size() * 2 >= slots.size()) {
-      grow();
-    }
-    Slot& slot = slots[find(hash, words, length)];
-    if (slot.number == none) {
-      slot = {hash, static_cast<uint32_t>(groups.size())};
-      std::copy(words, words + length, groups.emplace_back().words.begin());
-    }
-    return slot.number;
-  }
-
-  void grow() {
-    std::vector<Slot> former(slots.size() * 2);
-    former.swap(slots);
-    for (const Slot& moved : former) {
-      if (moved.number == none) {
-        continue;
-      }
-      size_t slot = slotOf(moved.hash);
-      while (slots[slot].number != none) {
-        slot = (slot + 1) & (slots.size() - 1);
-      }
-      slots[slot] = moved;
-    }
-  }
-
-  void fill(Walk walk, const Pages& pages, size_t wordCount) {
-    SeenTwice seen(wordCount);
-    const auto prefetchSeen = [&](uint64_t hash) { seen.prefetch(hash); };
-    walk.forEach(prefetchSeen, [&](uint32_t, std::span<Place> places) {
-      for (const Place& place : places) {
-        seen.note(place.hash);
-      }
-    });
-    ends.reserve(pages.size());
-    walk.forEach(prefetchSeen, [&](uint32_t page, std::span<Place> places) {
+  // Calls `prepare(hash)` for each group of the part, and soon after `take(page, words, places)`
+  // for several of one page; the last call for each page may have none.
+  template <typename Prepare, typename Take>
+  void forEachGroup(const Book& book, Prepare prepare, Take take) const {
+    std::array<Place, groupsAtOnce> places;
+    std::vector<uint32_t> words;
+    for (uint32_t page = 0; page < book.pages.size(); ++page) {
+      const std::vector<LUXWordSequence::Word>& written = book.pages[page]->words;
+      const auto size = static_cast<uint32_t>(written.size());
+      words.resize(size);
+      std::transform(written.begin(), written.end(), words.begin(),
+                     [&](LUXWordSequence::Word word) { return book.markedWords[word.number()]; });
+      const uint8_t* const isRarePair =
+          shortest == 2 ? nullptr : book.isRarePair.data() + book.starts[page];
       size_t count = 0;
-      for (const Place& place : places) {
-        if (seen.test(place.hash)) {
-          prefetch(place.hash);
-          places[count++] = place;
+      for (uint32_t at = 0; at + shortest <= size; ++at) {
+        if ((words[at] & 1U) == 0) {
+          continue;
+        }
+        uint64_t hash = hashWith(0, words[at] >> 1U);
+        const auto end = static_cast<uint32_t>(std::min<size_t>(size, at + longest));
+        for (uint32_t last = at + 1; last < end && !written[last].breaksChain() &&
+                                     (isRarePair == nullptr || isRarePair[last - 1] == 0);
+             ++last) {
+          hash = hashWith(hash, words[last] >> 1U);
+          if ((words[last] & 1U) == 0 || last - at + 1 < shortest) {
+            continue;
+          }
+          const uint64_t whole = finished(hash);
+          // Shifted twice, as there may be one part alone.
+          if (whole >> 1U >> (63U - bits) != number) {
+            continue;
+          }
+          prepare(whole);
+          places[count] = {whole, at, last - at + 1};
+          if (++count == places.size()) {
+            take(page, words, std::span<const Place>(places));
+            count = 0;
+          }
         }
       }
-      for (Place& place : places.first(count)) {
-        std::array<uint32_t, LUXPhraseMaximumLength> words;
-        for (uint32_t i = 0; i < place.length; ++i) {
-          words[i] = walk.word(place.at + i);
+      take(page, words, std::span<const Place>(places.data(), count));
+    }
+  }
+
+  void find(Book& book) {
+    SeenTwice seen(book.starts.back() >> bits);
+    const auto prefetchSeen = [&](uint64_t hash) { seen.prefetch(hash); };
+    forEachGroup(book, prefetchSeen,
+                 [&](uint32_t, const std::vector<uint32_t>&, std::span<const Place> places) {
+                   for (const Place& place : places) {
+                     seen.note(place.hash);
+                   }
+                 });
+    std::vector<Group> groups;
+    GroupTable table;
+    struct Found {
+      uint32_t group;
+      uint32_t at;
+    };
+    std::vector<Found> found;
+    std::vector<uint32_t> foundEnds(book.pages.size());
+    std::array<Place, groupsAtOnce> again;
+    forEachGroup(
+        book, prefetchSeen,
+        [&](uint32_t page, const std::vector<uint32_t>& words, std::span<const Place> places) {
+          size_t count = 0;
+          for (const Place& place : places) {
+            if (seen.test(place.hash)) {
+              table.prefetch(place.hash);
+              again[count++] = place;
+            } else if (place.length == 2) {
+              book.setRarePair(page, place.at);
+            }
+          }
+          const size_t first = found.size();
+          for (const Place& place : std::span<const Place>(again.data(), count)) {
+            found.push_back({_numberOf(place, words, groups, table), place.at});
+            __builtin_prefetch(&groups[found.back().group], 1);
+          }
+          for (size_t i = first; i < found.size(); ++i) {
+            groups[found[i].group].count(page, found[i].at < book.pages[page]->titleLength);
+          }
+          foundEnds[page] = static_cast<uint32_t>(found.size());
+        });
+    _name(groups, book.pages.size());
+    ends.reserve(book.pages.size());
+    size_t at = 0;
+    for (uint32_t page = 0; page < book.pages.size(); ++page) {
+      for (; at < foundEnds[page]; ++at) {
+        const Group& group = groups[found[at].group];
+        if (group.phrase != none) {
+          const bool inTitle = found[at].at < book.pages[page]->titleLength;
+          occurrences.push_back(group.phrase << 1U | (inTitle ? 1U : 0U));
+        } else if (group.length() == 2) {
+          book.setRarePair(page, found[at].at);
         }
-        place.number = numberOf(place.hash, words.data(), place.length);
       }
-      for (const Place& place : places.first(count)) {
-        const bool inTitle = place.at < pages[page]->titleLength;
-        groups[place.number].count(page, inTitle);
-        occurrences.push_back(place.number << 1U | (inTitle ? 1U : 0U));
+      ends.push_back(static_cast<uint32_t>(occurrences.size()));
+    }
+    occurrences.shrink_to_fit();
+  }
+
+ private:
+  static uint32_t _numberOf(const Place& place, const std::vector<uint32_t>& markedWords,
+                            std::vector<Group>& groups, GroupTable& table) {
+    std::array<uint32_t, LUXPhraseMaximumLength> words;
+    for (uint32_t i = 0; i < place.length; ++i) {
+      words[i] = markedWords[place.at + i] >> 1U;
+    }
+    uint32_t number = table.find(
+        place.hash, [&](uint32_t other) { return groups[other].isOf(words.data(), place.length); });
+    if (number == GroupTable::none) {
+      number = static_cast<uint32_t>(groups.size());
+      table.add(place.hash, [&](uint32_t other) {
+        return hashOf(groups[other].words.data(), groups[other].length());
+      });
+      std::copy_n(words.begin(), place.length, groups.emplace_back().words.begin());
+    }
+    return number;
+  }
+
+  void _name(std::vector<Group>& groups, size_t pageCount) {
+    phrases.reserve(
+        static_cast<size_t>(std::count_if(groups.begin(), groups.end(), [](const Group& group) {
+          return group.pageCount >= minimumPageCount;
+        })));
+    for (size_t length = shortest; length <= longest; ++length) {
+      for (Group& group : groups) {
+        if (group.pageCount >= minimumPageCount && group.length() == length) {
+          group.phrase = static_cast<uint32_t>(phrases.size());
+          phrases.push_back(group.asPhrase(pageCount));
+        }
       }
-      ends.resize(page + 1);
-      ends[page] = occurrences.size();
-    });
+    }
   }
 };
 
 void LUXPhraseFinder::find(const Pages& pages, const std::vector<uint32_t>& wordOfNumber,
                            const std::vector<bool>& mayStandAtEdge, size_t threadCount) {
-  size_t wordCount = 0;
-  for (const LUXWordSequence* const page : pages) {
-    wordCount += page->words.size();
-  }
-  if (wordCount >= std::numeric_limits<uint32_t>::max() / 2) {
-    throw platform::Exception(platform::invalidArgumentException,
-                              "a book too large for semantic data");
-  }
-  const unsigned partBits = std::min(
-      mostPartBits, static_cast<unsigned>(std::bit_width(std::max<size_t>(threadCount, 1)) - 1));
-  std::vector<uint32_t> markedWords;
-  markedWords.reserve(wordOfNumber.size());
-  for (const uint32_t word : wordOfNumber) {
-    markedWords.push_back(word == none ? 0 : word << 1U | (mayStandAtEdge[word] ? 1U : 0U));
-  }
-  std::vector<Part> parts(size_t{1} << partBits);
-  // The words, and the groups of each part.
-  LUXInParallel(parts.size() + 1, 1, threadCount, [&](size_t piece, size_t) {
-    if (piece == parts.size()) {
-      _countWords(pages, wordOfNumber, mayStandAtEdge);
-    } else {
-      parts[piece].fill(Walk(pages, markedWords, static_cast<uint32_t>(piece), partBits), pages,
-                        wordCount >> partBits);
-    }
-  });
-  _nameGroups(parts, pages.size());
-  _countLongerPhrases(parts);
+  Book book(pages, wordOfNumber, mayStandAtEdge, threadCount);
   _longer.resize(pages.size());
-  LUXInParallel(pages.size(), pagesAtOnce, threadCount, [&](size_t from, size_t to) {
-    for (size_t page = from; page < to; ++page) {
-      for (const Part& part : parts) {
-        for (size_t at = page == 0 ? 0 : part.ends[page - 1]; at < part.ends[page]; ++at) {
-          const uint32_t phrase = part.groups[part.occurrences[at] >> 1U].phrase;
-          if (phrase != none) {
-            _longer[page].push_back(phrase << 1U | (part.occurrences[at] & 1U));
-          }
-        }
-      }
-      _longer[page].shrink_to_fit();
-    }
-  });
+  _findWords(book, mayStandAtEdge);
+  _findGroups(book, 2, 2);
+  _findGroups(book, 3, LUXPhraseMaximumLength);
+  _countLongerPhrases();
 }
 
-void LUXPhraseFinder::_countWords(const Pages& pages, const std::vector<uint32_t>& wordOfNumber,
-                                  const std::vector<bool>& mayStandAtEdge) {
+void LUXPhraseFinder::_findWords(const Book& book, const std::vector<bool>& mayStandAtEdge) {
   std::vector<Group> words(mayStandAtEdge.size());
-  for (uint32_t page = 0; page < pages.size(); ++page) {
-    for (size_t at = 0; at < pages[page]->words.size(); ++at) {
-      words[wordOfNumber[pages[page]->words[at].number()]].count(page,
-                                                                 at < pages[page]->titleLength);
+  for (uint32_t page = 0; page < book.pages.size(); ++page) {
+    const LUXWordSequence& sequence = *book.pages[page];
+    for (size_t at = 0; at < sequence.words.size(); ++at) {
+      const uint32_t word = book.wordOfNumber[sequence.words[at].number()];
+      words[word].count(page, at < sequence.titleLength);
     }
   }
   _phraseOfWord.resize(words.size(), none);
@@ -329,37 +387,63 @@ void LUXPhraseFinder::_countWords(const Pages& pages, const std::vector<uint32_t
     if (words[word].pageCount > 0 && mayStandAtEdge[word]) {
       words[word].words[0] = word;
       _phraseOfWord[word] = static_cast<uint32_t>(_phrases.size());
-      _phrases.push_back(words[word].asPhrase(pages.size()));
+      _phrases.push_back(words[word].asPhrase(book.pages.size()));
     }
   }
 }
 
-void LUXPhraseFinder::_nameGroups(std::vector<Part>& parts, size_t pageCount) {
-  for (size_t length = 2; length <= LUXPhraseMaximumLength; ++length) {
-    for (Part& part : parts) {
-      for (Group& group : part.groups) {
-        if (group.pageCount >= minimumPageCount && group.length() == length) {
-          group.phrase = static_cast<uint32_t>(_phrases.size());
-          _phrases.push_back(group.asPhrase(pageCount));
+void LUXPhraseFinder::_findGroups(Book& book, size_t shortest, size_t longest) {
+  std::vector<Part> parts(size_t{1} << book.partBits());
+  LUXInParallel(parts.size(), 1, book.threadCount, [&](size_t number, size_t) {
+    Part& part = parts[number];
+    part.number = static_cast<uint32_t>(number);
+    part.bits = book.partBits();
+    part.shortest = shortest;
+    part.longest = longest;
+    part.find(book);
+  });
+  std::vector<uint32_t> firstPhrases;
+  size_t count = _phrases.size();
+  for (const Part& part : parts) {
+    firstPhrases.push_back(static_cast<uint32_t>(count));
+    count += part.phrases.size();
+  }
+  _phrases.reserve(count);
+  for (Part& part : parts) {
+    _phrases.insert(_phrases.end(), part.phrases.begin(), part.phrases.end());
+    part.phrases = {};
+  }
+  LUXInParallel(book.pages.size(), pagesAtOnce, book.threadCount, [&](size_t from, size_t to) {
+    std::vector<Occurrence> all;
+    for (size_t page = from; page < to; ++page) {
+      all = _longer[page];
+      for (size_t number = 0; number < parts.size(); ++number) {
+        const Part& part = parts[number];
+        for (size_t at = page == 0 ? 0 : part.ends[page - 1]; at < part.ends[page]; ++at) {
+          all.push_back(part.occurrences[at] + (firstPhrases[number] << 1U));
         }
       }
+      std::vector<Occurrence>(all).swap(_longer[page]);
     }
-  }
+  });
 }
 
-uint32_t LUXPhraseFinder::_phraseOf(const std::vector<Part>& parts, const uint32_t* words,
-                                    size_t length) const {
-  if (length == 1) {
-    return _phraseOfWord[words[0]];
+void LUXPhraseFinder::_countLongerPhrases() {
+  const auto hashOfPhrase = [this](uint32_t number) {
+    return hashOf(_phrases[number].words.data(), _phrases[number].statistics.length);
+  };
+  GroupTable table;
+  for (uint32_t number = 0; number < _phrases.size(); ++number) {
+    table.add(hashOfPhrase(number), hashOfPhrase);
   }
-  const uint64_t hash = hashOf(words, length);
-  const unsigned partBits = static_cast<unsigned>(std::bit_width(parts.size()) - 1);
-  const Part& part = parts[hash >> 1U >> (63U - partBits)];
-  const uint32_t number = part.slots[part.find(hash, words, length)].number;
-  return number == none ? none : part.groups[number].phrase;
-}
-
-void LUXPhraseFinder::_countLongerPhrases(const std::vector<Part>& parts) {
+  const auto phraseOf = [&](const uint32_t* words, size_t length) {
+    return length == 1 ? _phraseOfWord[*words]
+                       : table.find(hashOf(words, length), [&](uint32_t number) {
+                           const LUXPhrase& phrase = _phrases[number];
+                           return phrase.statistics.length == length &&
+                                  std::equal(words, words + length, phrase.words.begin());
+                         });
+  };
   constexpr size_t mostInner = LUXPhraseMaximumLength * (LUXPhraseMaximumLength + 1) / 2;
   for (const LUXPhrase& phrase : _phrases) {
     const size_t length = phrase.statistics.length;
@@ -367,7 +451,7 @@ void LUXPhraseFinder::_countLongerPhrases(const std::vector<Part>& parts) {
     uint32_t* end = seen.data();
     for (size_t innerLength = 1; innerLength < length; ++innerLength) {
       for (size_t at = 0; at + innerLength <= length; ++at) {
-        const uint32_t inner = _phraseOf(parts, phrase.words.data() + at, innerLength);
+        const uint32_t inner = phraseOf(phrase.words.data() + at, innerLength);
         if (inner != none && std::find(seen.data(), end, inner) == end) {
           *end++ = inner;
         }

@@ -23,10 +23,11 @@ struct LUXPhrase {
 /// Most groups are there once, though: a first look over the pages notes in two bits, found by a
 /// hash, whether a group may be there twice, and only those get a place in a table (the idea is
 /// that of J. Park, M. Chen, P. Yu, "An effective hash-based algorithm for mining association
-/// rules", 1995). So what is found once takes neither time nor memory to speak of. Groups of all
-/// lengths are looked for at once: to let them grow a word at a time, and only where both their
-/// parts are there twice, takes more looks over the pages and keeps groups that begin or end in
-/// words such as "of", of which there are more than of all others.
+/// rules", 1995). So what is found once takes neither time nor memory to speak of. Pairs come
+/// first, then all that is longer, where each two words that are a pair were found to be in two
+/// pages. Groups that begin or end in words such as "of", of which there are more than of all
+/// others, are never counted. Books of many millions of words are looked at in parts, by the hash:
+/// what is needed meanwhile does not grow with the book.
 /// Thread-safety: confined to one thread; once find() has returned, immutable.
 class LUXPhraseFinder {
  public:
@@ -65,19 +66,20 @@ class LUXPhraseFinder {
  private:
   static constexpr uint32_t none = 0xFFFFFFFF;
 
-  /// A group of words that occurs.
-  struct Group;
-  /// The groups whose hash says that they belong together. Each part is found by one thread.
-  struct Part;
   using Pages = std::vector<const LUXWordSequence*>;
   /// A phrase of two words or more, and in the lowest bit whether it is in the title.
   using Occurrence = uint32_t;
 
-  void _countWords(const Pages& pages, const std::vector<uint32_t>& wordOfNumber,
-                   const std::vector<bool>& mayStandAtEdge);
-  void _nameGroups(std::vector<Part>& parts, size_t pageCount);
-  void _countLongerPhrases(const std::vector<Part>& parts);
-  uint32_t _phraseOf(const std::vector<Part>& parts, const uint32_t* words, size_t length) const;
+  /// A group of words that occurs.
+  struct Group;
+  /// What all of find() works on.
+  struct Book;
+  /// The groups whose hash says that they belong together. Each part is found by one thread.
+  struct Part;
+
+  void _findWords(const Book& book, const std::vector<bool>& mayStandAtEdge);
+  void _findGroups(Book& book, size_t shortest, size_t longest);
+  void _countLongerPhrases();
 
   std::vector<LUXPhrase> _phrases;
   std::vector<uint32_t> _phraseOfWord;

@@ -1,6 +1,9 @@
 #include "host/Zebrine/ZEBResult.h"
 
+#include <cstddef>
 #include <functional>
+#include <memory>
+#include <new>
 #include <utility>
 
 #include "host/Zebrine/ZEBConstants.h"
@@ -30,13 +33,26 @@ size_t mixed(size_t seed, std::string_view text) {
 }  // namespace
 
 ZEBResult::ZEBResult(std::optional<std::string> title, std::string type)
-    : _title(std::move(title)),
-      _ownType(std::make_unique<const std::string>(std::move(type))),
-      _type(_ownType.get()) {}
+    : _own(std::make_unique<Own>(Own{std::move(title), {}, std::move(type)})), _type(&_own->type) {}
 
+// The records of one source, side by side.
 struct ZEBResult::Block {
+  Block(const std::shared_ptr<const ZEBResultSource>& itsSource, std::span<const Sourced> sourced,
+        const std::string& type)
+      : source(itsSource), memory(new std::byte[sourced.size() * sizeof(ZEBResult)]) {
+    for (const Sourced& one : sourced) {
+      new (at(count++)) ZEBResult(source.get(), one, &type);
+    }
+  }
+  ~Block() { std::destroy_n(at(0), count); }
+  Block(const Block&) = delete;
+  Block& operator=(const Block&) = delete;
+
+  ZEBResult* at(size_t number) const { return reinterpret_cast<ZEBResult*>(memory.get()) + number; }
+
   std::shared_ptr<const ZEBResultSource> source;
-  std::unique_ptr<ZEBResult[]> results;
+  std::unique_ptr<std::byte[]> memory;
+  size_t count = 0;
 };
 
 void ZEBResult::appendResultsWithSource(const std::shared_ptr<const ZEBResultSource>& source,
@@ -45,23 +61,15 @@ void ZEBResult::appendResultsWithSource(const std::shared_ptr<const ZEBResultSou
   if (results.empty()) {
     return;
   }
-  const auto block = std::make_shared<Block>();
-  block->source = source;
-  block->results.reset(new ZEBResult[results.size()]);
+  const auto block = std::make_shared<Block>(source, results, type);
   for (size_t i = 0; i < results.size(); ++i) {
-    ZEBResult& result = block->results[i];
-    result._source = source.get();
-    result._numberInSource = results[i].number;
-    result._type = &type;
-    result._relevance = results[i].relevance;
-    to.emplace_back(block, &result);
+    to.emplace_back(block, block->at(i));
   }
 }
 
 void ZEBResult::_fetchFromSource() const {
   ZEBResultSource::Content content = _source->contentOfResult(_numberInSource);
-  _title = std::move(content.title);
-  _payload = std::move(content.payload);
+  _own = std::make_unique<Own>(Own{std::move(content.title), std::move(content.payload), {}});
   _source = nullptr;
 }
 
@@ -78,13 +86,13 @@ std::shared_ptr<ZEBResult> ZEBResult::resultWithTitle(std::optional<std::string>
 const platform::Value& ZEBResult::payloadValueForKey(std::string_view key) const {
   static const platform::Value absent{};
   _fetch();
-  const auto entry = _payload.find(key);
-  return entry == _payload.end() ? absent : entry->second;
+  const auto entry = _own->payload.find(key);
+  return entry == _own->payload.end() ? absent : entry->second;
 }
 
 void ZEBResult::setPayload(platform::Value::Dictionary payload, PayloadKind kind) {
   _fetch();
-  _payload = std::move(payload);
+  _own->payload = std::move(payload);
   _payloadKind = kind;
 }
 
@@ -97,7 +105,7 @@ void ZEBResult::setPayloadValue(platform::Value value, std::string_view key) {
     throw platform::Exception(platform::invalidArgumentException,
                               "absent value for a key of a payload: " + std::string(key));
   }
-  _payload.insert_or_assign(std::string(key), std::move(value));
+  _own->payload.insert_or_assign(std::string(key), std::move(value));
 }
 
 std::optional<std::string> ZEBResult::bookID() const {
@@ -121,7 +129,7 @@ size_t ZEBResult::hash() const {
   if (const std::string* url = textOf(payloadValueForKey(ZEBResultURLKey))) {
     return mixed(hash, *url);
   }
-  return _title ? mixed(hash, *_title) : hash;
+  return _own->title ? mixed(hash, *_own->title) : hash;
 }
 
 std::string ZEBResult::description() const {

@@ -68,7 +68,7 @@ class ZEBResult {
   /// What the user is shown.
   const std::optional<std::string>& title() const {
     _fetch();
-    return _title;
+    return _own->title;
   }
 
   /// The result kind.
@@ -81,7 +81,7 @@ class ZEBResult {
   /// Facts by ZEBResult…Key; empty until it is set.
   const platform::Value::Dictionary& payload() const {
     _fetch();
-    return _payload;
+    return _own->payload;
   }
   /// One entry of the payload; absent when there is none.
   const platform::Value& payloadValueForKey(std::string_view key) const;
@@ -111,9 +111,21 @@ class ZEBResult {
 
  private:
   struct Block;
+  /// What a record of a search has only once somebody looks at it. Apart, so that those at which
+  /// nobody looks take little memory.
+  struct Own {
+    std::optional<std::string> title;
+    platform::Value::Dictionary payload;
+    /// The kind of a record that was not made from a source.
+    std::string type;
+  };
 
-  ZEBResult() = default;
   ZEBResult(std::optional<std::string> title, std::string type);
+  ZEBResult(const ZEBResultSource* source, const Sourced& sourced, const std::string* type)
+      : _source(source),
+        _type(type),
+        _relevance(sourced.relevance),
+        _numberInSource(sourced.number) {}
 
   /// Title and payload are there afterwards.
   void _fetch() const {
@@ -123,15 +135,13 @@ class ZEBResult {
   }
   void _fetchFromSource() const;
 
-  // The two that a source may still have.
-  mutable std::optional<std::string> _title;
-  mutable platform::Value::Dictionary _payload;
+  /// Null as long as there is a source.
+  mutable std::unique_ptr<Own> _own;
   /// Null once nothing is to be fetched any more. Kept alive by the block that the record is in.
   mutable const ZEBResultSource* _source = nullptr;
-  uint32_t _numberInSource = 0;
-  std::unique_ptr<const std::string> _ownType;
   const std::string* _type = nullptr;
   platform::Value _relevance;
+  uint32_t _numberInSource = 0;
   PayloadKind _payloadKind = PayloadKind::immutable;
 };
 

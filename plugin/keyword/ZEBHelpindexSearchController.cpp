@@ -58,6 +58,10 @@ void findBestHits(SKSearch& search, KeptList& kept) {
   }
 }
 
+std::optional<std::string> folderOf(const std::optional<std::string>& path) {
+  return path ? std::optional(platform::stringByDeletingLastPathComponent(*path)) : std::nullopt;
+}
+
 struct PageLocation {
   /// The URL before it was escaped; absent for pages on a server.
   std::optional<std::string> fileURLString;
@@ -110,10 +114,11 @@ std::shared_ptr<ZEBResult> resultForPage(const ZEBHelpindexIndex& index, const S
 // The plain pages of one index, as records that are put together when somebody looks at them.
 class KeywordHits : public ZEBResultSource {
  public:
-  KeywordHits(const SKIndexRef& index, std::optional<std::string> parentPath, std::string bookID,
+  /// `siblingPath` is that of a file in the folder that the index's documents lie under.
+  KeywordHits(const SKIndexRef& index, std::optional<std::string> siblingPath, std::string bookID,
               int32_t indexID)
       : _bytes(searchkit::indexBytes(*index)),
-        _parentPath(std::move(parentPath)),
+        _siblingPath(std::move(siblingPath)),
         _bookID(std::move(bookID)),
         _indexID(indexID) {}
 
@@ -123,7 +128,7 @@ class KeywordHits : public ZEBResultSource {
     const std::vector<SKDocumentRef> documents =
         SKIndexCopyDocumentRefsForDocumentIDs(index, std::span(&id, 1));
     const std::optional<Value> properties = SKIndexCopyDocumentProperties(index, *documents[0]);
-    const PageLocation location = locationOfPage(*documents[0], nullptr, _parentPath);
+    const PageLocation location = locationOfPage(*documents[0], nullptr, folderOf(_siblingPath));
     return {(*properties)["T"].stringValue(),
             payloadOfPage(*location.url, (*properties)["D"].stringValue().value_or(""), _indexID,
                           _bookID)};
@@ -131,7 +136,7 @@ class KeywordHits : public ZEBResultSource {
 
  private:
   platform::Data _bytes;
-  std::optional<std::string> _parentPath;
+  std::optional<std::string> _siblingPath;
   std::string _bookID;
   int32_t _indexID;
 };
@@ -151,12 +156,19 @@ struct ZEBHelpindexSearchController::Pass {
   std::string_view queryString;
   SKSearchOptions options = kSKSearchOptionDefault;
   std::vector<URL> ignoredURLs;
-  size_t index = 0;
+  std::shared_ptr<ZEBPluginOwner> owner;
   Results results;
   /// Of each result, as long as all are plain; then two records are equal only when their origins
   /// are, or when two of the indices are of one book.
   std::vector<Origin> origins;
   bool isPlain = true;
+  /// Of the books of all indices.
+  std::vector<size_t> bookHashes;
+
+  // The index that is being searched, its number among them, and its book.
+  size_t index = 0;
+  std::optional<std::string> bookID;
+  std::shared_ptr<ZEBHelpBook> book;
 
   /// The query as the engine takes it. What it is split into is the same for all indexes that the
   /// engine opens at all, so it is composed once.
@@ -173,7 +185,7 @@ std::shared_ptr<ZEBHelpindexSearchController> ZEBHelpindexSearchController::init
 ZEBHelpindexSearchController::Results ZEBHelpindexSearchController::doSearchForString(
     std::string_view queryString, const Indices& inIndices, const IgnoredURLs& ignoringURLs) {
   Pass all = _runPass(queryString, inIndices, ignoringURLs, true);
-  const bool booksAreDifferent = _haveDifferentBooks(inIndices);
+  const bool booksAreDifferent = _areDifferent(std::move(all.bookHashes));
   if (all.isPlain && booksAreDifferent && all.results.size() >= enoughResults) {
     return std::move(all.results);
   }
@@ -224,12 +236,7 @@ ZEBHelpindexSearchController::Results ZEBHelpindexSearchController::_united(Pass
   return results;
 }
 
-bool ZEBHelpindexSearchController::_haveDifferentBooks(const Indices& indices) {
-  std::vector<size_t> hashes;
-  hashes.reserve(indices.size());
-  for (const std::shared_ptr<ZEBIndex>& index : indices) {
-    hashes.push_back(index ? std::hash<std::string>{}(index->bookID().value_or("")) : 0);
-  }
+bool ZEBHelpindexSearchController::_areDifferent(std::vector<size_t> hashes) {
   std::sort(hashes.begin(), hashes.end());
   return std::adjacent_find(hashes.begin(), hashes.end()) == hashes.end();
 }
@@ -246,9 +253,16 @@ ZEBHelpindexSearchController::Pass ZEBHelpindexSearchController::_runPass(
   Pass pass(queryString);
   pass.options = useAndSearch ? kSKSearchOptionDefault : kSKSearchOptionSpaceMeansOR;
   pass.ignoredURLs = urlsOfStrings(ignoringURLs);
+  pass.owner = pluginOwner();
+  pass.bookHashes.reserve(inIndices.size());
   for (; pass.index < inIndices.size(); ++pass.index) {
     auto* const index = dynamic_cast<ZEBHelpindexIndex*>(inIndices[pass.index].get());
-    if (index != nullptr && index->isSearchable()) {
+    if (index == nullptr) {
+      continue;
+    }
+    pass.bookID = index->bookID();
+    pass.bookHashes.push_back(std::hash<std::optional<std::string>>{}(pass.bookID));
+    if (index->isSearchable()) {
       _searchIndex(*index, pass);
     }
   }
@@ -256,7 +270,7 @@ ZEBHelpindexSearchController::Pass ZEBHelpindexSearchController::_runPass(
 }
 
 void ZEBHelpindexSearchController::_searchIndex(ZEBHelpindexIndex& index, Pass& pass) {
-  const std::shared_ptr<ZEBHelpBook> book = _bookOfIndex(index);
+  pass.book = pass.owner && pass.bookID ? pass.owner->bookWithID(*pass.bookID) : nullptr;
   SKIndexRef indexRef = index.copyIndexRef();
   if (!indexRef) {
     return;
@@ -271,20 +285,19 @@ void ZEBHelpindexSearchController::_searchIndex(ZEBHelpindexIndex& index, Pass& 
     findBestHits(*search, pass.kept);
     search.reset();
     if (!pass.kept.empty()) {
-      _addResults(index, book, indexRef, pass);
+      _addResults(index, indexRef, pass);
     }
   }
   index.disposeIndexRef(indexRef);
 }
 
 // Records of the hits kept, in their order.
-void ZEBHelpindexSearchController::_addResults(ZEBHelpindexIndex& index,
-                                               const std::shared_ptr<ZEBHelpBook>& book,
-                                               const SKIndexRef& indexRef, Pass& pass) {
-  const std::optional<std::string> parentPath = _parentPath(index, book);
-  const std::optional<std::string> bookID = index.bookID();
-  if (pass.ignoredURLs.empty() && bookID && !(book && book->type() == ZEBHelpBookType4) &&
-      (!parentPath || parentPath->find('\0') == std::string::npos) &&
+void ZEBHelpindexSearchController::_addResults(ZEBHelpindexIndex& index, const SKIndexRef& indexRef,
+                                               Pass& pass) {
+  std::optional<std::string> siblingPath = _siblingPath(index, pass.book);
+  const bool isOnServer = pass.book && pass.book->type() == ZEBHelpBookType4;
+  if (pass.ignoredURLs.empty() && pass.bookID && !isOnServer &&
+      (!siblingPath || siblingPath->find('\0') == std::string::npos) &&
       index.hasPlainPages(indexRef)) {
     pass.sourced.clear();
     for (size_t i = 0; i < pass.kept.count(); ++i) {
@@ -293,10 +306,12 @@ void ZEBHelpindexSearchController::_addResults(ZEBHelpindexIndex& index,
       pass.origins.push_back({pass.index, id});
     }
     ZEBResult::appendResultsWithSource(
-        std::make_shared<const KeywordHits>(indexRef, parentPath, *bookID, index.indexID()),
+        std::make_shared<const KeywordHits>(indexRef, std::move(siblingPath),
+                                            std::move(*pass.bookID), index.indexID()),
         pass.sourced, ZEBHelpArticleResult, pass.results);
     return;
   }
+  const std::optional<std::string> parentPath = folderOf(siblingPath);
   pass.isPlain = false;
   const std::vector<SKDocumentRef> documents =
       SKIndexCopyDocumentRefsForDocumentIDs(indexRef, pass.kept.ids());
@@ -304,7 +319,7 @@ void ZEBHelpindexSearchController::_addResults(ZEBHelpindexIndex& index,
     if (!documents[i]) {
       continue;
     }
-    const PageLocation location = locationOfPage(*documents[i], book, parentPath);
+    const PageLocation location = locationOfPage(*documents[i], pass.book, parentPath);
     if (!pass.ignoredURLs.empty() && location.url &&
         _arrayOfURLsContainsURL(pass.ignoredURLs, *location.url)) {
       continue;
@@ -361,13 +376,15 @@ std::shared_ptr<ZEBHelpBook> ZEBHelpindexSearchController::_bookOfIndex(
   return owner && bookID ? owner->bookWithID(*bookID) : nullptr;
 }
 
+std::optional<std::string> ZEBHelpindexSearchController::_siblingPath(
+    const ZEBHelpindexIndex& index, const std::shared_ptr<ZEBHelpBook>& book) {
+  if (!index.loadedFromGeneratedCache()) {
+    return index.path();
+  }
+  return book ? book->accessPagePath() : std::nullopt;
+}
+
 std::optional<std::string> ZEBHelpindexSearchController::_parentPath(
     const ZEBHelpindexIndex& index, const std::shared_ptr<ZEBHelpBook>& book) {
-  std::optional<std::string> path;
-  if (!index.loadedFromGeneratedCache()) {
-    path = index.path();
-  } else if (book) {
-    path = book->accessPagePath();
-  }
-  return path ? std::optional(platform::stringByDeletingLastPathComponent(*path)) : std::nullopt;
+  return folderOf(_siblingPath(index, book));
 }

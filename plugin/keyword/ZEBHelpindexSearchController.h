@@ -84,16 +84,18 @@ class ZEBHelpindexSearchController {
   Pass _runPass(std::string_view queryString, const Indices& inIndices,
                 const IgnoredURLs& ignoringURLs, bool useAndSearch);
   void _searchIndex(ZEBHelpindexIndex& index, Pass& pass);
-  void _addResults(ZEBHelpindexIndex& index, const std::shared_ptr<ZEBHelpBook>& book,
-                   const SKIndexRef& indexRef, Pass& pass);
+  void _addResults(ZEBHelpindexIndex& index, const SKIndexRef& indexRef, Pass& pass);
   static Results _distinct(Results first, Results second);
   static Results _united(Pass all, Pass any);
-  static bool _haveDifferentBooks(const Indices& indices);
+  static bool _areDifferent(std::vector<size_t> hashes);
   void _lookUpPaths(ZEBHelpindexIndex& index, const platform::Value::Array& paths,
                     Results& results);
 
   std::shared_ptr<ZEBHelpBook> _bookOfIndex(const ZEBHelpindexIndex& index) const;
-  /// The folder that the index's documents lie under.
+  /// A file in the folder that the index's documents lie under.
+  static std::optional<std::string> _siblingPath(const ZEBHelpindexIndex& index,
+                                                 const std::shared_ptr<ZEBHelpBook>& book);
+  /// That folder.
   static std::optional<std::string> _parentPath(const ZEBHelpindexIndex& index,
                                                 const std::shared_ptr<ZEBHelpBook>& book);
 
