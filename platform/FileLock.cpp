@@ -9,7 +9,10 @@
 
 namespace platform {
 
-std::optional<FileLock> FileLock::_take(const std::string& path, int operation) {
+std::optional<FileLock> FileLock::_take(const std::string& path, int operation, bool* isHeld) {
+  if (isHeld != nullptr) {
+    *isHeld = false;
+  }
   int descriptor = -1;
   do {
     descriptor = ::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0666);
@@ -22,14 +25,19 @@ std::optional<FileLock> FileLock::_take(const std::string& path, int operation) 
   do {
     result = ::flock(descriptor, operation);
   } while (result < 0 && errno == EINTR);
+  if (isHeld != nullptr) {
+    *isHeld = result != 0 && errno == EWOULDBLOCK;
+  }
   return result == 0 ? std::optional<FileLock>(std::move(lock)) : std::nullopt;
 }
 
-std::optional<FileLock> FileLock::tryLock(const std::string& path) {
-  return _take(path, LOCK_EX | LOCK_NB);
+std::optional<FileLock> FileLock::tryLock(const std::string& path, bool* isHeld) {
+  return _take(path, LOCK_EX | LOCK_NB, isHeld);
 }
 
-std::optional<FileLock> FileLock::lock(const std::string& path) { return _take(path, LOCK_EX); }
+std::optional<FileLock> FileLock::lock(const std::string& path) {
+  return _take(path, LOCK_EX, nullptr);
+}
 
 FileLock::FileLock(FileLock&& other) noexcept : _descriptor(std::exchange(other._descriptor, -1)) {}
 

@@ -11,8 +11,9 @@ namespace platform {
 /// exclude each other within a process too. Thread-safety: confined to one thread.
 class FileLock {
  public:
-  /// Takes the lock if nobody holds it; absent if somebody does, or if the file cannot be opened.
-  static std::optional<FileLock> tryLock(const std::string& path);
+  /// Takes the lock if nobody holds it; absent if somebody does, which `isHeld` tells where it is
+  /// given, or if the file cannot be opened.
+  static std::optional<FileLock> tryLock(const std::string& path, bool* isHeld = nullptr);
   /// Waits for it; absent only if the file cannot be opened.
   static std::optional<FileLock> lock(const std::string& path);
 
@@ -24,7 +25,7 @@ class FileLock {
 
  private:
   explicit FileLock(int descriptor) noexcept : _descriptor(descriptor) {}
-  static std::optional<FileLock> _take(const std::string& path, int operation);
+  static std::optional<FileLock> _take(const std::string& path, int operation, bool* isHeld);
 
   int _descriptor;
 };

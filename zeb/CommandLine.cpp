@@ -28,9 +28,27 @@ bool isCommand(std::string_view argument) {
 
 bool isOption(std::string_view argument) { return argument.starts_with('-'); }
 
+/// The first argument that stands where a command should; absent when none does.
+std::optional<std::string> wordForCommand(const std::vector<std::string>& arguments) {
+  for (size_t i = 0; i < arguments.size(); ++i) {
+    const std::string& argument = arguments[i];
+    if (!isOption(argument)) {
+      return argument;
+    }
+    if (argument == "--color" || argument == "--cache-dir" || argument == "--wait") {
+      ++i;
+    }
+  }
+  return std::nullopt;
+}
+
 /// The arguments in the order in which the parser wants them, which is from the last to the first,
 /// with marks where they are needed.
 std::vector<std::string> argumentsForParser(const std::vector<std::string>& arguments) {
+  // Behind a command it would be a word.
+  if (arguments == std::vector<std::string>{"-h"}) {
+    return {"--help"};
+  }
   std::vector<std::string> prepared;
   bool onlyWords = false;
   for (const std::string& argument : arguments) {
@@ -90,6 +108,9 @@ struct Parser {
   bool noWait = false;
   bool noDaemon = false;
 
+  /// What is wrong with the command line, in this program's words.
+  std::string messageOf(const CLI::ParseError& error) const;
+
  private:
   CLI::App* _addCommand(const std::string& name, const std::string& description);
   CLI::App* _addSuggestCommand(const std::string& name, const std::string& description);
@@ -114,7 +135,7 @@ CLI::App* Parser::_addSuggestCommand(const std::string& name, const std::string&
       ->allow_extra_args(false)
       ->option_text("ID");
   command->add_option("--limit", suggestCommand.limit, "Show at most this many (10)")
-      ->check(CLI::Range(size_t{1}, size_t{1'000'000}).description(""))
+      ->check(CLI::Range(size_t{1}, maximumLimit).description(""))
       ->option_text("N");
   command->add_flag("--json", suggestCommand.json, "Write one JSON object");
   return command;
@@ -137,7 +158,7 @@ Parser::Parser() {
   app.add_option("--wait", common.waiting.limit, "Wait for them at most this long (300)")
       ->check(CLI::Range(0.0, 1e9).description(""))
       ->check([](const std::string& seconds) {
-        return seconds.find_first_of("nN") == std::string::npos ? "" : "wait: not a number";
+        return seconds.find_first_of("nN") == std::string::npos ? "" : "not a number";
       })
       ->option_text("SECONDS");
   app.add_flag("--verbose", common.verbosity, "Say more; may be repeated");
@@ -152,7 +173,7 @@ Parser::Parser() {
       ->allow_extra_args(false)
       ->option_text("ID");
   search->add_option("--limit", searchCommand.limit, "Show at most this many pages (10)")
-      ->check(CLI::Range(size_t{1}, size_t{1'000'000}).description(""))
+      ->check(CLI::Range(size_t{1}, maximumLimit).description(""))
       ->option_text("N");
   search->add_flag("--actions", searchCommand.actions, "Pages by meaning alone: things to do");
   search->add_flag("--json", searchCommand.json, "Write one JSON object");
@@ -252,6 +273,26 @@ void Parser::_addDoctor() {
   doctor->add_flag("--json", doctorCommand.json, "Write one JSON object");
 }
 
+std::string Parser::messageOf(const CLI::ParseError& error) const {
+  // The message may name an argument.
+  std::string message = error.what();
+  std::erase(message, wordMark);
+  if (dynamic_cast<const CLI::RequiredError*>(&error) == nullptr) {
+    return message;
+  }
+  const auto given = app.get_subcommands();
+  if (given.empty()) {
+    return "a command is missing";
+  }
+  const std::string name = message.substr(0, message.find(' '));
+  const CLI::Option* const option = given.front()->get_option_no_throw(name);
+  if (option == nullptr) {
+    return message;
+  }
+  return given.front()->get_name() + ": " + (isOption(name) ? name + " " : "") +
+         option->get_option_text() + " is missing";
+}
+
 void unmark(std::vector<std::string>& arguments) {
   for (std::string& argument : arguments) {
     argument = unmarked(std::move(argument));
@@ -270,14 +311,11 @@ std::optional<CommandLine> parseCommandLine(const std::vector<std::string>& argu
     exitCode = ExitCode::success;
     return std::nullopt;
   } catch (const CLI::ParseError& error) {
-    const auto word = std::find_if_not(arguments.begin(), arguments.end(), isOption);
-    if (word != arguments.end() && std::none_of(arguments.begin(), arguments.end(), isCommand)) {
+    const std::optional<std::string> word = wordForCommand(arguments);
+    if (word && !isCommand(*word)) {
       console.error("there is no command \"" + *word + "\"");
     } else {
-      // The message may name an argument.
-      std::string message = error.what();
-      std::erase(message, wordMark);
-      console.error(message);
+      console.error(parser.messageOf(error));
     }
     console.note("'zeb --help' and 'zeb COMMAND --help' say more");
     exitCode = ExitCode::usage;

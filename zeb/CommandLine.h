@@ -1,6 +1,7 @@
 // What the user typed, understood.
 #pragma once
 
+#include <algorithm>
 #include <cstddef>
 #include <optional>
 #include <string>
@@ -26,7 +27,14 @@ struct Waiting {
   bool waits = true;
   /// Seconds.
   double limit = 300;
+
+  /// Seconds for what is waited for in any case, such as books being looked for.
+  double patience() const { return std::max(Waiting().limit, limit); }
 };
+
+/// More results than these nobody can ask for, and longer texts, in bytes: the daemon's bounds.
+inline constexpr size_t maximumLimit = 10'000;
+inline constexpr size_t maximumTextLength = 4096;
 
 struct SearchCommand {
   /// None: the user is asked, on a terminal.

@@ -30,8 +30,10 @@
 #include "zeb/Scan.h"
 #include "zeb/Status.h"
 #include "zeb/Watch.h"
+#include "zebd/BookDiscovery.h"
 #include "zebd/BookFolder.h"
 #include "zebd/Catalogue.h"
+#include "zebd/HelpService.h"
 #include "zebd/Models.h"
 #include "zebd/Subscriptions.h"
 
@@ -64,13 +66,7 @@ class Session {
   ExitCode operator()(const StatusCommand& command);
   ExitCode operator()(const WatchCommand& command);
   ExitCode operator()(const IndexCommand& command);
-  ExitCode operator()(const ScanCommand& command) {
-    // What lies elsewhere is not the daemon's.
-    if (auto daemon = command.root == "/" ? _startDaemon() : nullptr) {
-      return scanWithDaemon(command, std::move(daemon), _waiting, _console);
-    }
-    return scan(command, _catalogue, _installation, _waiting, _console, _verbosity);
-  }
+  ExitCode operator()(const ScanCommand& command);
   ExitCode operator()(const AddCommand& command) {
     if (auto daemon = _startDaemon()) {
       return addBooksWithDaemon(command, std::move(daemon), _waiting, _console);
@@ -99,6 +95,7 @@ class Session {
   }
   std::unique_ptr<DaemonClient> _startDaemon() const;
   std::unique_ptr<DaemonClient> _daemon() const;
+  std::string _textOf(const std::vector<std::string>& words);
   bool _knowsBooks(const std::vector<CatalogueEntry>& entries,
                    const std::vector<std::string>& bookIDs);
   void _makeMissingIndexes(HelpSearch& search, const std::vector<std::string>& bookIDs);
@@ -112,7 +109,7 @@ class Session {
   const Installation& _installation;
   const Waiting _waiting;
   const int _verbosity;
-  const bool _usesDaemon;
+  bool _usesDaemon;
 };
 
 /// Whether there are books, and these among them; says what is wrong where not.
@@ -199,7 +196,7 @@ std::unique_ptr<DaemonClient> Session::_daemon() const {
     // It has just begun, and looks for books anyway.
     _console.progress("looking for books");
     std::string problem;
-    (void)daemon->scan({}, platform::Seconds(_waiting.limit), problem);
+    (void)daemon->scan({}, platform::Seconds(_waiting.patience()), problem);
     _console.clearProgress();
   }
   return daemon;
@@ -243,12 +240,24 @@ ExitCode Session::_ask(const std::vector<std::string>& bookIDs, const Question& 
   return *found ? ExitCode::success : ExitCode::nothingFound;
 }
 
-std::string joined(const std::vector<std::string>& words) {
+/// Whether a message of the bus can hold these folders: paths are bytes, its strings are text.
+bool canBeTold(const std::vector<std::string>& folders) {
+  return folders.size() <= zebd::HelpService::maximumBookCount &&
+         std::all_of(folders.begin(), folders.end(), [](const std::string& folder) {
+           const std::string path = absolutePath(folder);
+           return platform::isValidUTF8(path) && path.size() <= maximumTextLength;
+         });
+}
+
+/// What is to be searched for. The daemon takes no text that is longer than its bounds; this
+/// process does.
+std::string Session::_textOf(const std::vector<std::string>& words) {
   std::string text;
   for (const std::string& word : words) {
     text += text.empty() ? "" : " ";
     text += platform::stringByRepairingUTF8(word);
   }
+  _usesDaemon = _usesDaemon && text.size() <= maximumTextLength;
   return text;
 }
 
@@ -274,7 +283,7 @@ ExitCode Session::operator()(const SearchCommand& command) {
   if (command.words.empty()) {
     return _searchInteractively(command);
   }
-  const std::string words = joined(command.words);
+  const std::string words = _textOf(command.words);
   return _ask(command.books, [&](HelpSearch& search) {
     return _show(words,
                  command.actions ? search.searchActions(words, command.books, command.limit)
@@ -284,7 +293,7 @@ ExitCode Session::operator()(const SearchCommand& command) {
 }
 
 ExitCode Session::operator()(const SuggestCommand& command) {
-  const std::string words = joined(command.words);
+  const std::string words = _textOf(command.words);
   return _ask(command.books, [&](HelpSearch& search) -> std::optional<bool> {
     const auto suggestions = command.kind == SuggestCommand::Kind::similar
                                  ? search.similarSearches(words, command.books, command.limit)
@@ -304,8 +313,9 @@ ExitCode Session::operator()(const SuggestCommand& command) {
 }
 
 ExitCode Session::operator()(const AnchorCommand& command) {
+  const std::string name = _textOf({command.name});
   return _ask(command.books, [&](HelpSearch& search) {
-    return _show(command.name, search.lookUpAnchor(command.name, command.books), command.json);
+    return _show(name, search.lookUpAnchor(name, command.books), command.json);
   });
 }
 
@@ -333,7 +343,7 @@ ExitCode Session::operator()(const StatusCommand& command) {
 }
 
 ExitCode Session::operator()(const WatchCommand& command) {
-  const std::string words = joined(command.words);
+  const std::string words = _textOf(command.words);
   return _ask(
       command.books,
       [&](HelpSearch& search) {
@@ -382,25 +392,32 @@ ExitCode Session::operator()(const IndexCommand& command) {
   if (!_hasIdentifierForEach(command.folders, command.bookIDs)) {
     return ExitCode::usage;
   }
-  if (auto daemon = _startDaemon()) {
+  if (auto daemon = canBeTold(command.folders) ? _startDaemon() : nullptr) {
     return indexWithDaemon(command, std::move(daemon), _waiting, _console);
   }
   bool succeeded = true;
-  std::vector<CatalogueEntry> books;
+  zebd::BookDiscovery books([](const std::string& /*folder*/, const std::string& /*reason*/) {});
   for (size_t i = 0; i < command.folders.size(); ++i) {
     const std::string folder = absolutePath(command.folders[i]);
     const auto bookID = command.bookIDs.empty() ? std::nullopt : std::optional(command.bookIDs[i]);
     std::string reason;
-    if (std::optional<CatalogueEntry> book = zebd::entryForFolder(folder, bookID, {}, reason)) {
-      books.push_back(std::move(*book));
-    } else {
+    if (!books.add(folder, bookID, {}, reason)) {
       _console.error(fmt::format("{}: {}", folder, reason));
       succeeded = false;
     }
   }
   const IndexingCounts counts =
-      Update(_catalogue, _waiting, _console).run(books, {}, _installation, true);
+      Update(_catalogue, _waiting, _console).run(books.books(), {}, _installation, true);
   return succeeded && counts.failed == 0 ? ExitCode::success : ExitCode::failure;
+}
+
+ExitCode Session::operator()(const ScanCommand& command) {
+  // What lies elsewhere is not the daemon's.
+  const bool isForDaemon = command.root == "/" && canBeTold(command.folders);
+  if (auto daemon = isForDaemon ? _startDaemon() : nullptr) {
+    return scanWithDaemon(command, std::move(daemon), _waiting, _console);
+  }
+  return scan(command, _catalogue, _installation, _waiting, _console, _verbosity);
 }
 
 ExitCode Session::operator()(RemoveCommand command) {

@@ -23,12 +23,7 @@ using zebd::BookChanges;
 using zebd::BookFailure;
 using zebd::BookStatus;
 
-/// Where there is no waiting for indexes, there still is for the daemon's looking through folders.
-constexpr platform::Seconds scanLimit{300};
-
-platform::Seconds limitOf(const Waiting& waiting) {
-  return waiting.waits ? platform::Seconds(waiting.limit) : scanLimit;
-}
+platform::Seconds limitOf(const Waiting& waiting) { return platform::Seconds(waiting.patience()); }
 
 void tellFailures(const std::vector<BookFailure>& failures, Console& console) {
   for (const BookFailure& failure : failures) {
@@ -71,7 +66,7 @@ Counts waitForIndexes(HelpSearch& search, const std::map<std::string, BookStatus
     return counts;
   }
   console.progress(fmt::format("0 of {} books", bookIDs.size()));
-  const HelpSearch::Indexing indexing = search.makeIndexes(
+  const HelpSearch::Indexing indexing = search.waitForIndexes(
       bookIDs, platform::Seconds(waiting.limit), [&](const std::string& bookID, size_t count) {
         console.clearProgress();
         const auto book = books.find(bookID);
@@ -141,7 +136,7 @@ ExitCode scanWithDaemon(const ScanCommand& command, std::unique_ptr<DaemonClient
   request.installedBooks = command.installedBooks;
   request.languages = command.languages;
   request.allBooksEvenIfUnchanged = command.evenIfUnchanged;
-  request.asksServers = true;
+  request.asksServers = waiting.waits;
   const std::optional<BookChanges> changes = scanned(*daemon, request, waiting, console);
   if (!changes) {
     return ExitCode::failure;
@@ -240,9 +235,11 @@ ExitCode removeRemoteBooksWithDaemon(RemoveCommand& command, const zebd::Catalog
       isOnServer = isOnServer || (entry.bookID == name && entry.isRemote()) ||
                    (address && entry.catalogueURL == address->absoluteString());
     }
-    if (isOnServer && !daemon.removeRemote(name, limitOf(waiting))) {
-      console.error(fmt::format("{}: the help daemon could not remove it", name));
-      succeeded = false;
+    if (isOnServer) {
+      if (const auto problem = daemon.removeRemote(name, limitOf(waiting))) {
+        console.error(fmt::format("{}: the help daemon could not remove it: {}", name, *problem));
+        succeeded = false;
+      }
     }
     return isOnServer;
   });

@@ -6,12 +6,16 @@
 #include <atomic>
 #include <chrono>
 #include <cstdint>
+#include <exception>
 #include <map>
+#include <thread>
 #include <utility>
 
 #include "host/Zebrine/ZEBConstants.h"
+#include "host/Zebrine/ZEBLog.h"
 #include "platform/RunLoop.h"
 #include "platform/ThreadSafety.h"
+#include "zeb/CommandLine.h"
 #include "zebd/BusService.h"
 #include "zebd/Host.h"
 
@@ -23,6 +27,9 @@ using Dictionary = std::map<std::string, sdbus::Variant>;
 using Dictionaries = std::vector<Dictionary>;
 using Strings = std::vector<std::string>;
 using Failures = std::vector<sdbus::Struct<std::string, std::string>>;
+
+static_assert(maximumLimit <= zebd::HelpService::maximumResultCount);
+static_assert(maximumTextLength <= zebd::HelpService::maximumTextLength);
 
 /// The bus may have to start the daemon first.
 constexpr platform::Seconds answerLimit{25};
@@ -80,16 +87,20 @@ struct DaemonClient::Implementation {
 
   bool daemonCanBeHad();
   void listen();
+  void stopListening();
   /// The daemon is gone: what it owed does not come any more.
   void allEnded();
 
   platform::Mutex mutex;
   std::map<uint64_t, Heard> heard GUARDED_BY(mutex);
+  /// How often a daemon, or the bus, has gone.
+  uint64_t goneCount GUARDED_BY(mutex) = 0;
   std::atomic<uint64_t> changeCount{0};
 
   const std::unique_ptr<sdbus::IConnection> connection;
   const std::unique_ptr<sdbus::IProxy> proxy;
   const std::unique_ptr<sdbus::IProxy> bus;
+  std::thread loop;
 };
 
 bool DaemonClient::Implementation::daemonCanBeHad() {
@@ -106,6 +117,7 @@ bool DaemonClient::Implementation::daemonCanBeHad() {
 void DaemonClient::Implementation::allEnded() {
   {
     const platform::MutexLock lock(mutex);
+    ++goneCount;
     for (auto& entry : heard) {
       entry.second.ended = true;
     }
@@ -151,7 +163,21 @@ void DaemonClient::Implementation::listen() {
         }
       });
   bus->finishRegistration();
-  connection->enterEventLoopAsync();
+  // The library's own thread would end the process together with the bus.
+  loop = std::thread([this] {
+    try {
+      connection->enterEventLoop();
+    } catch (const std::exception& error) {
+      ZEBLog(0, "The bus is gone: %@", error);
+      ++changeCount;
+      allEnded();
+    }
+  });
+}
+
+void DaemonClient::Implementation::stopListening() {
+  connection->leaveEventLoop();
+  loop.join();
 }
 
 namespace {
@@ -186,12 +212,17 @@ std::unique_ptr<DaemonClient> DaemonClient::connect(const std::string& address) 
 DaemonClient::DaemonClient(std::shared_ptr<Implementation> implementation)
     : _implementation(std::move(implementation)) {}
 
-DaemonClient::~DaemonClient() { _implementation->connection->leaveEventLoop(); }
+DaemonClient::~DaemonClient() { _implementation->stopListening(); }
 
 class DaemonClient::Running : public RunningSearch {
  public:
-  Running(std::shared_ptr<Implementation> implementation, uint64_t handle)
-      : _implementation(std::move(implementation)), _handle(handle) {}
+  /// `goneCount` is that of the implementation before the search was asked for.
+  Running(std::shared_ptr<Implementation> implementation, uint64_t handle, uint64_t goneCount)
+      : _implementation(std::move(implementation)), _handle(handle) {
+    const platform::MutexLock lock(_implementation->mutex);
+    Heard& heard = _implementation->heard[_handle];
+    heard.ended = heard.ended || _implementation->goneCount != goneCount;
+  }
   ~Running() override {
     const platform::MutexLock lock(_implementation->mutex);
     _implementation->heard.erase(_handle);
@@ -224,14 +255,20 @@ class DaemonClient::Running : public RunningSearch {
 };
 
 std::shared_ptr<RunningSearch> DaemonClient::begin(const zebd::SearchRequest& request) {
+  uint64_t goneCount = 0;
+  {
+    const platform::MutexLock lock(_implementation->mutex);
+    goneCount = _implementation->goneCount;
+  }
   try {
     uint64_t handle = 0;
     _implementation->proxy->callMethod("StartSearch")
         .onInterface(zebd::ZEBBusInterface)
         .withArguments(request.text, optionsOf(request))
         .storeResultsTo(handle);
-    return std::make_shared<Running>(_implementation, handle);
-  } catch (const sdbus::Error&) {
+    return std::make_shared<Running>(_implementation, handle, goneCount);
+  } catch (const sdbus::Error& error) {
+    ZEBLog(0, "The help daemon does not search: %@", error.getMessage());
     return std::make_shared<FailedSearch>();
   }
 }
@@ -438,9 +475,10 @@ zebd::AddedBooks DaemonClient::addRemote(const std::string& address,
   return added;
 }
 
-bool DaemonClient::removeRemote(const std::string& name, platform::Seconds limit) {
+std::optional<std::string> DaemonClient::removeRemote(const std::string& name,
+                                                      platform::Seconds limit) {
   Strings removed;
-  return !_call(
+  return _call(
       "RemoveRemote", limit, [&](sdbus::MethodCall& call) { call << name; },
       [&](sdbus::MethodReply& reply) { reply >> removed; });
 }

@@ -66,9 +66,9 @@ class DaemonClient : public SearchProvider {
   /// Subscribes to a publisher's books; of the entries only identifier, title and language.
   zebd::AddedBooks addRemote(const std::string& address, const zebd::WantedBooks& wanted,
                              platform::Seconds limit);
-  /// Forgets books on servers, by identifier or address of their catalogue. False where there is
-  /// none of this name.
-  bool removeRemote(const std::string& name, platform::Seconds limit);
+  /// Forgets books on servers, by identifier or address of their catalogue. Returns why it cannot;
+  /// absent when they are forgotten.
+  std::optional<std::string> removeRemote(const std::string& name, platform::Seconds limit);
 
  private:
   std::optional<std::string> _call(const char* member, platform::Seconds limit,

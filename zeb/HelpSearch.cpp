@@ -338,16 +338,19 @@ std::vector<std::string> HelpSearch::booksWithoutIndex(
   return _implementation->provider().booksWithoutIndex(bookIDs);
 }
 
-HelpSearch::Indexing HelpSearch::_waitForDaemon(const std::vector<std::string>& bookIDs,
+/// Left to itself the plug-in takes one book every two seconds; but those that a search needs, at
+/// once. No page carries this anchor.
+std::shared_ptr<RunningSearch> HelpSearch::_registerWithDaemon(std::vector<std::string> bookIDs) {
+  bookIDs.resize(std::min(bookIDs.size(), zebd::HelpService::maximumBookCount));
+  zebd::SearchRequest request = requestFor(" ", bookIDs, {ZEBHelpArticleResult}, 0);
+  request.isAnchor = true;
+  return _implementation->daemon->begin(request);
+}
+
+HelpSearch::Indexing HelpSearch::waitForIndexes(const std::vector<std::string>& bookIDs,
                                                 platform::Seconds limit, const Progress& progress) {
   std::set<std::string> waiting(bookIDs.begin(), bookIDs.end());
   size_t count = 0;
-  // Left to itself the plug-in takes one book every two seconds; but those that a search needs, at
-  // once. No page carries this anchor.
-  zebd::SearchRequest request = requestFor(" ", bookIDs, {ZEBHelpArticleResult}, 0);
-  request.isAnchor = true;
-  request.bookIDs.resize(std::min(bookIDs.size(), zebd::HelpService::maximumBookCount));
-  const auto registration = _implementation->daemon->begin(request);
   platform::Clock::Instant nextLook = elapsedNow();
   platform::Clock::Instant lastWork = elapsedNow();
   Indexing indexing;
@@ -358,10 +361,10 @@ HelpSearch::Indexing HelpSearch::_waitForDaemon(const std::vector<std::string>& 
           return false;
         }
         nextLook = now + daemonPace;
-        const std::vector<std::string> missing = booksWithoutIndex(bookIDs);
+        const std::vector<std::string> listed = booksWithoutIndex(bookIDs);
+        const std::set<std::string> missing(listed.begin(), listed.end());
         for (const std::string& bookID : bookIDs) {
-          const bool isIndexed = std::find(missing.begin(), missing.end(), bookID) == missing.end();
-          if (isIndexed && waiting.erase(bookID) > 0) {
+          if (!missing.contains(bookID) && waiting.erase(bookID) > 0) {
             ++count;
             progress(bookID, count);
           }
@@ -380,7 +383,8 @@ HelpSearch::Indexing HelpSearch::_waitForDaemon(const std::vector<std::string>& 
 HelpSearch::Indexing HelpSearch::makeIndexes(const std::vector<std::string>& bookIDs,
                                              platform::Seconds limit, const Progress& progress) {
   if (_implementation->daemon != nullptr) {
-    return _waitForDaemon(bookIDs, limit, progress);
+    const auto registration = _registerWithDaemon(bookIDs);
+    return waitForIndexes(bookIDs, limit, progress);
   }
   std::set<std::string> waiting(bookIDs.begin(), bookIDs.end());
   size_t count = 0;
@@ -450,8 +454,11 @@ bool HelpSearch::fetchIndexes(const std::vector<std::string>& bookIDs, platform:
     };
     // What comes anew can be seen; whether what is there is the newest cannot.
     const bool allAreNew = static_cast<size_t>(lackingCount()) == bookIDs.size();
+    // The daemon may be busy for long with the books of this computer, one after the other.
+    const auto registration = _registerWithDaemon(bookIDs);
     platform::Clock::Instant lastWork = elapsedNow();
     platform::Clock::Instant nextLook = lastWork;
+    uint64_t seen = changeCount();
     return Host::runMainLoopUntil(
         [&] {
           const platform::Clock::Instant now = elapsedNow();
@@ -459,8 +466,12 @@ bool HelpSearch::fetchIndexes(const std::vector<std::string>& bookIDs, platform:
             return false;
           }
           nextLook = now + daemonPace;
-          lastWork = _implementation->daemon->isBusy() ? now : lastWork;
-          return now - lastWork > modelSpan || (allAreNew && lackingCount() == 0);
+          const bool hasChanged = std::exchange(seen, changeCount()) != seen;
+          const bool allAreHere = lackingCount() == 0;
+          const bool isAtWork = !registration->ended() || hasChanged ||
+                                (!allAreHere && _implementation->daemon->isBusy());
+          lastWork = isAtWork ? now : lastWork;
+          return now - lastWork > modelSpan || (allAreNew && allAreHere);
         },
         limit);
   }

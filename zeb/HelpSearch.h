@@ -21,6 +21,7 @@ using zebd::CatalogueEntry;
 using zebd::Installation;
 
 class DaemonClient;
+class RunningSearch;
 
 /// A page that was found, ready to be shown.
 struct FoundPage {
@@ -111,6 +112,10 @@ class HelpSearch {
   Indexing makeIndexes(const std::vector<std::string>& bookIDs, platform::Seconds limit,
                        const Progress& progress);
 
+  /// Waits for indexes that the daemon, which has to be there, is already making.
+  Indexing waitForIndexes(const std::vector<std::string>& bookIDs, platform::Seconds limit,
+                          const Progress& progress);
+
   /// Has the indexes of remote books fetched, those that are there already compared with their
   /// servers', and waits until the plug-in is quiet or `limit` has passed; returns whether it is.
   bool fetchIndexes(const std::vector<std::string>& bookIDs, platform::Seconds limit);
@@ -159,8 +164,7 @@ class HelpSearch {
   struct Implementation;
   class Live;
 
-  Indexing _waitForDaemon(const std::vector<std::string>& bookIDs, platform::Seconds limit,
-                          const Progress& progress);
+  std::shared_ptr<RunningSearch> _registerWithDaemon(std::vector<std::string> bookIDs);
 
   explicit HelpSearch(std::unique_ptr<Implementation> implementation);
 

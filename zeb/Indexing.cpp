@@ -93,8 +93,12 @@ void Update::_removeOldIndexes(HelpSearch& search, const std::vector<CatalogueEn
     _console.warning("not all indexes that are out of date could be removed");
   }
   for (const CatalogueEntry& entry : gone) {
-    _catalogue.remove(entry.bookID);
-    ++_counts.forgotten;
+    if (const auto error = _catalogue.remove(entry.bookID)) {
+      _console.error(fmt::format("{}: {}", entry.bookID, error->description));
+      ++_counts.failed;
+    } else {
+      ++_counts.forgotten;
+    }
   }
 }
 

@@ -187,7 +187,10 @@ ExitCode removeBooks(const RemoveCommand& command, const Catalogue& catalogue,
     console.warning("not all indexes could be removed");
   }
   for (const std::string& bookID : bookIDs) {
-    catalogue.remove(bookID);
+    if (const auto problem = catalogue.remove(bookID)) {
+      console.error(fmt::format("{}: {}", bookID, problem->description));
+      succeeded = false;
+    }
   }
   return succeeded ? ExitCode::success : ExitCode::failure;
 }

@@ -10,22 +10,23 @@
 
 namespace zebd {
 
-bool BookDiscovery::add(const std::string& folder, const std::optional<std::string>& bookID,
-                        const std::string& language, std::string& reason,
-                        const std::string& accessPage) {
+std::optional<std::string> BookDiscovery::add(const std::string& folder,
+                                              const std::optional<std::string>& bookID,
+                                              const std::string& language, std::string& reason,
+                                              const std::string& accessPage) {
   std::optional<CatalogueEntry> book = entryForFolder(folder, bookID, language, reason, accessPage);
   if (!book) {
-    return false;
+    return std::nullopt;
   }
-  if (!_bookIDs.insert(book->bookID).second) {
-    if (!_folders.contains(folder)) {
-      _passedOver(folder, fmt::format("there is another book \"{}\"", book->bookID));
-    }
-    return true;
+  std::string found = book->bookID;
+  const auto [known, isNew] = _folders.emplace(found, folder);
+  if (isNew) {
+    _books.push_back(std::move(*book));
+  } else if (known->second != folder) {
+    reason = fmt::format("there is another book \"{}\"", found);
+    return std::nullopt;
   }
-  _folders.insert(folder);
-  _books.push_back(std::move(*book));
-  return true;
+  return found;
 }
 
 void BookDiscovery::_addAll(const std::vector<HelpFolder>& folders) {
@@ -60,12 +61,12 @@ std::vector<CatalogueEntry> BookDiscovery::addKnown(const Catalogue& catalogue) 
     const std::string accessPage =
         files->fileExistsAtPath(entry.accessPagePath) ? entry.accessPagePath : std::string();
     std::string reason;
-    if (!_bookIDs.contains(entry.bookID) &&
+    if (!_folders.contains(entry.bookID) &&
         !add(entry.folder, entry.bookID, entry.language, reason, accessPage)) {
       _passedOver(entry.folder, reason);
     }
   }
-  std::erase_if(gone, [&](const CatalogueEntry& entry) { return _bookIDs.contains(entry.bookID); });
+  std::erase_if(gone, [&](const CatalogueEntry& entry) { return _folders.contains(entry.bookID); });
   return gone;
 }
 

@@ -1,8 +1,8 @@
 // Which books there are.
 #pragma once
 
+#include <map>
 #include <optional>
-#include <set>
 #include <string>
 #include <vector>
 
@@ -18,9 +18,12 @@ class BookDiscovery {
  public:
   explicit BookDiscovery(PassedOver passedOver) : _passedOver(std::move(passedOver)) {}
 
-  /// The book in the folder (see entryForFolder). False, with `reason` set, where there is none.
-  bool add(const std::string& folder, const std::optional<std::string>& bookID,
-           const std::string& language, std::string& reason, const std::string& accessPage = {});
+  /// The identifier of the book in the folder (see entryForFolder). Absent, with `reason` set,
+  /// where there is none, or another folder has a book of that identifier.
+  std::optional<std::string> add(const std::string& folder,
+                                 const std::optional<std::string>& bookID,
+                                 const std::string& language, std::string& reason,
+                                 const std::string& accessPage = {});
 
   /// Help books, help of applications, manuals.
   void addInstalled(const std::vector<std::string>& dataFolders,
@@ -36,8 +39,8 @@ class BookDiscovery {
   void _addAll(const std::vector<HelpFolder>& folders);
 
   const PassedOver _passedOver;
-  std::set<std::string> _bookIDs;
-  std::set<std::string> _folders;
+  /// By identifier.
+  std::map<std::string, std::string> _folders;
   std::vector<CatalogueEntry> _books;
 };
 

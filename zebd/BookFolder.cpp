@@ -2,9 +2,6 @@
 
 #include <fmt/format.h>
 
-#include <filesystem>
-#include <system_error>
-
 #include "bvmake/PageReader.h"
 #include "host/Zebrine/RNXObjectManager.h"
 #include "host/Zebrine/ZEBConstants.h"
@@ -60,19 +57,6 @@ std::string titleOfPage(const std::string& path) {
   }
   const auto page = bvmake::readPage(*kind, bytes->view());
   return page ? page->title : std::string();
-}
-
-/// Whether there is a help page in the folder or below. Symbolic links are not followed.
-bool holdsPages(const std::string& folder) {
-  std::error_code error;
-  const auto options = std::filesystem::directory_options::skip_permission_denied;
-  for (std::filesystem::recursive_directory_iterator entry(folder, options, error), end;
-       !error && entry != end; entry.increment(error)) {
-    if (bvmake::pageKindOfFileName(entry->path().filename().native())) {
-      return true;
-    }
-  }
-  return false;
 }
 
 }  // namespace

@@ -26,16 +26,22 @@ constexpr platform::Seconds lockPace{1};
 /// The news of a changed book goes over the bus and back.
 constexpr platform::Seconds newsLimit{5};
 
-/// Keeps the host from leaving until books are registered.
+/// Keeps the host from leaving until books are registered, and says so then on the main thread.
 class Registration : public SearchReceiver {
  public:
-  explicit Registration(Owner& owner) : _owner(owner) { _owner.disableShutdown(); }
+  Registration(Owner& owner, std::function<void()> then) : _owner(owner), _then(std::move(then)) {
+    _owner.disableShutdown();
+  }
 
   void foundResults(const ZEBResultBatch& /*batch*/) override {}
-  void searchEnded(bool /*finished*/) override { _owner.enableShutdown(); }
+  void searchEnded(bool /*finished*/) override {
+    platform::RunLoop::main()->perform(std::move(_then));
+    _owner.enableShutdown();
+  }
 
  private:
   Owner& _owner;
+  std::function<void()> _then;
 };
 
 }  // namespace
@@ -86,6 +92,7 @@ void BookKeeper::scan(ScanRequest request, Done done) {
 
 void BookKeeper::_startScan() {
   _isScanning = true;
+  ++_scanCount;
   _changes = {};
   do {
     _request = std::move(_waiting.front().request);
@@ -107,8 +114,8 @@ void BookKeeper::_startScan() {
           });
           for (const ScanRequest::Folder& folder : folders) {
             std::string reason;
-            if (discovery.add(folder.path, folder.bookID, {}, reason)) {
-              found->folderBooks.push_back(discovery.books().back().bookID);
+            if (auto bookID = discovery.add(folder.path, folder.bookID, {}, reason)) {
+              found->folderBooks.push_back(std::move(*bookID));
             } else {
               found->failures.push_back({folder.path, reason});
             }
@@ -135,8 +142,10 @@ void BookKeeper::_apply(const std::shared_ptr<const Found>& found) {
     return;
   }
   (void)platform::Environment::current()->files->createDirectoryWithParents(_catalogue.folder());
-  _lock = platform::FileLock::tryLock(_catalogue.lockPath());
-  if (!_lock && platform::Environment::current()->files->fileExistsAtPath(_catalogue.folder())) {
+  bool isHeld = false;
+  _lock = platform::FileLock::tryLock(_catalogue.lockPath(), &isHeld);
+  // Where no lock can be had it goes on without: what then fails says so itself.
+  if (isHeld) {
     platform::RunLoop::main()->performAfterDelay(lockPace,
                                                  [weak = std::weak_ptr<BookKeeper*>(_self), found] {
                                                    if (const auto self = weak.lock()) {
@@ -147,12 +156,12 @@ void BookKeeper::_apply(const std::shared_ptr<const Found>& found) {
   }
   _applyLocked(*found);
   if (!_dropping.empty()) {
-    platform::RunLoop::main()->performAfterDelay(newsLimit,
-                                                 [weak = std::weak_ptr<BookKeeper*>(_self)] {
-                                                   if (const auto self = weak.lock()) {
-                                                     (*self)->_giveUpWaiting();
-                                                   }
-                                                 });
+    platform::RunLoop::main()->performAfterDelay(
+        newsLimit, [weak = std::weak_ptr<BookKeeper*>(_self), scan = _scanCount] {
+          if (const auto self = weak.lock()) {
+            (*self)->_giveUpWaiting(scan);
+          }
+        });
   }
   _finishScanWhenDone();
 }
@@ -176,7 +185,10 @@ void BookKeeper::_applyLocked(const Found& found) {
     }
   }
   for (const CatalogueEntry& entry : found.gone) {
-    _catalogue.remove(entry.bookID);
+    if (const auto error = _catalogue.remove(entry.bookID)) {
+      ZEBLog(1, "Cannot forget the book %@: %@", entry.bookID, error->description);
+      ++_changes.failed;
+    }
   }
   for (const auto& book : _host.bookshelf().books()) {
     if (!known.contains(book.first)) {
@@ -242,10 +254,17 @@ void BookKeeper::_store(const CatalogueEntry& entry) {
     ++_changes.failed;
   }
   _announced[entry.bookID] = entry;
-  _host.plugin()->finishPopulatingBookWithID(entry.bookID);
+  if (_request.isPlain()) {
+    _host.plugin()->finishPopulatingBookWithID(entry.bookID);
+  }
+  // Others are registered at once when the scan ends. Announced as well, a book would be indexed
+  // once for each.
 }
 
-void BookKeeper::_giveUpWaiting() {
+void BookKeeper::_giveUpWaiting(uint64_t scan) {
+  if (scan != _scanCount) {
+    return;
+  }
   const auto dropping = std::exchange(_dropping, {});
   for (const auto& dropped : dropping) {
     ZEBLog(1, "No news of the book %@ came back", dropped.first);
@@ -263,9 +282,6 @@ void BookKeeper::_finishScanWhenDone() {
   _lock.reset();
   const ScanRequest request = std::exchange(_request, {});
   const BookChanges changes = std::exchange(_changes, {});
-  if (request.asksServers) {
-    _askServers();
-  }
   if (!request.isPlain()) {
     // Those that have changed, and those whose turn has not come yet.
     std::vector<std::string> bookIDs = changes.changedBooks;
@@ -274,17 +290,27 @@ void BookKeeper::_finishScanWhenDone() {
         bookIDs.push_back(book.first);
       }
     }
-    _registerNow(bookIDs);
+    _registerNow(bookIDs, [] {});
   }
   ZEBLog(3, "Books: %@",
          std::to_string(changes.changed) + " changed, " + std::to_string(changes.unchanged) +
              " unchanged, " + std::to_string(changes.forgotten) + " forgotten, " +
              std::to_string(changes.failed) + " failed");
-  for (const Done& done : std::exchange(_current, {})) {
-    if (done) {
-      // Whatever becomes of one, the others are told, and the guard is given back.
-      platform::runLoggingExceptions([&] { done(changes); });
+  const auto tell = [told = std::exchange(_current, {}), changes] {
+    for (const Done& done : told) {
+      if (done) {
+        // Whatever becomes of one, the others are told, and the guard is given back.
+        platform::runLoggingExceptions([&] { done(changes); });
+      }
     }
+  };
+  if (request.asksServers) {
+    _askServers(tell);
+  } else {
+    tell();
+  }
+  if (_scanned) {
+    platform::runLoggingExceptions(_scanned);
   }
   _host.owner().enableShutdown();
   // One of them may have begun the next scan.
@@ -293,17 +319,18 @@ void BookKeeper::_finishScanWhenDone() {
   }
 }
 
-void BookKeeper::_registerNow(const std::vector<std::string>& bookIDs) {
+void BookKeeper::_registerNow(const std::vector<std::string>& bookIDs, std::function<void()> then) {
   if (bookIDs.empty()) {
     // That would mean all.
+    then();
     return;
   }
-  _host.registerBooks(bookIDs, std::make_shared<Registration>(_host.owner()));
+  _host.registerBooks(bookIDs, std::make_shared<Registration>(_host.owner(), std::move(then)));
 }
 
 /// The plug-in asks servers when it looks at a book, and goes by what is known of the catalogues
 /// then.
-void BookKeeper::_askServers() {
+void BookKeeper::_askServers(std::function<void()> then) {
   std::set<std::string> addresses;
   std::vector<std::string> bookIDs;
   for (const auto& announced : _announced) {
@@ -314,21 +341,22 @@ void BookKeeper::_askServers() {
     }
   }
   if (addresses.empty()) {
+    then();
     return;
   }
   // Gives the guard back when the last answer has come, whatever it says.
-  const std::shared_ptr<void> all(
-      nullptr, [weak = std::weak_ptr<BookKeeper*>(_self), bookIDs](const void* /*nothing*/) {
-        platform::RunLoop::main()->perform([weak, bookIDs] {
-          if (const auto self = weak.lock()) {
-            forgetKnownIndices();
-            (*self)->_host.lookAtBooksAnew();
-            // Whoever waits for the servers' books would have to wait for the turns of all others.
-            (*self)->_registerNow(bookIDs);
-            (*self)->_host.owner().enableShutdown();
-          }
-        });
-      });
+  const std::shared_ptr<void> all(nullptr, [weak = std::weak_ptr<BookKeeper*>(_self), bookIDs,
+                                            then = std::move(then)](const void* /*nothing*/) {
+    platform::RunLoop::main()->perform([weak, bookIDs, then] {
+      if (const auto self = weak.lock()) {
+        forgetKnownIndices();
+        (*self)->_host.lookAtBooksAnew();
+        // Whoever waits for the servers' books would have to wait for the turns of all others.
+        (*self)->_registerNow(bookIDs, then);
+        (*self)->_host.owner().enableShutdown();
+      }
+    });
+  });
   _host.owner().disableShutdown();
   for (const std::string& address : addresses) {
     if (const auto url = platform::URL::URLWithString(address)) {

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <deque>
 #include <functional>
 #include <map>
@@ -94,11 +95,14 @@ class BookKeeper {
   void begin();
 
   /// Looks for what has changed, after a scan that is under way. `done`, where there is one, is
-  /// called on the main thread when the books are on the bookshelf and announced; their indexes are
-  /// made after that.
+  /// called on the main thread when the books are on the bookshelf and announced, and servers that
+  /// are asked have answered; indexes are made after that.
   void scan(Done done) { scan({}, std::move(done)); }
   void scan(ScanRequest request, Done done);
   bool isScanning() const { return _isScanning; }
+  /// Told of the end of each scan, whoever asked for it: what is to be watched may be other than
+  /// before.
+  void setScanObserver(std::function<void()> observer) { _scanned = std::move(observer); }
 
   /// Folders that are to be watched for books that come and go, and trees for pages that change.
   std::vector<std::string> watchedFolders() const;
@@ -118,12 +122,12 @@ class BookKeeper {
   void _applyLocked(const Found& found);
   void _enter(CatalogueEntry entry, bool evenIfUnchanged);
   void _forget(const std::string& bookID);
-  void _askServers();
-  void _registerNow(const std::vector<std::string>& bookIDs);
+  void _askServers(std::function<void()> then);
+  void _registerNow(const std::vector<std::string>& bookIDs, std::function<void()> then);
   void _registrationChanged(const std::string& bookID);
   void _store(const CatalogueEntry& entry);
   void _finishScanWhenDone();
-  void _giveUpWaiting();
+  void _giveUpWaiting(uint64_t scan);
 
   Host& _host;
   Settings _settings;
@@ -132,7 +136,10 @@ class BookKeeper {
   const std::shared_ptr<BookKeeper*> _self;
   platform::DistributedNotificationCenter::Observation _observation;
 
+  std::function<void()> _scanned;
   bool _isScanning = false;
+  /// How many there were; tells what is left of an earlier one from what belongs to this.
+  uint64_t _scanCount = 0;
   std::deque<Waiting> _waiting;
   ScanRequest _request;
   std::vector<Done> _current;

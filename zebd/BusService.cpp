@@ -38,6 +38,7 @@ using Strings = std::vector<std::string>;
 constexpr size_t itemsPerSignal = 100;
 
 constexpr const char* badRequest = "org.zeb.Help1.Error.BadRequest";
+constexpr const char* failed = "org.zeb.Help1.Error.Failed";
 constexpr const char* refused = "org.zeb.Help1.Error.Refused";
 constexpr const char* unreachable = "org.zeb.Help1.Error.Unreachable";
 constexpr const char* unknownBook = "org.zeb.Help1.Error.UnknownBook";
@@ -55,27 +56,33 @@ std::string nameOfEnding(SearchEnding ending) {
   return "cancelled";
 }
 
+/// Paths are bytes, and a bus that is given what is no text takes the whole message for none.
+std::string text(const std::string& bytes) { return platform::stringByRepairingUTF8(bytes); }
+
 Dictionary dictionaryOfItem(const FoundItem& item) {
   Dictionary dictionary = {
-      {"kind", nameOfKind(item.kind)}, {"title", item.title}, {"relevance", item.relevance}};
+      {"kind", nameOfKind(item.kind)}, {"title", text(item.title)}, {"relevance", item.relevance}};
   if (!item.url.empty()) {
-    dictionary["url"] = item.url;
-    dictionary["book"] = item.bookID;
-    dictionary["bookTitle"] = item.bookTitle;
+    dictionary["url"] = text(item.url);
+    dictionary["book"] = text(item.bookID);
+    dictionary["bookTitle"] = text(item.bookTitle);
     dictionary["exactMatch"] = item.isExactMatch;
   }
   if (item.abstract) {
-    dictionary["abstract"] = *item.abstract;
+    dictionary["abstract"] = text(*item.abstract);
   }
   return dictionary;
 }
 
 Dictionary dictionaryOfBook(const BookStatus& book) {
-  Dictionary dictionary = {{"id", book.bookID},         {"title", book.title},
-                           {"language", book.language}, {"folder", book.folder},
-                           {"type", book.type},         {"indexed", book.indexPath.has_value()}};
+  Dictionary dictionary = {{"id", text(book.bookID)},
+                           {"title", text(book.title)},
+                           {"language", text(book.language)},
+                           {"folder", text(book.folder)},
+                           {"type", book.type},
+                           {"indexed", book.indexPath.has_value()}};
   if (book.indexPath) {
-    dictionary["index"] = *book.indexPath;
+    dictionary["index"] = text(*book.indexPath);
   }
   return dictionary;
 }
@@ -234,7 +241,14 @@ struct BusService::Implementation : SearchListener,
     Done done;
 
     void operator()(const Answers&... answers) const {
-      done([&] { result->returnResults(answers...); });
+      done([&] {
+        try {
+          result->returnResults(answers...);
+        } catch (const sdbus::Error& error) {
+          // More than a message may hold: an error is better than no answer.
+          result->returnError(sdbus::Error(failed, error.getMessage()));
+        }
+      });
     }
     void fail(const sdbus::Error& error) const {
       done([&] { result->returnError(error); });
@@ -273,6 +287,9 @@ struct BusService::Implementation : SearchListener,
             carryOut(*self, client, Reply<Answers...>{answer, done});
           } catch (const sdbus::Error& error) {
             done([&] { answer->returnError(error); });
+          } catch (const std::exception& exception) {
+            ZEBLog(0, "%@", exception);
+            done([&] { answer->returnError(sdbus::Error(failed, exception.what())); });
           }
         });
   }
@@ -564,6 +581,10 @@ void BusService::Implementation::registerChanges() {
                                                          const auto& answer) {
           checkTexts({name});
           self.service->removeRemote(name, [answer, name](const RemovedBooks& removed) {
+            if (removed.problem) {
+              answer.fail(sdbus::Error(failed, *removed.problem));
+              return;
+            }
             if (!removed.wasFound) {
               answer.fail(sdbus::Error(unknownBook,
                                        "there is no book on a server called \"" + name + "\""));

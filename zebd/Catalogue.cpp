@@ -160,10 +160,14 @@ std::optional<platform::Error> Catalogue::store(const CatalogueEntry& entry) con
   return environment->files->writeAtomically(_entryPath(entry.bookID), bytes);
 }
 
-void Catalogue::remove(const std::string& bookID) const {
-  if (ZEBHelpBook::isValidBookID(bookID)) {
-    (void)platform::Environment::current()->files->removeItem(_entryPath(bookID));
+std::optional<platform::Error> Catalogue::remove(const std::string& bookID) const {
+  const auto files = platform::Environment::current()->files;
+  if (!ZEBHelpBook::isValidBookID(bookID)) {
+    return std::nullopt;
   }
+  const std::string path = _entryPath(bookID);
+  auto error = files->removeItem(path);
+  return files->fileExistsAtPath(path) ? error : std::nullopt;
 }
 
 }  // namespace zebd

@@ -66,8 +66,8 @@ class Catalogue {
   /// Adds or replaces a book. On failure the earlier entry is untouched.
   std::optional<platform::Error> store(const CatalogueEntry& entry) const;
 
-  /// Forgets a book.
-  void remove(const std::string& bookID) const;
+  /// Forgets a book, which need not be known.
+  std::optional<platform::Error> remove(const std::string& bookID) const;
 
  private:
   std::string _entryPath(std::string_view bookID) const;

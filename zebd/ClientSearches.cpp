@@ -108,7 +108,12 @@ std::optional<ClientSearches::Handle> ClientSearches::start(const Client& client
   if (replaced.running) {
     _searches.at(*replaced.running).query->cancel();
   }
-  _runNext();
+  // Whoever asked learns the handle before anything that is found under it.
+  platform::RunLoop::main()->perform([weak = std::weak_ptr<ClientSearches*>(_self)] {
+    if (const auto self = weak.lock()) {
+      (*self)->_runNext();
+    }
+  });
   return handle;
 }
 

@@ -77,8 +77,9 @@ class ClientSearches {
   ClientSearches(const ClientSearches&) = delete;
   ClientSearches& operator=(const ClientSearches&) = delete;
 
-  /// Begins the search, at once or as soon as it is the client's turn, in place of an earlier one
-  /// of the client's. The handle is new. Absent when there are too many clients.
+  /// Begins the search, as soon as the main loop runs again and it is the client's turn, in place
+  /// of an earlier one of the client's: nothing is heard of it before this has returned. The handle
+  /// is new. Absent when there are too many clients.
   std::optional<Handle> start(const Client& client, const SearchRequest& request);
 
   /// The answer is no longer wanted. False for a handle that is none of the client's, or of a

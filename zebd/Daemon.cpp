@@ -1,5 +1,6 @@
 #include "zebd/Daemon.h"
 
+#include <malloc.h>
 #include <pthread.h>
 
 #include <CLI/CLI.hpp>
@@ -34,6 +35,9 @@ using platform::stringByAppendingPathComponent;
 
 /// How often the daemon looks whether the computer is busy.
 constexpr platform::Seconds loadPace{60};
+/// How often memory that is free is given back to the system, as long as there is work. What
+/// searches and models have freed stays with the allocator otherwise: more than is in use.
+constexpr platform::Seconds memoryPace{10};
 /// Requests that the bus had delivered before it heard that the daemon leaves arrive within this.
 constexpr platform::Seconds lastRequests{0.1};
 
@@ -82,9 +86,14 @@ class Daemon {
         _idleExit(
             platform::RunLoop::main(), _service->owner(), idleDelay,
             [this] { return _service->isInUse(); }, [this] { _leaveIfNobodyAsks(); }),
-        _loadTimer(platform::RunLoop::main()->scheduleRepeatingTimer(loadPace,
-                                                                     [this] { _lookAtLoad(); })) {}
-  ~Daemon() { _loadTimer->invalidate(); }
+        _loadTimer(
+            platform::RunLoop::main()->scheduleRepeatingTimer(loadPace, [this] { _lookAtLoad(); })),
+        _memoryTimer(platform::RunLoop::main()->scheduleRepeatingTimer(
+            memoryPace, [this] { _giveMemoryBack(); })) {}
+  ~Daemon() {
+    _loadTimer->invalidate();
+    _memoryTimer->invalidate();
+  }
   Daemon(const Daemon&) = delete;
   Daemon& operator=(const Daemon&) = delete;
 
@@ -92,6 +101,7 @@ class Daemon {
     const bool serves = _bus->serve(*_service,
                                     {[this] {
                                        _wasAsked = true;
+                                       _hasWorked = true;
                                        _idleExit.noteActivity();
                                      },
                                      [] { platform::RunLoop::main()->stop(); }},
@@ -110,8 +120,12 @@ class Daemon {
     _wasAsked = false;
     _bus->releaseName();
     platform::RunLoop::main()->performAfterDelay(lastRequests, [this] {
-      if (!_wasAsked || !_bus->requestName()) {
+      if (!_wasAsked) {
         platform::RunLoop::main()->stop();
+      } else {
+        // Where the next daemon has the name already, this one still does what it was asked for,
+        // and leaves after that.
+        (void)_bus->requestName();
       }
     });
   }
@@ -125,12 +139,21 @@ class Daemon {
     }
   }
 
+  void _giveMemoryBack() {
+    if (_hasWorked) {
+      ::malloc_trim(0);
+    }
+    _hasWorked = _service->isInUse() || _service->owner().shutdownGuardCount() != 0;
+  }
+
   const std::unique_ptr<BusService> _bus;
   const std::unique_ptr<HelpService> _service;
   bool _wasAsked = false;
+  bool _hasWorked = true;
   bool _wasBusy = _service->owner().shouldBeLazy();
   IdleExit _idleExit;
   const std::shared_ptr<platform::Timer> _loadTimer;
+  const std::shared_ptr<platform::Timer> _memoryTimer;
 };
 
 }  // namespace
@@ -142,6 +165,9 @@ std::optional<DaemonOptions> parseDaemonOptions(const std::vector<std::string>& 
   CLI::App app{"Serves searches in the help books of this computer on the session bus.", "zebd"};
   app.add_option("--idle", options.idleDelay, "Leave after this long without work (60)")
       ->check(CLI::Range(0.1, 1e9).description(""))
+      ->check([](const std::string& seconds) {
+        return seconds.find_first_of("nN") == std::string::npos ? "" : "not a number";
+      })
       ->option_text("SECONDS");
   app.add_option("--cache-dir", options.cacheFolder, "Folder for indexes and the list of books")
       ->option_text("DIR");

@@ -212,7 +212,9 @@ void FolderWatcher::watch(const std::vector<std::string>& folders,
   }
   for (const std::string& path : above) {
     if (!paths.contains(path)) {
-      _implementation->substitutes.insert(addWatch(path, arrivals));
+      if (const int watch = addWatch(path, arrivals); watch >= 0) {
+        _implementation->substitutes.insert(watch);
+      }
     }
   }
   for (const auto& former : watches) {

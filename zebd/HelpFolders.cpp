@@ -63,22 +63,6 @@ std::optional<std::string> realPath(const std::string& path) {
   return real.string();
 }
 
-/// Whether there is a page in the folder or a few levels below.
-bool hasPages(const std::string& folder) {
-  std::error_code error;
-  std::filesystem::recursive_directory_iterator walk(folder, error);
-  for (size_t count = 0; !error && walk != std::filesystem::recursive_directory_iterator();
-       walk.increment(error)) {
-    if (bvmake::pageKindOfFileName(walk->path().filename().string())) {
-      return true;
-    }
-    if (++count > 1000) {
-      return false;
-    }
-  }
-  return false;
-}
-
 using Translations = std::map<std::string, std::map<std::string, std::string>>;
 
 /// Adds each application's folders to `found`, by application and language; those found first stay.
@@ -257,6 +241,20 @@ void Manuals::addRegistered() {
 
 }  // namespace
 
+bool holdsPages(const std::string& folder) {
+  std::error_code error;
+  const auto options = std::filesystem::directory_options::skip_permission_denied;
+  std::filesystem::recursive_directory_iterator walk(folder, options, error);
+  for (size_t count = 0; !error && walk != std::filesystem::recursive_directory_iterator() &&
+                         count < maximumFileCount;
+       walk.increment(error), ++count) {
+    if (bvmake::pageKindOfFileName(walk->path().filename().native())) {
+      return true;
+    }
+  }
+  return false;
+}
+
 std::vector<HelpFolder> applicationHelpFolders(const std::vector<std::string>& dataFolders,
                                                const std::vector<std::string>& fallbacks,
                                                const PassedOver& passedOver) {
@@ -270,7 +268,7 @@ std::vector<HelpFolder> applicationHelpFolders(const std::vector<std::string>& d
   for (const auto& [application, translations] : found) {
     std::vector<std::string> languages;
     for (const auto& [language, folder] : translations) {
-      if (hasPages(folder)) {
+      if (holdsPages(folder)) {
         languages.push_back(language);
       }
     }

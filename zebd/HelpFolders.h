@@ -54,6 +54,10 @@ std::vector<HelpFolder> bookFolders(const std::vector<std::string>& dataFolders)
 /// have to be watched to learn of new ones.
 std::vector<std::string> placesOfHelpFolders(const std::vector<std::string>& dataFolders);
 
+/// Whether there is a help page in the folder or below. Symbolic links are not followed, and
+/// folders that may not be listed are passed over.
+bool holdsPages(const std::string& folder);
+
 /// What a folder looks like: changes whenever a file in it or below comes, goes, or is written.
 /// It does not read the files; symbolic links to folders are not followed.
 std::string folderFingerprint(const std::string& folder);

@@ -31,8 +31,9 @@ HelpService::HelpService(std::unique_ptr<Host> host, BookKeeper::Settings books,
       _start(elapsedNow()),
       _books(*_host, std::move(books)),
       _searches(*_host, std::move(listener)),
-      _watcher([this] { _books.scan([this](const BookChanges&) { _watch(); }); }),
+      _watcher([this] { _books.scan({}); }),
       _self(std::make_shared<HelpService*>(this)) {
+  _books.setScanObserver([this] { _watch(); });
   _host->owner().setBookModifiedHandler(
       [observer = _observer](const std::shared_ptr<ZEBHelpBook>& book) {
         platform::RunLoop::main()->perform([observer, book] {
@@ -48,14 +49,7 @@ HelpService::~HelpService() { *_observer = nullptr; }
 
 void HelpService::begin() {
   _books.begin();
-  _books.scan([this](const BookChanges&) { _watch(); });
-}
-
-void HelpService::scan(ScanRequest request, BookKeeper::Done done) {
-  _books.scan(std::move(request), [this, done = std::move(done)](const BookChanges& changes) {
-    done(changes);
-    _watch();
-  });
+  _books.scan({});
 }
 
 void HelpService::addRemote(const std::string& address, WantedBooks wanted,
@@ -106,18 +100,26 @@ void HelpService::removeRemote(const std::string& name,
   const auto removed = std::make_shared<RemovedBooks>();
   ScanRequest request;
   request.change = [removed, name](const Catalogue& catalogue) {
-    for (const CatalogueEntry& entry : unsubscribe(name, catalogue, removed->wasFound)) {
-      if (entry.isRemote()) {
-        catalogue.remove(entry.bookID);
-        removed->bookIDs.push_back(entry.bookID);
+    removed->wasLookedFor = true;
+    std::vector<CatalogueEntry> entries = unsubscribe(name, catalogue, removed->wasFound);
+    // One on this computer stands for itself, and would be found again at once.
+    if (std::erase_if(entries, [](const auto& entry) { return !entry.isRemote(); }) > 0) {
+      removed->wasFound = !entries.empty();
+    }
+    for (const CatalogueEntry& entry : entries) {
+      if (const auto error = catalogue.remove(entry.bookID)) {
+        removed->problem = entry.bookID + ": " + error->description;
       } else {
-        // It stands for itself here, and would be found again at once.
-        removed->wasFound = false;
+        removed->bookIDs.push_back(entry.bookID);
       }
     }
   };
-  scan(std::move(request),
-       [removed, done = std::move(done)](const BookChanges&) { done(*removed); });
+  scan(std::move(request), [removed, done = std::move(done)](const BookChanges&) {
+    if (!removed->wasLookedFor) {
+      removed->problem = "the books could not be looked through";
+    }
+    done(*removed);
+  });
 }
 
 void HelpService::_watch() { _watcher.watch(_books.watchedFolders(), _books.watchedTrees()); }

@@ -52,6 +52,10 @@ struct AddedBooks {
 
 /// What became of forgetting books.
 struct RemovedBooks {
+  /// Why what there was could not be forgotten, or not be looked for; absent when all went well.
+  std::optional<std::string> problem;
+  /// Whether the catalogue was looked through.
+  bool wasLookedFor = false;
   /// Whether there was anything of this name.
   bool wasFound = false;
   std::vector<std::string> bookIDs;
@@ -80,7 +84,9 @@ class HelpService {
 
   ClientSearches& searches() { return _searches; }
   void scan(BookKeeper::Done done) { scan({}, std::move(done)); }
-  void scan(ScanRequest request, BookKeeper::Done done);
+  void scan(ScanRequest request, BookKeeper::Done done) {
+    _books.scan(std::move(request), std::move(done));
+  }
 
   /// Subscribes to books of the catalogue at `address` (see subscribe()). `done` is called on the
   /// main thread when the books are on the bookshelf; their indexes are fetched after that.

@@ -17,21 +17,21 @@ constexpr size_t fewestPairsAtOnce = size_t{1} << 16U;
 
 void LUXBigrams::find(const Pages& pages, const std::vector<uint32_t>& stemOfNumber,
                       size_t stemCount, size_t threadCount) {
-  size_t wordCount = 0;
+  // How many pairs each stem begins.
+  std::vector<uint32_t> counts(stemCount);
+  size_t pairCount = 0;
   for (const LUXWordSequence* const page : pages) {
-    _pageStarts.push_back(wordCount);
-    wordCount += page->words.size();
+    _pageStarts.push_back(pairCount);
+    forEachPair(*page, stemOfNumber, [&](uint32_t first, uint32_t, size_t) {
+      ++counts[first];
+      ++pairCount;
+    });
   }
-  if (wordCount >= std::numeric_limits<uint32_t>::max()) {
+  if (pairCount >= std::numeric_limits<uint32_t>::max()) {
     throw platform::Exception(platform::invalidArgumentException,
                               "a book too large for semantic data");
   }
-  // How many pairs each stem begins.
-  std::vector<uint32_t> counts(stemCount);
-  for (const LUXWordSequence* const page : pages) {
-    forEachPair(*page, stemOfNumber, [&](uint32_t first, uint32_t, size_t) { ++counts[first]; });
-  }
-  _places.resize(wordCount);
+  _places.resize(pairCount);
   _starts.assign(stemCount + 1, 0);
   const std::vector<Range> ranges = _ranges(counts, threadCount);
   std::vector<std::vector<uint32_t>> seconds(ranges.size());
@@ -66,18 +66,19 @@ std::vector<LUXBigrams::Range> LUXBigrams::_ranges(const std::vector<uint32_t>& 
 void LUXBigrams::_fillRange(const Pages& pages, const std::vector<uint32_t>& stemOfNumber,
                             const std::vector<uint32_t>& counts, const Range& range,
                             std::vector<uint32_t>& seconds) {
-  // The second stem above, the place in the book below.
+  // The second stem above, below how many pairs come before it in the book.
   std::vector<uint64_t> drawers(range.pairCount);
   std::vector<size_t> ends(range.to - range.from);
   for (size_t i = 1; i < ends.size(); ++i) {
     ends[i] = ends[i - 1] + counts[range.from + i - 1];
   }
-  for (size_t page = 0; page < pages.size(); ++page) {
-    forEachPair(*pages[page], stemOfNumber, [&](uint32_t first, uint32_t second, size_t at) {
+  uint64_t pair = 0;
+  for (const LUXWordSequence* const page : pages) {
+    forEachPair(*page, stemOfNumber, [&](uint32_t first, uint32_t second, size_t) {
       if (first >= range.from && first < range.to) {
-        drawers[ends[first - range.from]++] =
-            static_cast<uint64_t>(second) << 32U | (_pageStarts[page] + at);
+        drawers[ends[first - range.from]++] = static_cast<uint64_t>(second) << 32U | pair;
       }
+      ++pair;
     });
   }
   size_t begin = 0;

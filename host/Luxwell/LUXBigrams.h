@@ -36,14 +36,17 @@ class LUXBigrams {
     }
   }
 
+  /// Gives back what forEach() needs, which is not called any more.
+  void forgetPairs() { std::vector<uint32_t>().swap(_seconds); }
+
   /// Calls `sink(uint32_t number, size_t at)` for each pair in a page, `at` being where its second
   /// word is. `sequence` and `stemOfNumber` are those that find() had.
   template <typename Sink>
   void forEachOfPage(size_t page, const LUXWordSequence& sequence,
                      const std::vector<uint32_t>& stemOfNumber, Sink sink) const {
-    const size_t begin = _pageStarts[page];
+    size_t pair = _pageStarts[page];
     forEachPair(sequence, stemOfNumber, [&](uint32_t first, uint32_t, size_t at) {
-      sink(static_cast<uint32_t>(_starts[first]) + _places[begin + at], at);
+      sink(static_cast<uint32_t>(_starts[first]) + _places[pair++], at);
     });
   }
 
@@ -76,8 +79,8 @@ class LUXBigrams {
   /// By first stem, where its pairs begin; and where the last one's end.
   std::vector<size_t> _starts;
   std::vector<uint32_t> _seconds;
+  /// By page, how many pairs come before it.
   std::vector<size_t> _pageStarts;
-  /// For each word that is the second of a pair, the pair's number less the first one's of its
-  /// first stem.
+  /// Of each pair, page by page, its number less that of the first pair of its first stem.
   std::vector<uint32_t> _places;
 };

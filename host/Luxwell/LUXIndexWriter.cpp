@@ -302,6 +302,16 @@ struct LUXIndexWriter::Implementation {
     // Where the numbers of each kind begin; and end.
     std::array<uint32_t, LUXTokenKindCount + 1> starts{};
 
+    // What only the tokens themselves are made of.
+    void forgetTexts() {
+      phraseNames = {};
+      titleNames = {};
+      for (Ranking* const ranking : {&stems, &forms, &phrases, &titles}) {
+        std::vector<uint32_t>().swap(ranking->order);
+      }
+      bigrams.forgetPairs();
+    }
+
     uint32_t startOf(LUXTokenKind kind) const { return starts[static_cast<size_t>(kind)]; }
   };
 
@@ -335,10 +345,11 @@ struct LUXIndexWriter::Implementation {
     return writer.finish();
   }
 
-  void findTokens(const LUXPhraseFinder& finder, TokenData& data) const {
+  void findTokens(LUXPhraseFinder& finder, TokenData& data) const {
     const std::array<std::function<void()>, 4> rankings = {
         [&] {
           data.phraseNames = phraseNames(finder);
+          finder.forgetPhrases();
           data.phrases = rankingOf(data.phraseNames);
         },
         [&] { data.stems = rankingOf(stems); }, [&] { data.forms = rankingOf(forms); },
@@ -396,10 +407,7 @@ struct LUXIndexWriter::Implementation {
       parts[from / pagesAtOnce] = std::move(part);
     });
     LUXTokenSections sections(data.starts.back(), data.startOf(LUXTokenKind::phrase));
-    for (auto& part : parts) {
-      sections.append(*part);
-      part.reset();
-    }
+    sections.append(std::move(parts));
     return sections;
   }
 
@@ -481,6 +489,7 @@ struct LUXIndexWriter::Implementation {
       TokenData data;
       findTokens(finder, data);
       tokenBytes = tokenSection(data);
+      data.forgetTexts();
       sections.emplace(pageSections(finder, data));
     }
     return LUXSectionedData(

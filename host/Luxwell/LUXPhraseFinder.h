@@ -42,6 +42,8 @@ class LUXPhraseFinder {
             size_t threadCount = 1);
 
   const std::vector<LUXPhrase>& phrases() const noexcept { return _phrases; }
+  /// Gives back what phrases() returns; they keep their numbers.
+  void forgetPhrases() { std::vector<LUXPhrase>().swap(_phrases); }
 
   /// Calls `sink(uint32_t phrase, bool inTitle)` for each place of a page at which a phrase is, in
   /// no particular order. `words` and `wordOfNumber` are those that find() had.

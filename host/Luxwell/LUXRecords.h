@@ -42,6 +42,11 @@ class LUXRecordsWriter {
   /// As beginRecord() gave it last.
   std::string& record() noexcept { return _bytes; }
 
+  /// Bytes of records so far.
+  size_t length() const noexcept { return _bytes.size(); }
+  /// Makes room for so many bytes of records in all, and no more.
+  void reserve(size_t length) { _bytes.reserve(length); }
+
   /// Adds the records of another writer, which is empty afterwards.
   void append(LUXRecordsWriter& other);
 

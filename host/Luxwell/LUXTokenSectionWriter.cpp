@@ -21,20 +21,18 @@ void LUXTokenSectionWriter::add(LUXTokenKind kind, std::string_view token) {
   const auto differ =
       std::mismatch(_before.begin(), _before.end(), token.begin(), token.end()).second;
   const auto shared = static_cast<size_t>(differ - token.begin());
-  appendVarnumber(_tokens, shared);
-  appendVarnumber(_tokens, token.size() - shared);
-  _tokens += token.substr(shared);
+  appendVarnumber(_section, shared);
+  appendVarnumber(_section, token.size() - shared);
+  _section += token.substr(shared);
   _before.resize(shared);
   _before += token.substr(shared);
 }
 
 platform::Data LUXTokenSectionWriter::finish() {
-  std::string out;
-  out.reserve(4 * _counts.size() + _tokens.size());
+  std::string counts;
   for (const uint32_t count : _counts) {
-    appendUInt32(out, count);
+    appendUInt32(counts, count);
   }
-  out += _tokens;
-  std::string().swap(_tokens);
-  return platform::Data::adopt(std::move(out));
+  _section.replace(0, countsLength, counts);
+  return platform::Data::adopt(std::move(_section));
 }

@@ -21,8 +21,11 @@ class LUXTokenSectionWriter {
   platform::Data finish();
 
  private:
+  static constexpr size_t countsLength = 4 * LUXTokenKindCount;
+
   std::array<uint32_t, LUXTokenKindCount> _counts{};
   uint64_t _textLength = 0;
   std::string _before;
-  std::string _tokens;
+  /// Room for the counts, and the tokens.
+  std::string _section = std::string(countsLength, '\0');
 };

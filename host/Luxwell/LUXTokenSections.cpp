@@ -28,9 +28,20 @@ LUXTokenSections::LUXTokenSections(size_t tokenCount, uint32_t firstWithoutPlace
     : _tokenBits(static_cast<unsigned>(std::bit_width(tokenCount))),
       _firstWithoutPlace(firstWithoutPlace) {}
 
-void LUXTokenSections::append(LUXTokenSections& pages) {
-  _records.append(pages._records);
-  _places.append(pages._places);
+void LUXTokenSections::append(std::vector<std::unique_ptr<LUXTokenSections>> parts) {
+  size_t recordLength = _records.length();
+  size_t placeLength = _places.length();
+  for (const auto& part : parts) {
+    recordLength += part->_records.length();
+    placeLength += part->_places.length();
+  }
+  _records.reserve(recordLength);
+  _places.reserve(placeLength);
+  for (auto& part : parts) {
+    _records.append(part->_records);
+    _places.append(part->_places);
+    part.reset();
+  }
 }
 
 // In order of tokens; in which order a token's occurrences are makes no difference.

@@ -3,6 +3,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <memory>
 #include <vector>
 
 #include "host/Luxwell/LUXRecords.h"
@@ -32,8 +33,9 @@ class LUXTokenSections {
   /// Writes the page to which has been added; the next one begins.
   void endPage();
 
-  /// Adds pages behind those that are there; they are not used afterwards.
-  void append(LUXTokenSections& pages);
+  /// Adds pages behind those that are there, one part after the other. They are given back one by
+  /// one, so that all takes little more room than the parts had.
+  void append(std::vector<std::unique_ptr<LUXTokenSections>> parts);
 
   /// The bytes of the two sections, when all pages are written.
   platform::Data countBytes() { return _records.finish(); }

@@ -91,17 +91,24 @@ TEST(LUXTokenSections, PagesOfAnySizeHaveTheirTokensInOrderWithSumsAndFirstPlace
   }
 }
 
-TEST(LUXTokenSections, PagesOfAnotherFollow) {
+TEST(LUXTokenSections, PagesOfOtherPartsFollowInTheirOrder) {
   LUXTokenSections one(10, 10);
   one.addInBody(1, 0);
   one.endPage();
-  LUXTokenSections other(10, 10);
-  other.addInBody(2, 0);
-  other.endPage();
-  one.append(other);
+  std::vector<std::unique_ptr<LUXTokenSections>> parts;
+  for (const uint32_t token : {2U, 3U}) {
+    parts.push_back(std::make_unique<LUXTokenSections>(10, 10));
+    parts.back()->addInBody(token, static_cast<uint8_t>(token));
+    parts.back()->endPage();
+  }
+  one.append(std::move(parts));
   const LUXRecords records(one.countBytes());
-  ASSERT_EQ(records.count(), 2U);
-  EXPECT_EQ(records[1], record({{2, {0, 1, 0}}}));
+  const LUXRecords placeRecords(one.placeBytes());
+  ASSERT_EQ(records.count(), 3U);
+  EXPECT_EQ(records[1], record({{2, {0, 1, 2}}}));
+  EXPECT_EQ(records[2], record({{3, {0, 1, 3}}}));
+  ASSERT_EQ(placeRecords.count(), 3U);
+  EXPECT_EQ(placeRecords[2], "\3");
 }
 
 TEST(LUXTokenSectionWriter, ReaderFindsTheTokensOfEachKind) {

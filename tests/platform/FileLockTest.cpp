@@ -56,6 +56,18 @@ TEST(FileLock, endsWithTheProcessThatHoldsIt) {
   ::close(ready[1]);
 }
 
+TEST(FileLock, tellsALockThatSomebodyHasFromOneThatNobodyCanHave) {
+  const tests::TemporaryFolder folder;
+  bool isHeld = true;
+  const auto lock = FileLock::tryLock(folder.path("lock"), &isHeld);
+  EXPECT_TRUE(lock);
+  EXPECT_FALSE(isHeld);
+  EXPECT_FALSE(FileLock::tryLock(folder.path("lock"), &isHeld));
+  EXPECT_TRUE(isHeld);
+  EXPECT_FALSE(FileLock::tryLock(folder.path("none/lock"), &isHeld));
+  EXPECT_FALSE(isHeld);
+}
+
 TEST(FileLock, isAbsentWhereTheFileCannotBeOpened) {
   const tests::TemporaryFolder folder;
   EXPECT_FALSE(FileLock::tryLock(folder.path("none/lock")));

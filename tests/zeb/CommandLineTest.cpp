@@ -100,7 +100,7 @@ TEST_F(CommandLineTest, AnchorTakesOneName) {
   const auto command = parsed<zeb::AnchorCommand>({"anchor", "-odd [name]", "--book", "a"});
   EXPECT_EQ(command.name, "-odd [name]");
   EXPECT_THAT(command.books, ElementsAre("a"));
-  expectUsageError({"anchor"}, "name");
+  expectUsageError({"anchor"}, "anchor: NAME is missing");
   expectUsageError({"anchor", "a", "b"}, "b");
 }
 
@@ -154,7 +154,7 @@ TEST_F(CommandLineTest, IndexTakesFoldersAndIdentifiers) {
       parsed<zeb::IndexCommand>({"index", "one", "two", "--book-id", "a", "--book-id", "b"});
   EXPECT_THAT(command.folders, ElementsAre("one", "two"));
   EXPECT_THAT(command.bookIDs, ElementsAre("a", "b"));
-  expectUsageError({"index", "--book-id", "a"}, "folders");
+  expectUsageError({"index", "--book-id", "a"}, "index: FOLDER... is missing");
 }
 
 TEST_F(CommandLineTest, CommandsWaitUnlessToldOtherwise) {
@@ -224,10 +224,13 @@ TEST_F(CommandLineTest, ColorKnowsThreeWords) {
 }
 
 TEST_F(CommandLineTest, WrongLinesAreUsageErrors) {
-  expectUsageError({}, "subcommand");
+  expectUsageError({}, "a command is missing");
+  expectUsageError({"publish", "a"}, "publish: --site DIR is missing");
+  expectUsageError({"--color", "never", "serach", "a"}, "there is no command \"serach\"");
+  expectUsageError({"search", "a", "--limit", "10001"}, "not in range 1 to 10000");
   expectUsageError({"sing"}, "sing");
-  expectUsageError({"suggest"}, "words");
-  expectUsageError({"similar"}, "words");
+  expectUsageError({"suggest"}, "suggest: WORDS... is missing");
+  expectUsageError({"similar"}, "similar: WORDS... is missing");
   expectUsageError({"search", "a", "--limt", "3"}, "--limt");
   expectUsageError({"search", "a", "--limit", "0"}, "--limit");
   expectUsageError({"search", "a", "--limit", "-3"}, "--limit");

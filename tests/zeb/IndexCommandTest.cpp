@@ -36,6 +36,14 @@ TEST_F(IndexCommandTest, MakesABookOfAFolderNamedAfterItAndTitledByItsFirstPage)
   EXPECT_TRUE(std::filesystem::exists(world.indexPath("one")));
 }
 
+TEST_F(IndexCommandTest, SecondFolderOfOneNameIsAMistake) {
+  world.writePage("other/one/index.html", "Other", "Figs.");
+  const Outcome run = world.zeb({"index", path("one"), path("other/one")});
+  EXPECT_EQ(run.code, ExitCode::failure);
+  EXPECT_EQ(run.err, "zeb: error: " + path("other/one") + ": there is another book \"one\"\n");
+  EXPECT_EQ(catalogue().entry("one")->title, "First");
+}
+
 TEST_F(IndexCommandTest, FolderWithoutFirstPageIsTitledByItsName) {
   ASSERT_EQ(world.zeb({"index", path("two") + "/"}).code, ExitCode::success);
   EXPECT_EQ(catalogue().entry("two")->title, "two");

@@ -75,6 +75,20 @@ TEST_F(BookDiscoveryTest, EarlierDataFolderWins) {
   EXPECT_EQ(reasons[folder.path("share/zeb/books/garden")], "there is another book \"org.garden\"");
 }
 
+TEST_F(BookDiscoveryTest, FolderIsNoSecondBookOfAnIdentifierThatAnotherHas) {
+  page("one/garden/index.html", "Garden");
+  page("kitchen/index.html", "Kitchen");
+  page("two/garden/index.html", "Another garden");
+  std::string reason;
+  EXPECT_EQ(discovery.add(folder.path("one/garden"), std::nullopt, {}, reason), "garden");
+  EXPECT_EQ(discovery.add(folder.path("kitchen"), std::nullopt, {}, reason), "kitchen");
+  EXPECT_EQ(discovery.add(folder.path("one/garden"), std::nullopt, {}, reason), "garden");
+  EXPECT_EQ(reason, "") << "the same folder twice is no mistake";
+  EXPECT_EQ(discovery.add(folder.path("two/garden"), std::nullopt, {}, reason), std::nullopt);
+  EXPECT_EQ(reason, "there is another book \"garden\"");
+  EXPECT_THAT(found(), ElementsAre("garden: Garden", "kitchen: Kitchen"));
+}
+
 TEST_F(BookDiscoveryTest, LanguageOfALaterDataFolderCountsWhereTheEarlierHasItNot) {
   page("own/help/en/editor/index.html", "Editor");
   page("share/help/de/editor/index.html", "Texteditor");

@@ -326,6 +326,18 @@ TEST_F(BusServiceTest, AnotherProgramAsksForBooksModelsAndStatus) {
               HasSubstr("there is no option \"color\""));
 }
 
+TEST_F(BusServiceTest, BookWhoseFolderIsNoTextKeepsNoOtherFromBeingListed) {
+  const std::string odd = "elsewhere/caf\xE9";
+  writePage(odd + "/index.html", "Coffee", "Coffee is made of beans.");
+  zebd::ScanRequest request;
+  request.folders.push_back({folder.path(odd), std::nullopt});
+  bool isScanned = false;
+  service->scan(request, [&](const zebd::BookChanges&) { isScanned = true; });
+  EXPECT_TRUE(runUntil([&] { return isScanned; }));
+  EXPECT_THAT(gdbus({"org.zeb.Help1.Books"}),
+              testing::AllOf(HasSubstr("'title': <'Coffee'>"), HasSubstr("'id': <'garden'>")));
+}
+
 TEST_F(BusServiceTest, RescanTellsWhatHasChanged) {
   EXPECT_THAT(gdbus({"org.zeb.Help1.Rescan"}), "(uint32 0, uint32 2, uint32 0, uint32 0)\n");
   std::filesystem::remove_all(folder.path("share/help/en/garden"));

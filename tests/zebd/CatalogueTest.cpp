@@ -99,11 +99,23 @@ TEST_F(CatalogueTest, RemovingForgetsTheBookAndNoOther) {
   ASSERT_EQ(catalogue.store(entry("a")), std::nullopt);
   ASSERT_EQ(catalogue.store(entry("b")), std::nullopt);
   const std::string outside = folder.write("deep/outside.plist", "not a book");
-  catalogue.remove("a");
-  catalogue.remove("a");
-  catalogue.remove("../outside");
+  EXPECT_EQ(catalogue.remove("a"), std::nullopt);
+  EXPECT_EQ(catalogue.remove("a"), std::nullopt);
+  EXPECT_EQ(catalogue.remove("../outside"), std::nullopt);
   EXPECT_THAT(catalogue.entries(), ElementsAre(entry("b")));
   EXPECT_TRUE(std::filesystem::exists(outside));
+}
+
+TEST_F(CatalogueTest, BookThatCannotBeForgottenIsAnError) {
+  ASSERT_EQ(catalogue.store(entry("a")), std::nullopt);
+  const auto files = std::make_shared<platform::FailingFileManager>();
+  files->fail(platform::FailingFileManager::Operation::remove, EROFS, "a.plist");
+  platform::Environment environment = *platform::Environment::current();
+  environment.files = files;
+  const platform::EnvironmentOverride override(std::move(environment));
+  EXPECT_NE(catalogue.remove("a"), std::nullopt);
+  EXPECT_EQ(catalogue.entry("a"), entry("a"));
+  EXPECT_EQ(catalogue.remove("b"), std::nullopt) << "it is not there anyway";
 }
 
 TEST_F(CatalogueTest, EntryCutOffAnywhereCostsOnlyThatBook) {

@@ -66,6 +66,8 @@ TEST_F(DaemonCommandsTest, CommandsThatChangeBooksSayTheSameWithTheDaemonAsWitho
       {"index", "@extra"},
       {"index", "--book-id", "org.named", "@extra"},
       {"index", "@nowhere"},
+      {"index", "@extra", "@second/extra"},
+      {"index", "@caf\xE9"},
       {"index", "--book-id", "one", "--book-id", "two", "@extra"},
       {"scan", "--no-system", "--force", "@extra", "@nowhere"},
       {"books"},
@@ -82,7 +84,10 @@ TEST_F(DaemonCommandsTest, CommandsThatChangeBooksSayTheSameWithTheDaemonAsWitho
   std::vector<std::string> answers;
   for (const bool hasBus : {true, false}) {
     const DaemonWorld world;
-    world.folder.write("extra/index.html", "<title>Extra</title><h1>Extra</h1><p>More of it.</p>");
+    for (const char* name : {"extra", "second/extra", "caf\xE9"}) {
+      world.folder.write(std::string(name) + "/index.html",
+                         "<title>Extra</title><h1>Extra</h1><p>More of it.</p>");
+    }
     for (size_t i = 0; i < lines.size(); ++i) {
       std::vector<std::string> line = lines[i];
       for (std::string& word : line) {
@@ -99,9 +104,10 @@ TEST_F(DaemonCommandsTest, CommandsThatChangeBooksSayTheSameWithTheDaemonAsWitho
     }
   }
   EXPECT_THAT(answers[0], HasSubstr("2 indexed, 0 unchanged, 0 forgotten, 0 failed"));
-  EXPECT_THAT(answers[6], HasSubstr("4 indexed, 0 unchanged, 0 forgotten, 1 failed"));
-  EXPECT_THAT(answers[13], HasSubstr("org.applets  en  Applets"));
-  EXPECT_THAT(answers[15], HasSubstr("Applets"));
+  EXPECT_THAT(answers[5], HasSubstr("there is another book \"extra\""));
+  EXPECT_THAT(answers[8], HasSubstr("5 indexed, 0 unchanged, 0 forgotten, 1 failed"));
+  EXPECT_THAT(answers[15], HasSubstr("org.applets  en  Applets"));
+  EXPECT_THAT(answers[17], HasSubstr("Applets"));
 }
 
 TEST_F(DaemonCommandsTest, ScanIndexesBooksThatTheDaemonHasJustFound) {
@@ -250,6 +256,30 @@ TEST_F(DaemonCommandsTest, WatchOutlivesTheDaemon) {
   ASSERT_EQ(::kill(daemonProcess(), SIGKILL), 0);
   page("orchard", "Pears", "Pear trees flower in spring.");
   EXPECT_TRUE(waitFor([&] { return says("+ Pears"); })) << contents(output);
+}
+
+TEST_F(DaemonCommandsTest, ProgramEndsInOrderWhenTheBusGoes) {
+  EXPECT_THAT(zeb({"scan"}), StartsWith("0\n"));
+  const pid_t daemon = daemonProcess();
+  const tests::Variable address("DBUS_SESSION_BUS_ADDRESS", bus.address());
+  const std::string output = folder.path("watched");
+  tests::ChildProcess watcher(ZEB_PROGRAM, {"watch", "spring"}, output);
+  EXPECT_TRUE(waitFor([&] { return contents(output).find("+ Roses") != std::string::npos; }));
+  bus.stop();
+  EXPECT_EQ(watcher.wait(), 3);
+  EXPECT_THAT(contents(output), HasSubstr("the search broke off"));
+  EXPECT_TRUE(waitFor([&] { return ::kill(daemon, 0) != 0; }));
+}
+
+TEST_F(DaemonCommandsTest, SearchThatIsTooLongForTheDaemonIsCarriedOutWithoutIt) {
+  EXPECT_THAT(zeb({"scan"}), StartsWith("0\n"));
+  EXPECT_THAT(zeb({"search", std::string(5000, 'a')}),
+              AllOf(StartsWith("1\n"), HasSubstr("nothing found")));
+  EXPECT_THAT(zeb({"anchor", "caf\xE9"}), AllOf(StartsWith("1\n"), HasSubstr("nothing found")));
+}
+
+TEST_F(DaemonCommandsTest, ScansAreWaitedForThoughIndexesAreNot) {
+  EXPECT_THAT(zeb({"scan", "--wait", "0"}), AllOf(StartsWith("0\n"), HasSubstr("unchanged")));
 }
 
 }  // namespace

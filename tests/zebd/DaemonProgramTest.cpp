@@ -177,6 +177,7 @@ TEST_F(DaemonOptionsTest, HelpAndVersionArePrintedAndNothingIsLeftToDo) {
 TEST_F(DaemonOptionsTest, WrongLinesAreErrors) {
   for (const std::vector<std::string>& line : {std::vector<std::string>{"--idle", "0"},
                                                {"--idle", "soon"},
+                                               {"--idle", "nan"},
                                                {"--cache-dir", "relative"},
                                                {"--nonsense"},
                                                {"word"}}) {

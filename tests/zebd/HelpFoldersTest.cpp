@@ -1,6 +1,7 @@
 #include "zebd/HelpFolders.h"
 
 #include <gmock/gmock.h>
+#include <unistd.h>
 
 #include <filesystem>
 #include <map>
@@ -203,6 +204,30 @@ TEST_F(FolderFingerprintTest, LinkToItsOwnFolderIsNoTrap) {
 
 TEST_F(FolderFingerprintTest, MissingFolderLooksLikeAnEmptyOne) {
   EXPECT_EQ(zebd::folderFingerprint(folder.path("none")), fingerprint());
+}
+
+TEST_F(HelpFoldersTest, FolderThatMayNotBeListedHidesNoPageBesideIt) {
+  namespace fs = std::filesystem;
+  root.write("help/image.png", "no page");
+  EXPECT_FALSE(zebd::holdsPages(root.path("help")));
+  root.write("help/page.html", "<title>Page</title>");
+  // Folders are listed in no order; one of these may come before the page.
+  const std::vector<std::string> closed = {root.path("help/a"), root.path("help/m"),
+                                           root.path("help/z")};
+  for (const std::string& folder : closed) {
+    fs::create_directory(folder);
+    fs::permissions(folder, fs::perms::none);
+  }
+  // Nothing is closed to root.
+  const bool isRoot = ::geteuid() == 0;
+  fs::permissions(root.path(), fs::perms::all);
+  ASSERT_EQ(isRoot ? ::seteuid(65534) : 0, 0);
+  const bool holds = zebd::holdsPages(root.path("help"));
+  ASSERT_EQ(isRoot ? ::seteuid(0) : 0, 0);
+  for (const std::string& folder : closed) {
+    fs::permissions(folder, fs::perms::owner_all);
+  }
+  EXPECT_TRUE(holds);
 }
 
 }  // namespace

@@ -2,13 +2,18 @@
 
 #include <gmock/gmock.h>
 
+#include <cerrno>
 #include <filesystem>
+#include <future>
 #include <map>
 #include <stdexcept>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "host/Zebrine/ZEBConstants.h"
+#include "tests/support/Latch.h"
+#include "tests/support/ScriptedServer.h"
 #include "tests/zebd/HostWorld.h"
 #include "zebd/BookFolder.h"
 
@@ -89,6 +94,41 @@ class ThrowingFiles : public platform::FileManager {
   }
 };
 
+/// A bus on which news may take their time.
+class HeldNews : public platform::DistributedNotificationCenter {
+ public:
+  Observation addObserver(const std::string& name, Handler handler) override {
+    return _center->addObserver(name, std::move(handler));
+  }
+  void postNotification(const std::string& name, std::optional<std::string> object) override {
+    const platform::MutexLock lock(_mutex);
+    if (_holds) {
+      _held.emplace_back(name, std::move(object));
+    } else {
+      _center->postNotification(name, std::move(object));
+    }
+  }
+
+  void hold() {
+    const platform::MutexLock lock(_mutex);
+    _holds = true;
+  }
+  void release() {
+    const platform::MutexLock lock(_mutex);
+    _holds = false;
+    for (auto& [name, object] : std::exchange(_held, {})) {
+      _center->postNotification(name, std::move(object));
+    }
+  }
+
+ private:
+  const std::shared_ptr<DistributedNotificationCenter> _center =
+      platform::localNotificationCenter();
+  platform::Mutex _mutex;
+  bool _holds GUARDED_BY(_mutex) = false;
+  std::vector<std::pair<std::string, std::optional<std::string>>> _held GUARDED_BY(_mutex);
+};
+
 zebd::SearchRequest request(const std::string& text) {
   zebd::SearchRequest request;
   request.text = text;
@@ -110,9 +150,22 @@ class HelpServiceTest : public testing::Test, protected tests::HostWorld {
 
   /// Serves, and waits until the books are found.
   void start() {
-    service = std::make_unique<zebd::HelpService>(startHost(), settings(), listener);
+    auto started = startHost();
+    host = started.get();
+    service = std::make_unique<zebd::HelpService>(std::move(started), settings(), listener);
     service->begin();
     EXPECT_TRUE(runUntil([this] { return service->status().watchedFolderCount > 0; }));
+  }
+  /// A book on a server that nobody reaches.
+  static zebd::CatalogueEntry remoteEntry() {
+    zebd::CatalogueEntry entry;
+    entry.bookID = "org.remote";
+    entry.title = "Remote";
+    entry.type = ZEBHelpBookType4;
+    entry.folder = "/nowhere";
+    entry.accessPagePath = "/nowhere/index.html";
+    entry.catalogueURL = "http://127.0.0.1:9/catalogue.json";
+    return entry;
   }
   zebd::BookKeeper::Settings settings() const {
     return {{folder.path("share")}, folder.path("caches/zeb/books"), {"en"}};
@@ -154,6 +207,8 @@ class HelpServiceTest : public testing::Test, protected tests::HostWorld {
 
   std::shared_ptr<Listener> listener = std::make_shared<Listener>();
   std::unique_ptr<zebd::HelpService> service;
+  /// Of the service.
+  zebd::Host* host = nullptr;
 };
 
 TEST_F(HelpServiceTest, FindsTheBooksOfTheDataFoldersAndServesSearches) {
@@ -393,6 +448,106 @@ TEST_F(HelpServiceTest, RequestsOutOfBoundsMeetAnObjection) {
   bad = request("words");
   bad.languages.assign(1001, "en");
   EXPECT_EQ(HelpService::objection(bad), "there are too many languages");
+}
+
+TEST_F(HelpServiceTest, ListOfBooksThatCannotBeLockedHoldsUpNoScan) {
+  std::filesystem::create_directories(folder.path("caches/zeb/books"));
+  // As in a folder that cannot be written, which is no hindrance to root.
+  std::filesystem::create_directories(folder.path("caches/zeb/books.lock"));
+  start();
+  EXPECT_EQ(scan().unchanged, 2U);
+  EXPECT_FALSE(service->status().isScanning);
+}
+
+TEST_F(HelpServiceTest, NothingIsHeardOfASearchBeforeItsHandleIsKnown) {
+  start();
+  waitUntilFound("spring", {"Roses"});
+  const uint64_t handle = begin("client", "spring");
+  // Of the host's searches one is done after the other: when this one ends, any search before it
+  // has found what there is.
+  class Ending : public zebd::SearchReceiver {
+   public:
+    void foundResults(const ZEBResultBatch& /*batch*/) override {}
+    void searchEnded(bool /*finished*/) override { ended.set_value(); }
+    std::promise<void> ended;
+  };
+  const auto after = std::make_shared<Ending>();
+  host->registerBooks({"garden"}, after);
+  after->ended.get_future().wait();
+  EXPECT_THAT(listener->titles(handle), IsEmpty());
+  EXPECT_TRUE(runUntil([&] { return listener->hasEnded(handle); }));
+  EXPECT_THAT(listener->titles(handle), ElementsAre("Roses"));
+}
+
+TEST_F(HelpServiceTest, NewsThatAnEarlierScanNeedNotWaitForAnyMoreIsNotMissedInALaterOne) {
+  const auto center = std::make_shared<HeldNews>();
+  platform::Environment environment = *platform::Environment::current();
+  environment.notificationCenter = center;
+  const platform::EnvironmentOverride override(environment);
+  start();
+  const auto clock = environment.clock;
+  zebd::ScanRequest forced;
+  forced.allBooksEvenIfUnchanged = true;
+  std::optional<zebd::BookChanges> first;
+  service->scan(forced, [&](const zebd::BookChanges& changes) { first = changes; });
+  EXPECT_TRUE(runUntil([&] { return first.has_value(); }));
+  const auto begun = clock->elapsed();
+  EXPECT_TRUE(runUntil([&] { return clock->elapsed() - begun > platform::Seconds(3); }));
+  // Its news are under way when the patience of the first would have been at its end.
+  center->hold();
+  std::optional<zebd::BookChanges> second;
+  service->scan(forced, [&](const zebd::BookChanges& changes) { second = changes; });
+  EXPECT_TRUE(runUntil([&] { return clock->elapsed() - begun > platform::Seconds(6); }));
+  EXPECT_FALSE(second.has_value());
+  center->release();
+  EXPECT_TRUE(runUntil([&] { return second.has_value(); }));
+  EXPECT_EQ(second->changed, 2U);
+  EXPECT_EQ(second->failed, 0U);
+  EXPECT_TRUE(waitUntilQuiet(service->owner()));
+  service.reset();
+}
+
+TEST_F(HelpServiceTest, ScanThatAsksServersEndsWhenTheyHaveAnswered) {
+  tests::Latch mayAnswer;
+  tests::ScriptedServer server([&](const auto& /*request*/, tests::ScriptedConnection& connection) {
+    mayAnswer.wait();
+    connection.send(tests::httpAnswer(404, "none"));
+  });
+  zebd::CatalogueEntry remote = remoteEntry();
+  remote.catalogueURL = server.URL("/catalogue.json");
+  ASSERT_EQ(zebd::Catalogue(settings().catalogueFolder).store(remote), std::nullopt);
+  start();
+  zebd::ScanRequest request;
+  request.asksServers = true;
+  bool hasEnded = false;
+  service->scan(request, [&](const zebd::BookChanges&) { hasEnded = true; });
+  (void)server.waitForRequests(1);
+  EXPECT_TRUE(runUntil([this] { return !service->status().isScanning; }));
+  EXPECT_FALSE(hasEnded);
+  mayAnswer.open();
+  EXPECT_TRUE(runUntil([&] { return hasEnded; }));
+}
+
+TEST_F(HelpServiceTest, RemoteBookThatCannotBeForgottenIsAProblem) {
+  ASSERT_EQ(zebd::Catalogue(settings().catalogueFolder).store(remoteEntry()), std::nullopt);
+  start();
+  const auto removed = [this](const std::shared_ptr<platform::FileManager>& files) {
+    platform::Environment environment = *platform::Environment::current();
+    environment.files = files;
+    const platform::EnvironmentOverride override(std::move(environment));
+    std::optional<zebd::RemovedBooks> answer;
+    service->removeRemote("org.remote", [&](const zebd::RemovedBooks& made) { answer = made; });
+    EXPECT_TRUE(runUntil([&] { return answer.has_value(); }));
+    return answer.value_or(zebd::RemovedBooks());
+  };
+  const auto failing = std::make_shared<platform::FailingFileManager>();
+  failing->fail(platform::FailingFileManager::Operation::remove, EROFS, "org.remote.plist");
+  EXPECT_THAT(removed(failing).problem.value_or(""), testing::StartsWith("org.remote: "));
+  EXPECT_EQ(removed(std::make_shared<ThrowingFiles>()).problem,
+            "the books could not be looked through");
+  const zebd::RemovedBooks gone = removed(std::make_shared<platform::FileManager>());
+  EXPECT_EQ(gone.problem, std::nullopt);
+  EXPECT_THAT(gone.bookIDs, ElementsAre("org.remote"));
 }
 
 TEST_F(HelpServiceTest, BookWhoseEntryCannotBeWrittenIsServedAllTheSame) {
