@@ -336,6 +336,10 @@ bool DaemonClient::isBusy() const {
 }
 
 std::optional<std::string> DaemonClient::start() {
+  // The bus cannot start what it has no service file of, even where somebody else has started it.
+  if (isRunning()) {
+    return std::nullopt;
+  }
   try {
     uint32_t how = 0;
     _implementation->bus->callMethod("StartServiceByName")

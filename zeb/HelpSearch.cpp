@@ -10,12 +10,12 @@
 #include "host/Zebrine/ZEBResult.h"
 #include "platform/Environment.h"
 #include "platform/Files.h"
-#include "platform/Processes.h"
 #include "platform/RunLoop.h"
 #include "platform/Strings.h"
 #include "platform/ThreadSafety.h"
 #include "platform/URL.h"
 #include "zeb/DaemonClient.h"
+#include "zeb/IndexingTools.h"
 #include "zeb/SearchProvider.h"
 #include "zebd/BookFolder.h"
 #include "zebd/Host.h"
@@ -38,14 +38,6 @@ constexpr platform::Seconds daemonPace{0.2};
 constexpr platform::Seconds forever = platform::Seconds::max();
 
 platform::Clock::Instant elapsedNow() { return platform::Environment::current()->clock->elapsed(); }
-
-/// Somebody's: whose it is, its command line does not say.
-bool anIndexingToolIsRunning() {
-  std::vector<platform::ProcessEntry> processes;
-  return platform::Environment::current()->processTable->readProcesses(processes) == 0 &&
-         std::any_of(processes.begin(), processes.end(),
-                     [](const auto& process) { return process.commandName == "bvmake"; });
-}
 
 using Items = std::vector<zebd::FoundItem>;
 
@@ -402,7 +394,7 @@ HelpSearch::Indexing HelpSearch::makeIndexes(const std::vector<std::string>& boo
     }
   };
   Indexing indexing;
-  bool mayHaveBeenLeftToAnother = anIndexingToolIsRunning();
+  bool mayHaveBeenLeftToAnother = runningIndexingToolCount() > 0;
   bool isAnew = false;
   while (true) {
     (void)_implementation->reports->take();
@@ -425,7 +417,7 @@ HelpSearch::Indexing HelpSearch::makeIndexes(const std::vector<std::string>& boo
     Host::runMainLoopUntil(
         [&] {
           tellAll();
-          const bool isLeftToAnother = !waiting.empty() && anIndexingToolIsRunning();
+          const bool isLeftToAnother = !waiting.empty() && runningIndexingToolCount() > 0;
           mayHaveBeenLeftToAnother = mayHaveBeenLeftToAnother || isLeftToAnother;
           return !isLeftToAnother;
         },

@@ -8,25 +8,14 @@
 #include <utility>
 
 #include "host/Zebrine/ZEBGeneratedFiles.h"
-#include "platform/Environment.h"
-#include "platform/Processes.h"
 #include "platform/Strings.h"
+#include "zeb/IndexingTools.h"
 
 namespace zeb {
 
 namespace {
 
 using JSON = nlohmann::ordered_json;
-
-size_t indexingToolCount() {
-  std::vector<platform::ProcessEntry> processes;
-  if (platform::Environment::current()->processTable->readProcesses(processes) != 0) {
-    return 0;
-  }
-  return static_cast<size_t>(
-      std::count_if(processes.begin(), processes.end(),
-                    [](const auto& process) { return process.commandName == "bvmake"; }));
-}
 
 std::string_view nameOfOrigin(IndexOrigin origin) {
   switch (origin) {
@@ -130,7 +119,7 @@ StatusReport statusReport(std::vector<ListedBook> books, const DaemonClient* dae
     ++report.modelCount;
     report.buildingModelCount += model.isBeingBuilt ? 1 : 0;
   }
-  report.indexingToolCount = indexingToolCount();
+  report.indexingToolCount = runningIndexingToolCount();
   report.canHaveDaemon = daemon != nullptr;
   if (daemon != nullptr && daemon->isRunning()) {
     report.daemon = daemon->status();

@@ -28,7 +28,7 @@ struct StatusReport {
   std::vector<ListedBook> books;
   size_t modelCount = 0;
   size_t buildingModelCount = 0;
-  /// Indexing tools that run, whoever has started them.
+  /// Indexing tools that run for the user.
   size_t indexingToolCount = 0;
   /// Whether there is a daemon to ask, running or not.
   bool canHaveDaemon = false;

@@ -56,18 +56,16 @@ class DaemonCommandsTest : public testing::Test, protected DaemonWorld {
   }
 };
 
-/// One after the other: variables of the process say where the books are.
+/// The same commands on two computers side by side, one of them with a daemon.
 TEST_F(DaemonCommandsTest, CommandsThatChangeBooksSayTheSameWithTheDaemonAsWithoutIt) {
   const NginxServer server;
   publish(server, "org.applets");
   const std::vector<std::vector<std::string>> lines = {
       {"scan", "--force"},
       {"books"},
-      {"index", "@extra"},
+      {"index", "@extra", "@second/extra"},
       {"index", "--book-id", "org.named", "@extra"},
       {"index", "@nowhere"},
-      {"index", "@extra", "@second/extra"},
-      {"index", "@caf\xE9"},
       {"index", "--book-id", "one", "--book-id", "two", "@extra"},
       {"scan", "--no-system", "--force", "@extra", "@nowhere"},
       {"books"},
@@ -81,33 +79,34 @@ TEST_F(DaemonCommandsTest, CommandsThatChangeBooksSayTheSameWithTheDaemonAsWitho
       {"search", "afar"},
       {"remove", server.URL("/catalogue.json")},
       {"search", "--book", "garden", "spring"}};
+  const DaemonWorld with;
+  const DaemonWorld without;
   std::vector<std::string> answers;
-  for (const bool hasBus : {true, false}) {
-    const DaemonWorld world;
-    for (const char* name : {"extra", "second/extra", "caf\xE9"}) {
-      world.folder.write(std::string(name) + "/index.html",
-                         "<title>Extra</title><h1>Extra</h1><p>More of it.</p>");
-    }
-    for (size_t i = 0; i < lines.size(); ++i) {
-      std::vector<std::string> line = lines[i];
-      for (std::string& word : line) {
-        word = word.starts_with('@') ? world.folder.path(word.substr(1)) : word;
+  for (const std::vector<std::string>& line : lines) {
+    std::vector<std::unique_ptr<tests::ChildProcess>> programs;
+    for (const DaemonWorld* world : {&with, &without}) {
+      for (const char* name : {"extra", "second/extra"}) {
+        world->folder.write(std::string(name) + "/index.html",
+                            "<title>Extra</title><h1>Extra</h1><p>More of it.</p>");
       }
-      const std::string answer = comparable(world.zeb(line, hasBus), world);
-      if (hasBus) {
-        answers.push_back(answer);
-        EXPECT_TRUE(world.isThere()) << testing::PrintToString(line);
-      } else {
-        EXPECT_EQ(answers[i], answer) << testing::PrintToString(line);
-        EXPECT_FALSE(world.isThere());
+      std::vector<std::string> words = line;
+      for (std::string& word : words) {
+        word = word.starts_with('@') ? world->folder.path(word.substr(1)) : word;
       }
+      world->enter();
+      programs.push_back(world->startZeb(words, world == &with));
     }
+    answers.push_back(comparable(with.endOf(*programs[0]), with));
+    EXPECT_EQ(answers.back(), comparable(without.endOf(*programs[1]), without))
+        << testing::PrintToString(line);
+    EXPECT_TRUE(with.isThere()) << testing::PrintToString(line);
   }
+  EXPECT_FALSE(without.isThere());
   EXPECT_THAT(answers[0], HasSubstr("2 indexed, 0 unchanged, 0 forgotten, 0 failed"));
-  EXPECT_THAT(answers[5], HasSubstr("there is another book \"extra\""));
-  EXPECT_THAT(answers[8], HasSubstr("5 indexed, 0 unchanged, 0 forgotten, 1 failed"));
-  EXPECT_THAT(answers[15], HasSubstr("org.applets  en  Applets"));
-  EXPECT_THAT(answers[17], HasSubstr("Applets"));
+  EXPECT_THAT(answers[2], HasSubstr("there is another book \"extra\""));
+  EXPECT_THAT(answers[6], HasSubstr("4 indexed, 0 unchanged, 0 forgotten, 1 failed"));
+  EXPECT_THAT(answers[13], HasSubstr("org.applets  en  Applets"));
+  EXPECT_THAT(answers[15], HasSubstr("Applets"));
 }
 
 TEST_F(DaemonCommandsTest, ScanIndexesBooksThatTheDaemonHasJustFound) {
@@ -221,61 +220,14 @@ TEST_F(DaemonCommandsTest, StatusTellsWhereIndexesCameFrom) {
   EXPECT_THAT(zeb({"status"}), HasSubstr("fetched from a server"));
 }
 
-TEST_F(DaemonCommandsTest, WatchPrintsPagesAsTheyAreFoundAndAsBooksComeAndGo) {
-  for (const bool hasBus : {true, false}) {
-    EXPECT_THAT(zeb({"watch", "--once", "spring"}, hasBus),
-                AllOf(StartsWith("0\n"), HasSubstr("+ Roses  Roses  file://")))
-        << hasBus;
-  }
-  EXPECT_THAT(zeb({"watch", "--once", "nowhere"}), "1\n");
-  EXPECT_THAT(zeb({"watch", "--once", "--json", "spring"}),
-              HasSubstr("{\"change\":\"found\",\"title\":\"Roses\",\"book\":\"garden\""));
-  const tests::Variable address("DBUS_SESSION_BUS_ADDRESS", bus.address());
-  const std::string output = folder.path("watched");
-  tests::ChildProcess watcher(ZEB_PROGRAM, {"watch", "spring"}, output);
-  const auto says = [&](const std::string& text) {
-    return contents(output).find(text) != std::string::npos;
-  };
-  EXPECT_TRUE(waitFor([&] { return says("+ Roses"); }));
-  page("orchard", "Pears", "Pear trees flower in spring.");
-  EXPECT_TRUE(waitFor([&] { return says("+ Pears"); })) << contents(output);
-  fs::remove_all(folder.path("share/help/en/garden"));
-  EXPECT_TRUE(waitFor([&] { return says("- Roses"); })) << contents(output);
-  EXPECT_TRUE(watcher.isRunning());
-}
-
-TEST_F(DaemonCommandsTest, WatchOutlivesTheDaemon) {
-  EXPECT_THAT(zeb({"scan"}), StartsWith("0\n"));
-  const tests::Variable address("DBUS_SESSION_BUS_ADDRESS", bus.address());
-  const std::string output = folder.path("watched");
-  tests::ChildProcess watcher(ZEB_PROGRAM, {"watch", "spring"}, output);
-  const auto says = [&](const std::string& text) {
-    return contents(output).find(text) != std::string::npos;
-  };
-  EXPECT_TRUE(waitFor([&] { return says("+ Roses"); }));
-  ASSERT_EQ(::kill(daemonProcess(), SIGKILL), 0);
-  page("orchard", "Pears", "Pear trees flower in spring.");
-  EXPECT_TRUE(waitFor([&] { return says("+ Pears"); })) << contents(output);
-}
-
-TEST_F(DaemonCommandsTest, ProgramEndsInOrderWhenTheBusGoes) {
-  EXPECT_THAT(zeb({"scan"}), StartsWith("0\n"));
-  const pid_t daemon = daemonProcess();
-  const tests::Variable address("DBUS_SESSION_BUS_ADDRESS", bus.address());
-  const std::string output = folder.path("watched");
-  tests::ChildProcess watcher(ZEB_PROGRAM, {"watch", "spring"}, output);
-  EXPECT_TRUE(waitFor([&] { return contents(output).find("+ Roses") != std::string::npos; }));
-  bus.stop();
-  EXPECT_EQ(watcher.wait(), 3);
-  EXPECT_THAT(contents(output), HasSubstr("the search broke off"));
-  EXPECT_TRUE(waitFor([&] { return ::kill(daemon, 0) != 0; }));
-}
-
-TEST_F(DaemonCommandsTest, SearchThatIsTooLongForTheDaemonIsCarriedOutWithoutIt) {
+TEST_F(DaemonCommandsTest, WhatTheBusCannotCarryIsDoneWithoutTheDaemon) {
   EXPECT_THAT(zeb({"scan"}), StartsWith("0\n"));
   EXPECT_THAT(zeb({"search", std::string(5000, 'a')}),
               AllOf(StartsWith("1\n"), HasSubstr("nothing found")));
   EXPECT_THAT(zeb({"anchor", "caf\xE9"}), AllOf(StartsWith("1\n"), HasSubstr("nothing found")));
+  folder.write("caf\xE9/index.html", "<title>Coffee</title><h1>Coffee</h1>");
+  EXPECT_THAT(zeb({"index", folder.path("caf\xE9")}),
+              AllOf(StartsWith("0\n"), HasSubstr("  Coffee\n")));
 }
 
 TEST_F(DaemonCommandsTest, ScansAreWaitedForThoughIndexesAreNot) {

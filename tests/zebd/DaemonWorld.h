@@ -10,9 +10,11 @@
 #include <filesystem>
 #include <fstream>
 #include <iterator>
+#include <memory>
 #include <string>
 #include <string_view>
 #include <thread>
+#include <utility>
 #include <vector>
 
 #include "tests/platform/TemporaryFolder.h"
@@ -24,15 +26,17 @@ namespace tests {
 /// Sets a variable of this process, and so of its children, for a while.
 class Variable {
  public:
-  Variable(const char* name, const std::string& value) : _name(name) {
-    ::setenv(name, value.c_str(), 1);
-  }
+  Variable(const char* name, std::string value) : _name(name), _value(std::move(value)) { set(); }
   ~Variable() { ::unsetenv(_name); }
   Variable(const Variable&) = delete;
   Variable& operator=(const Variable&) = delete;
 
+  /// Again, where somebody else has set it meanwhile.
+  void set() const { ::setenv(_name, _value.c_str(), 1); }
+
  private:
   const char* const _name;
+  const std::string _value;
 };
 
 inline std::string contents(const std::string& path) {
@@ -112,13 +116,19 @@ class DaemonWorld {
   /// Exit code and output of the command line, as a program of this session or, with
   /// `hasBus` false, of one without a bus.
   std::string zeb(const std::vector<std::string>& arguments, bool hasBus = true) const {
+    return endOf(*startZeb(arguments, hasBus));
+  }
+  /// The same in two steps, one command at a time.
+  std::unique_ptr<ChildProcess> startZeb(const std::vector<std::string>& arguments,
+                                         bool hasBus = true) const {
     const Variable address("DBUS_SESSION_BUS_ADDRESS",
                            hasBus ? bus.address() : "unix:path=" + folder.path("none"));
-    const std::string output = folder.path("zeb output");
-    std::filesystem::remove(output);
-    ChildProcess program(ZEB_PROGRAM, arguments, output);
+    std::filesystem::remove(folder.path("zeb output"));
+    return std::make_unique<ChildProcess>(ZEB_PROGRAM, arguments, folder.path("zeb output"));
+  }
+  std::string endOf(ChildProcess& program) const {
     const int code = program.wait();
-    return std::to_string(code) + "\n" + contents(output);
+    return std::to_string(code) + "\n" + contents(folder.path("zeb output"));
   }
   bool waitUntilIdle() const {
     return waitFor([this] {
@@ -126,6 +136,13 @@ class DaemonWorld {
       return now.find("'guards': <int64 0>") != std::string::npos &&
              now.find("'scanning': <false>") != std::string::npos;
     });
+  }
+
+  /// Makes this the session of the programs that are started from now on, where there are several.
+  void enter() const {
+    for (const Variable* variable : {&cache, &data, &shared, &config, &language}) {
+      variable->set();
+    }
   }
 
   TemporaryFolder folder;
