@@ -35,15 +35,17 @@ ClassicArchive::NodeIndex addNode(ClassicArchive& archive, ClassicArchive::Class
 }  // namespace
 
 platform::Data helpIndexFile(const platform::Data& indexData, const platform::Data& luxIndexData,
-                             const platform::Value& anchors) {
+                             platform::Value anchors) {
   platform::Value::Dictionary root;
   root.emplace(helpindexkeys::luxIndexData, luxIndexData);
   root.emplace(helpindexkeys::indexData, indexData);
   root.emplace(helpindexkeys::useRemoteRoot, false);
   if (!anchors.isAbsent()) {
-    root.emplace(helpindexkeys::anchorData, anchors);
+    root.emplace(helpindexkeys::anchorData, std::move(anchors));
   }
-  return platform::classicArchiveWithRootObject(std::move(root));
+  // In two steps, so that the values are gone when the bytes are made.
+  const ClassicArchive archive = platform::classicarchive::graph(std::move(root));
+  return platform::classicarchive::encode(archive);
 }
 
 std::optional<platform::Data> helpIndexFileWithLUXIndexData(const platform::Data& file,

@@ -26,9 +26,10 @@ inline constexpr const char* luxIndexData = "LUXIndexData";
 }  // namespace helpindexkeys
 
 /// The bytes of a help-index file for pages that lie on the disk. `anchors` is a dictionary, or
-/// absent for a file without anchor table.
+/// absent for a file without anchor table; who hands over the only copy saves the memory that it
+/// takes beside the file.
 platform::Data helpIndexFile(const platform::Data& indexData, const platform::Data& luxIndexData,
-                             const platform::Value& anchors);
+                             platform::Value anchors);
 
 /// The bytes of a help-index file with other semantic data, put in the place of the old or, where
 /// there are none, at the end; all other content is written as it was, whoever wrote it. Absent,
