@@ -2,14 +2,8 @@
 
 #include <fmt/format.h>
 #include <libxml/HTMLparser.h>
-#include <libxml/parser.h>
-#include <libxml/parserInternals.h>
-#include <libxml/valid.h>
 
 #include <algorithm>
-#include <cstring>
-#include <exception>
-#include <limits>
 #include <memory>
 #include <unordered_map>
 #include <utility>
@@ -17,25 +11,21 @@
 #include "bvmake/ASCII.h"
 #include "bvmake/DocBookBuilder.h"
 #include "bvmake/MallardPage.h"
-#include "bvmake/MarkupGuard.h"
 #include "bvmake/PosedEntity.h"
 #include "bvmake/UTF8.h"
+#include "bvmake/XMLReader.h"
 
 namespace bvmake {
 
 namespace {
 
+constexpr const char* refusal = "no DocBook document";
 constexpr std::string_view inclusionNamespace = "http://www.w3.org/2001/XInclude";
 constexpr std::string_view xmlNamespace = "http://www.w3.org/XML/1998/namespace";
-constexpr size_t maximumNamespaceCount = 256;
 constexpr size_t longestEntity = 65536;
 
 /// The element around text that has none of its own.
 constexpr std::string_view wrapperName = "included";
-
-std::string_view view(const xmlChar* text) {
-  return text == nullptr ? std::string_view() : reinterpret_cast<const char*>(text);
-}
 
 /// What an entity stands for that the document does not declare.
 std::string textOfUndeclared(const std::string& name) {
@@ -256,49 +246,6 @@ class Document {
   size_t _flattenedCount = 0;
 };
 
-/// What the parser's call-backs work on, one for each file or entity. Exceptions may not cross the
-/// parser, which is C: they wait here until it has returned.
-struct Session {
-  Session(Document& ofDocument, const std::string& fileName, bool isFirstFile)
-      : document(ofDocument), name(fileName), isFirst(isFirstFile) {}
-
-  Document& document;
-  const std::string& name;
-  bool isFirst;
-  xmlParserCtxtPtr parser = nullptr;
-  /// Name spaces that each open element declares, and their sum.
-  std::vector<size_t> namespaces;
-  size_t namespaceCount = 0;
-  /// Elements open inside an XInclude element, that one counted.
-  size_t inclusionDepth = 0;
-  std::string problem;
-  std::string firstMistake;
-  std::exception_ptr exception;
-
-  void stop(std::string why) {
-    problem = std::move(why);
-    xmlStopParser(parser);
-  }
-
-  template <typename Action>
-  void guarded(Action action) noexcept {
-    if (exception || !problem.empty()) {
-      return;
-    }
-    try {
-      action();
-      if (!document.problem.empty()) {
-        stop(document.problem);
-      }
-    } catch (...) {
-      exception = std::current_exception();
-      xmlStopParser(parser);
-    }
-  }
-};
-
-Session& sessionOf(void* context) { return *static_cast<Session*>(context); }
-
 /// The attributes that matter.
 struct Attributes {
   std::string id;
@@ -307,13 +254,8 @@ struct Attributes {
   bool asText = false;
   bool hasPointer = false;
 
-  Attributes(Document& document, int count, const xmlChar** attributes) {
-    for (int i = 0; i < count; ++i, attributes += 5) {
-      const char* const begin = reinterpret_cast<const char*>(attributes[3]);
-      const std::string_view value(
-          begin, static_cast<size_t>(reinterpret_cast<const char*>(attributes[4]) - begin));
-      const std::string_view name = view(attributes[0]);
-      const std::string_view space = view(attributes[2]);
+  Attributes(Document& document, const std::vector<XMLAttribute>& attributes) {
+    for (const auto& [name, space, value] : attributes) {
       if (name == "id" && (space.empty() || space == xmlNamespace)) {
         id = _text(document, value);
       } else if (name == "lang" && (space.empty() || space == xmlNamespace)) {
@@ -335,189 +277,86 @@ struct Attributes {
   }
 };
 
-void startElement(void* context, const xmlChar* name, const xmlChar*, const xmlChar* namespaceURI,
-                  int namespaceCount, const xmlChar**, int attributeCount, int,
-                  const xmlChar** attributes) {
-  Session& session = sessionOf(context);
-  session.guarded([&] {
-    session.namespaces.push_back(static_cast<size_t>(namespaceCount));
-    session.namespaceCount += static_cast<size_t>(namespaceCount);
-    if (session.namespaceCount > maximumNamespaceCount) {
-      session.stop("too many name spaces");
-      return;
-    }
-    const bool isRoot = session.namespaces.size() == 1;
-    const std::string_view element = view(name);
-    const std::string_view space = view(namespaceURI);
-    if (session.inclusionDepth > 0 || space == inclusionNamespace) {
+/// Reads one file or entity of a document.
+class DocBookReader : public XMLReader {
+ public:
+  DocBookReader(Document& document, const std::string& name, bool isFirst)
+      : XMLReader(refusal), _document(document), _name(name), _isFirst(isFirst) {}
+
+ private:
+  void startElement(std::string_view name, std::string_view namespaceURI,
+                    const std::vector<XMLAttribute>& attributes) override {
+    const bool isRoot = depth() == 1;
+    if (_inclusionDepth > 0 || namespaceURI == inclusionNamespace) {
       // What stands in for the file when it is not there is left out.
-      const bool begins = ++session.inclusionDepth == 1;
-      const Attributes found(session.document, attributeCount, attributes);
-      if (begins && element == "include" && !found.hasPointer && !found.reference.empty()) {
-        session.document.include(session.name, found.reference, found.asText);
+      const bool begins = ++_inclusionDepth == 1;
+      const Attributes found(_document, attributes);
+      if (begins && name == "include" && !found.hasPointer && !found.reference.empty()) {
+        _document.include(_name, found.reference, found.asText);
       }
       return;
     }
-    if (isRoot && !session.isFirst && element == wrapperName) {
+    if (isRoot && !_isFirst && name == wrapperName) {
       return;
     }
-    const bool isDocBook = space.empty() || space == docBookNamespace;
-    const Attributes found(session.document, attributeCount, attributes);
-    if (isRoot && session.isFirst) {
-      if (!isDocBook || !isDocBookRoot(element)) {
-        session.stop("no DocBook document");
+    const bool isDocBook = namespaceURI.empty() || namespaceURI == docBookNamespace;
+    const Attributes found(_document, attributes);
+    if (isRoot && _isFirst) {
+      if (!isDocBook || !isDocBookRoot(name)) {
+        stop(refusal);
         return;
       }
-      session.document.builder.setLanguage(found.language);
+      _document.builder.setLanguage(found.language);
     }
-    session.document.builder.startElement(element, isDocBook, found.id);
-  });
-}
-
-void endElement(void* context, const xmlChar* name, const xmlChar*, const xmlChar*) {
-  Session& session = sessionOf(context);
-  session.guarded([&] {
-    if (session.namespaces.empty()) {
-      return;
-    }
-    const bool isRoot = session.namespaces.size() == 1;
-    session.namespaceCount -= session.namespaces.back();
-    session.namespaces.pop_back();
-    if (session.inclusionDepth > 0) {
-      --session.inclusionDepth;
-    } else if (!isRoot || session.isFirst || view(name) != wrapperName) {
-      session.document.builder.endElement();
-    }
-  });
-}
-
-void characters(void* context, const xmlChar* text, int length) {
-  Session& session = sessionOf(context);
-  session.guarded([&] {
-    if (session.inclusionDepth == 0) {
-      session.document.builder.characters(
-          {reinterpret_cast<const char*>(text), static_cast<size_t>(length)});
-    }
-  });
-}
-
-void declareEntity(void* context, const xmlChar* name, int type, const xmlChar*,
-                   const xmlChar* systemID, xmlChar* content) {
-  Session& session = sessionOf(context);
-  session.guarded([&] {
-    Declaration declaration;
-    declaration.from = session.name;
-    if (type == XML_INTERNAL_GENERAL_ENTITY && view(content).size() <= longestEntity) {
-      declaration.content = view(content);
-    } else if (type == XML_EXTERNAL_GENERAL_PARSED_ENTITY) {
-      declaration.isFile = true;
-      declaration.content = view(systemID);
-    } else {
-      return;
-    }
-    session.document.declare(std::string(view(name)), std::move(declaration));
-  });
-}
-
-xmlEntityPtr findEntity(void* context, const xmlChar* name) {
-  Session& session = sessionOf(context);
-  xmlEntityPtr found = nullptr;
-  session.guarded([&] {
-    found = session.document.find(std::string(view(name)),
-                                  session.parser->instate == XML_PARSER_ATTRIBUTE_VALUE);
-  });
-  return found;
-}
-
-void enterEntity(void* context, const xmlChar* name) {
-  Session& session = sessionOf(context);
-  session.guarded([&] {
-    if (session.inclusionDepth == 0) {
-      session.document.enter(std::string(view(name)));
-    }
-  });
-}
-
-/// Declared attributes are added to every element by the parser: a short page can become an endless
-/// one.
-void refuseAttributeDeclaration(void* context, const xmlChar*, const xmlChar*, int, int,
-                                const xmlChar*, xmlEnumerationPtr choices) {
-  xmlFreeEnumeration(choices);
-  Session& session = sessionOf(context);
-  session.guarded([&] { session.stop("declarations of attributes are not taken"); });
-}
-
-void mistake(void* context, xmlErrorPtr error) {
-  Session& session = sessionOf(context);
-  session.guarded([&] {
-    if (error->level == XML_ERR_FATAL && session.firstMistake.empty()) {
-      const std::string_view message = error->message == nullptr ? "" : error->message;
-      session.firstMistake = fmt::format("line {}: {}", error->line, trimmed(message));
-    }
-  });
-}
-
-struct ParserDeleter {
-  void operator()(xmlParserCtxtPtr parser) const {
-    if (parser->myDoc != nullptr) {
-      xmlFreeDoc(parser->myDoc);
-      parser->myDoc = nullptr;
-    }
-    xmlFreeParserCtxt(parser);
+    _document.builder.startElement(name, isDocBook, found.id);
   }
+  void endElement(std::string_view name) override {
+    if (_inclusionDepth > 0) {
+      --_inclusionDepth;
+    } else if (depth() > 1 || _isFirst || name != wrapperName) {
+      _document.builder.endElement();
+    }
+  }
+  void characters(std::string_view text) override {
+    if (_inclusionDepth == 0) {
+      _document.builder.characters(text);
+    }
+  }
+
+  void declareEntity(std::string_view name, XMLEntityKind kind, std::string_view content) override {
+    if (kind == XMLEntityKind::other ||
+        (kind == XMLEntityKind::text && content.size() > longestEntity)) {
+      return;
+    }
+    Declaration declaration;
+    declaration.isFile = kind == XMLEntityKind::file;
+    declaration.from = _name;
+    declaration.content = content;
+    _document.declare(std::string(name), std::move(declaration));
+  }
+  xmlEntityPtr findEntity(std::string_view name) override {
+    return _document.find(std::string(name), isInAttribute());
+  }
+  void enterEntity(std::string_view name) override {
+    if (_inclusionDepth == 0) {
+      _document.enter(std::string(name));
+    }
+  }
+  void eventEnded() override {
+    if (!_document.problem.empty()) {
+      stop(_document.problem);
+    }
+  }
+
+  Document& _document;
+  const std::string& _name;
+  const bool _isFirst;
+  /// Elements open inside an XInclude element, that one counted.
+  size_t _inclusionDepth = 0;
 };
 
-void installCallBacks(xmlParserCtxtPtr parser, Session& session) {
-  xmlSAXHandler& handler = *parser->sax;
-  std::memset(&handler, 0, sizeof(handler));
-  handler.initialized = XML_SAX2_MAGIC;
-  handler.startElementNs = startElement;
-  handler.endElementNs = endElement;
-  handler.characters = characters;
-  handler.ignorableWhitespace = characters;
-  handler.cdataBlock = characters;
-  handler.entityDecl = declareEntity;
-  handler.getEntity = findEntity;
-  handler.reference = enterEntity;
-  handler.attributeDecl = refuseAttributeDeclaration;
-  handler.serror = mistake;
-  parser->userData = &session;
-  session.parser = parser;
-}
-
 bool Document::_parse(std::string text, const std::string& name, bool isFirst, std::string& why) {
-  if (text.size() > static_cast<size_t>(std::numeric_limits<int>::max())) {
-    why = "too large";
-    return false;
-  }
-  if (std::optional<std::string> found = tameMarkup(text, Markup::xml)) {
-    why = std::move(*found);
-    return false;
-  }
-  const std::unique_ptr<xmlParserCtxt, ParserDeleter> parser(
-      xmlCreateMemoryParserCtxt(text.data(), static_cast<int>(text.size())));
-  if (parser == nullptr) {
-    // The only failure besides memory: fewer than the four bytes of the shortest document.
-    why = "no DocBook document";
-    return false;
-  }
-  xmlCtxtUseOptions(parser.get(), XML_PARSE_NONET | XML_PARSE_NOERROR | XML_PARSE_NOWARNING |
-                                      XML_PARSE_IGNORE_ENC);
-  Session session(*this, name, isFirst);
-  installCallBacks(parser.get(), session);
-  xmlParseDocument(parser.get());
-  if (session.exception) {
-    std::rethrow_exception(session.exception);
-  }
-  if (!session.problem.empty()) {
-    why = std::move(session.problem);
-    return false;
-  }
-  if (parser->wellFormed == 0) {
-    why = session.firstMistake.empty() ? "no well-formed XML" : std::move(session.firstMistake);
-    return false;
-  }
-  return true;
+  return DocBookReader(*this, name, isFirst).read(std::move(text), why);
 }
 
 }  // namespace

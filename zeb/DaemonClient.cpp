@@ -326,13 +326,14 @@ std::optional<DaemonStatus> DaemonClient::status() const {
   status.watchedFolderCount = valueOf<uint64_t>(answer, "watchedFolders");
   status.isScanning = valueOf<bool>(answer, "scanning");
   status.guardCount = valueOf<int64_t>(answer, "guards");
+  status.operationCount = valueOf<uint64_t>(answer, "operations");
   status.running = platform::Seconds(valueOf<double>(answer, "running"));
   return status;
 }
 
 bool DaemonClient::isBusy() const {
   const std::optional<DaemonStatus> now = status();
-  return now && (now->isScanning || now->guardCount > 0);
+  return now && (now->isScanning || now->guardCount > 0 || now->operationCount > 0);
 }
 
 std::optional<std::string> DaemonClient::start() {

@@ -29,6 +29,8 @@ struct DaemonStatus {
   bool isScanning = false;
   /// Units of background work.
   int64_t guardCount = 0;
+  /// Operations that run or wait.
+  uint64_t operationCount = 0;
   platform::Seconds running{0};
 };
 

@@ -508,6 +508,7 @@ void BusService::Implementation::registerQuestions() {
                   {"watchedFolders", static_cast<uint64_t>(status.watchedFolderCount)},
                   {"scanning", status.isScanning},
                   {"guards", status.guardCount},
+                  {"operations", status.operationCount},
                   {"running", status.running.count()},
                   {"process", static_cast<int64_t>(::getpid())},
                   {"version", std::string(ZEB_VERSION)}});

@@ -8,6 +8,7 @@
 #include "host/Zebrine/ZEBConstants.h"
 #include "host/Zebrine/ZEBHelpBook.h"
 #include "platform/Environment.h"
+#include "platform/OperationQueue.h"
 #include "platform/RunLoop.h"
 #include "platform/Strings.h"
 #include "zebd/BookFolder.h"
@@ -171,6 +172,7 @@ ServiceStatus HelpService::status() const {
   status.watchedFolderCount = _watcher.count();
   status.isScanning = _books.isScanning();
   status.guardCount = _host->owner().shutdownGuardCount();
+  status.operationCount = platform::OperationQueue::unfinishedOperationCount();
   status.running = elapsedNow() - _start;
   return status;
 }

@@ -39,6 +39,8 @@ struct ServiceStatus {
   bool isScanning = false;
   /// Work that keeps the daemon from leaving.
   int64_t guardCount = 0;
+  /// Operations that run or wait; the latter hold no guard yet.
+  uint64_t operationCount = 0;
   platform::Seconds running{0};
 };
 

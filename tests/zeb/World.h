@@ -1,6 +1,7 @@
 // A caches folder of its own, and the program run on it.
 #pragma once
 
+#include <algorithm>
 #include <sstream>
 #include <string>
 #include <string_view>
@@ -48,6 +49,10 @@ class World {
   template <typename SetUp>
   Outcome zeb(std::vector<std::string> arguments, SetUp setUp) const {
     arguments.insert(arguments.begin(), {"--cache-dir", cacheFolder()});
+    // The usual limit is short where time passes quickly and the machine is slow.
+    if (std::find(arguments.begin(), arguments.end(), "--wait") == arguments.end()) {
+      arguments.insert(arguments.begin(), {"--wait", "30000"});
+    }
     std::ostringstream out;
     std::ostringstream err;
     zeb::Console console(out, err);

@@ -12,6 +12,7 @@
 #include <vector>
 
 #include "host/Zebrine/ZEBConstants.h"
+#include "platform/OperationQueue.h"
 #include "tests/support/Latch.h"
 #include "tests/support/ScriptedServer.h"
 #include "tests/zebd/HostWorld.h"
@@ -457,6 +458,22 @@ TEST_F(HelpServiceTest, ListOfBooksThatCannotBeLockedHoldsUpNoScan) {
   start();
   EXPECT_EQ(scan().unchanged, 2U);
   EXPECT_FALSE(service->status().isScanning);
+}
+
+TEST_F(HelpServiceTest, StatusCountsWorkThatStillWaitsItsTurn) {
+  start();
+  waitUntilFound("spring", {"Roses"});
+  EXPECT_TRUE(waitUntilQuiet(service->owner()));
+  EXPECT_EQ(service->status().operationCount, 0U);
+  tests::Latch mayEnd;
+  const auto queue = platform::OperationQueue::init();
+  queue->setMaxConcurrentOperationCount(1);
+  for (int i = 0; i < 2; ++i) {
+    queue->addOperationWithBlock([&] { mayEnd.wait(); });
+  }
+  EXPECT_EQ(service->status().operationCount, 2U);
+  mayEnd.open();
+  EXPECT_TRUE(runUntil([this] { return service->status().operationCount == 0; }));
 }
 
 TEST_F(HelpServiceTest, NothingIsHeardOfASearchBeforeItsHandleIsKnown) {

@@ -248,8 +248,8 @@ TEST_F(HostTest, GuardIsEvenAfterEverything) {
   EXPECT_TRUE(Host::runMainLoopUntil([&] { return !hasIndex("garden"); }, ample));
   EXPECT_TRUE(waitUntilQuiet(*host));
   EXPECT_EQ(host->owner().shutdownGuardCount(), 0);
-  EXPECT_THAT(log->messages(0), IsEmpty());
-  EXPECT_THAT(log->messages(1), IsEmpty());
+  EXPECT_THAT(messages(0), IsEmpty());
+  EXPECT_THAT(messages(1), IsEmpty());
 }
 
 TEST_F(HostTest, MainLoopRunsUntilTheConditionHoldsOrTheLimitHasPassed) {

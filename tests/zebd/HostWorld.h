@@ -3,9 +3,11 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <filesystem>
 #include <memory>
 #include <string>
+#include <vector>
 
 #include "platform/DistributedNotificationCenter.h"
 #include "platform/Environment.h"
@@ -17,7 +19,7 @@
 namespace tests {
 
 /// Time enough for anything that ends at all.
-inline constexpr platform::Seconds ample{600};
+inline constexpr platform::Seconds ample{6000};
 
 /// The real plug-in and the real indexing tool, in quick time.
 class HostWorld {
@@ -43,6 +45,18 @@ class HostWorld {
   bool hasIndex(const std::string& bookID, const std::string& localization) const {
     return std::filesystem::exists(folder.path("caches/org.zeb.zebd/GeneratedIndexes/") + bookID +
                                    "/" + localization + ".helpindex");
+  }
+
+  /// What was said of this world; a host of the test before may still be at work.
+  std::vector<std::string> messages(int level) const {
+    std::vector<std::string> own = log->messages(level);
+    own.erase(std::remove_if(own.begin(), own.end(),
+                             [this](const std::string& message) {
+                               return message.find("/zeb-test-") != std::string::npos &&
+                                      message.find(folder.path("")) == std::string::npos;
+                             }),
+              own.end());
+    return own;
   }
 
   TemporaryFolder folder;
