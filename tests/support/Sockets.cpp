@@ -5,6 +5,8 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+#include <mutex>
+#include <set>
 #include <stdexcept>
 
 namespace tests {
@@ -19,6 +21,26 @@ sockaddr_in loopbackAddress(int port) {
   return address;
 }
 
+Descriptor socketOnPort(int port) {
+  Descriptor socket(::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
+  const int yes = 1;
+  ::setsockopt(socket.number(), SOL_SOCKET, SO_REUSEADDR, &yes, sizeof yes);
+  const sockaddr_in address = loopbackAddress(port);
+  if (::bind(socket.number(), reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0 ||
+      ::listen(socket.number(), 128) != 0) {
+    throw std::runtime_error("cannot listen on the loopback address");
+  }
+  return socket;
+}
+
+/// Whether no socket of this process has had the port before.
+bool isNewPort(int port) {
+  static std::mutex mutex;
+  static std::set<int> known;
+  const std::lock_guard lock(mutex);
+  return known.insert(port).second;
+}
+
 }  // namespace
 
 void Descriptor::close() {
@@ -28,13 +50,12 @@ void Descriptor::close() {
 }
 
 Descriptor listeningSocket(int port) {
-  Descriptor socket(::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
-  const int yes = 1;
-  ::setsockopt(socket.number(), SOL_SOCKET, SO_REUSEADDR, &yes, sizeof yes);
-  const sockaddr_in address = loopbackAddress(port);
-  if (::bind(socket.number(), reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0 ||
-      ::listen(socket.number(), 128) != 0) {
-    throw std::runtime_error("cannot listen on the loopback address");
+  if (port != 0) {
+    return socketOnPort(port);
+  }
+  Descriptor socket = socketOnPort(0);
+  while (!isNewPort(portOfSocket(socket))) {
+    socket = socketOnPort(0);
   }
   return socket;
 }

@@ -26,7 +26,8 @@ class Descriptor {
   int _number = -1;
 };
 
-/// A socket that listens on 127.0.0.1; on any free port when `port` is 0. Throws
+/// A socket that listens on 127.0.0.1; on a free port when `port` is 0, never on one that this
+/// process had before: what is known of a URL must not be taken for another server's. Throws
 /// std::runtime_error when it cannot be had.
 Descriptor listeningSocket(int port = 0);
 
